@@ -1,0 +1,146 @@
+// Base of every store: one SQLite connection to the database file, the schema, and the generic
+// record operations that the stores build on.
+
+#pragma once
+
+#include <json/value.h>
+
+#include <string>
+
+struct sqlite3;
+
+namespace ZEVOOAUTHSERVER {
+
+// Values of GetErrCode(). Any positive value other than kErrNone is an SQLite result code, with
+// SQLite's own text in GetErrMsg().
+inline constexpr int kErrNone = 255;          // "": nothing recorded since construction
+inline constexpr int kErrCreateTable = -1;    // "Create table failed"
+inline constexpr int kErrBadParameters = -2;  // "Bad parameters"
+inline constexpr int kErrTokenExpired = -3;   // "Access Token Expired", in a result document only
+inline constexpr int kErrCrypt = -4;          // "Data Encrypt failed" or "Data Decrypt failed"
+inline constexpr int kErrTableFull = -5;      // "<table> Table is full", in the store's words
+
+// A store opens the database on construction, makes sure that all five tables exist, and closes
+// the database on destruction, so keep an object only for the work at hand. Use it from one
+// thread at a time.
+//
+// Opening and closing raise the effective user and group id of the whole process to root for the
+// length of that one call: no other thread may depend on the ids meanwhile.
+//
+// Operations return true, or non-zero, on success. A failure leaves its reason in GetErrCode()
+// and GetErrMsg(), unless its comment says "log only"; a success leaves the previous error there.
+//
+// Two document shapes come back throughout:
+//   rows     [ {"<column>": string, ...}, ... ]   numbers as decimal text, in column order of the
+//            table; "client_id" and "client_secret" decrypted
+//   request  {"condition": {"<column>": string or integer, ...},   all must be equal
+//             "condition_like": string,    ready-made SQL condition, wins over "condition"
+//             "option": string,            ready-made SQL after the condition
+//             "modified": {"<column>": string, ...}}               columns to write
+// "condition_like" and "option" enter the statement as they are: never pass on a user's text.
+// A value ends at its first NUL byte.
+class [[gnu::visibility("default")]] OAUTHDBBasic {
+ public:
+  // Row callback, as sqlite3_exec() calls it; context is the result document.
+  using RowCallback = int (*)(void* context, int columns, char** values, char** columnNames);
+
+  // Opens and initialises. Never throws for a database failure: the error is recorded and every
+  // later operation fails with the log line "DB is not ready!!".
+  OAUTHDBBasic();
+  ~OAUTHDBBasic();
+  OAUTHDBBasic(const OAUTHDBBasic&) = delete;
+  OAUTHDBBasic& operator=(const OAUTHDBBasic&) = delete;
+
+  int GetErrCode() const;
+  void SetErrCode(int code);
+  std::string GetErrMsg() const;
+  void SetErrMsg(const std::string& msg);
+
+  // The one table this store serves.
+  std::string GetTabName() const;
+  void SetTabName(const std::string& name);
+
+  // Schema. These run before the store is ready.
+
+  // Creates the tables that are missing, and the schema-version rows with the meta table. True
+  // once all five exist.
+  bool DBInit();
+  // Runs one CREATE statement; kErrCreateTable on failure.
+  bool CreateDBTab(const std::string& sql);
+  // False also when the look-up itself failed; the error state then tells.
+  bool IsDBTabExist(const std::string& name);
+  // Writes the schema-version rows; a row that cannot be written is logged and passed over.
+  void AddMetaData();
+  // Drops this store's table; the store stays ready.
+  bool DBDrop();
+
+  // Statements.
+
+  // Runs SQL; callback and result may be null. On failure the error state holds SQLite's code and
+  // text, and result the rows delivered before it.
+  bool DBCmdRun(const std::string& sql, RowCallback callback, Json::Value* result);
+  // The same on a store that is ready; refuses otherwise (log only).
+  bool DBCmd(const std::string& sql, RowCallback callback, Json::Value* result);
+
+  // Row callbacks; context is a Json::Value* and may be null. They return 0, or non-zero to fail
+  // the statement when the row cannot be delivered; no exception leaves them.
+  // Sets {"exist": true} for any row.
+  static int IsTabExistCallback(void* context, int columns, char** values, char** columnNames);
+  // Appends the first column as a string.
+  static int TabCountCallback(void* context, int columns, char** values, char** columnNames);
+  // Appends the row as an object of strings, decrypted; an SQL NULL reads as "". A value that
+  // cannot be decrypted is delivered as it is stored (log only).
+  static int TabGetCallback(void* context, int columns, char** values, char** columnNames);
+
+  // Counts the rows of the table: result becomes [ string ], the count as decimal text.
+  // kErrBadParameters if result is null.
+  bool DBGetRowCount(Json::Value * result);
+  // Whether the table holds fewer than max rows. False also when it cannot be counted.
+  bool DBCheckRowMax(unsigned long max);
+
+  // Fragments of SQL made from requests. Members come in ascending byte order of their names;
+  // single quotes in values are doubled, names are inserted as they are.
+
+  // {"a": "1", "id": null} -> " (a, id) VALUES('1', NULL)"; a null "timestamp" is the database's
+  // current time.
+  static std::string GetInsertParam(const Json::Value& record);
+  // {"a": "1", "b": "2"} -> "a='1'<separator>b='2'"
+  static std::string ConcateParam(const Json::Value& values, const std::string& separator);
+  // {"a": "1", "b": "2"} -> " WHERE a='1' and b='2'"; nothing -> ""
+  static std::string GetConditionParam(const Json::Value& condition);
+  // request -> " SET <modified> WHERE <condition>"
+  static std::string GetUpdateParam(const Json::Value& request);
+
+  // Record operations. They change the document passed in: sensitive values are encrypted in
+  // place, absent "condition" and "modified" are added as null. A value that cannot be encrypted
+  // leaves kErrCrypt and the database untouched.
+
+  // Inserts the record {"<column>": string or null, ...}.
+  bool DBAdd(Json::Value & record);
+  // Deletes the rows that match "condition", or every row without one. Fails (log only) when
+  // there was no row to delete.
+  bool DBDel(Json::Value & request);
+  // Reads the rows that match "condition_like" or else "condition" into *rows; no row is a
+  // success. kErrBadParameters if rows is null.
+  bool DBGet(Json::Value & request, Json::Value * rows);
+  // Writes "modified" into the rows that match "condition". Fails (log only) when no row matched.
+  bool DBEdit(Json::Value & request);
+
+  // Replace the members "client_id" and "client_secret" of a document by their encrypted or plain
+  // forms. The first failure stops and leaves the rest as it was (log only).
+  static bool ParamEncrypt(Json::Value & doc);
+  static bool ParamDecrypt(Json::Value & doc);
+
+ private:
+  // The public constructor delegates to this one first, so that the destructor closes the
+  // connection when a later step of the construction throws.
+  explicit OAUTHDBBasic(sqlite3 * db) : db_(db) {}
+
+  int errCode_ = kErrNone;
+  bool ready_ = false;
+  std::string errMsg_;
+  std::string tabName_;
+  sqlite3* db_;
+};
+
+}  // namespace ZEVOOAUTHSERVER

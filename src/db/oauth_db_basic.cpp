@@ -1,0 +1,472 @@
+#include "oauth_db_basic.h"
+
+#include <sqlite3.h>
+#include <unistd.h>
+
+#include <boost/algorithm/string/replace.hpp>
+#include <cerrno>
+#include <cstring>
+#include <utility>
+
+#include "decimal_text.h"
+#include "host_libraries.h"
+#include "oauth_names.h"
+#include "oauth_syslog.h"
+#include "sqlite_text.h"
+
+namespace ZEVOOAUTHSERVER {
+namespace {
+
+// Raises the effective ids to root for the lifetime of the object.
+//
+// Group first on the way in, user last on the way out: without the user id the group can no
+// longer be changed. A refusal is logged; the guarded call is made all the same, with the ids
+// that the process then has. Leaves errno 0, or 1 after a refusal. Process-wide: no other thread
+// may depend on the ids meanwhile.
+class RaisedPrivilege {
+ public:
+  RaisedPrivilege() : user_(geteuid()), group_(getegid()) {
+    if ((group_ == kRoot || setGroup(kRoot)) && (user_ == kRoot || setUser(kRoot)))
+      errno = 0;
+    else
+      refused("ENTERCriticalSection");
+  }
+  ~RaisedPrivilege() {
+    const bool user = geteuid() != user_;
+    const bool group = getegid() != group_;
+    if ((!user || setUser(kRoot)) && (!group || setGroup(group_)) && (!user || setUser(user_)))
+      errno = 0;
+    else
+      refused("LEAVECriticalSection");
+  }
+  RaisedPrivilege(const RaisedPrivilege&) = delete;
+  RaisedPrivilege& operator=(const RaisedPrivilege&) = delete;
+
+ private:
+  static constexpr unsigned kRoot = 0;
+  static constexpr unsigned kKeep = static_cast<unsigned>(-1);
+
+  static bool setUser(unsigned id) { return report("resuid", id, setresuid(kKeep, id, kKeep)); }
+  static bool setGroup(unsigned id) { return report("resgid", id, setresgid(kKeep, id, kKeep)); }
+
+  // Logs what a call did; a drop back to ordinary ids is not worth a line.
+  static bool report(const char* call, unsigned id, int result) {
+    const int target = static_cast<int>(id);
+    if (result != 0) {
+      char buffer[1024] = {};
+      const char* const text = strerror_r(errno, buffer, sizeof buffer);
+      OAUTH_LOG(LOG_AUTH | LOG_ERR, "ERROR: set%s(%d, %d, %d) [%s]", call, -1, target, -1, text);
+      return false;
+    }
+    if (id == kRoot)
+      OAUTH_LOG(LOG_AUTH | LOG_INFO, "WARNING: set%s(%d, %d, %d)", call, -1, target, -1);
+    return true;
+  }
+
+  static void refused(const char* section) {
+    errno = 1;
+    OAUTH_LOG(LOG_AUTH | LOG_ERR, "ERROR: %s", section);
+    errno = 1;  // whatever sending the line made of it
+  }
+
+  const unsigned user_, group_;
+};
+
+using HostCipher = int (*)(const char* text, char* out, int outSize);
+
+// The text that the host's cipher makes of the input; false, and out left empty, if it refuses.
+bool convert(HostCipher cipher, const std::string& text, std::string& out) {
+  char buffer[1024] = {};
+  if (cipher(text.c_str(), buffer, sizeof buffer) == 0) return false;
+  out.assign(buffer, strnlen(buffer, sizeof buffer));
+  return true;
+}
+
+bool EncryptValue(const std::string& plain, std::string& out) {
+  if (convert(ZOCLCryptSzEncrypt, plain, out)) return true;
+  OAUTH_FAIL("Data Encrypt failed");
+  return false;
+}
+
+bool DecryptValue(const std::string& cipher, std::string& out) {
+  if (convert(ZOCLCryptSzDecrypt, cipher, out)) return true;
+  OAUTH_FAIL("Data Decrypt failed");
+  return false;
+}
+
+using ValueConverter = bool (*)(const std::string& text, std::string& out);
+
+bool replaceMember(Json::Value& doc, const char* key, ValueConverter converter) {
+  std::string replacement;
+  if (!converter(doc[key].asString(), replacement)) return false;
+  doc[key] = replacement;
+  return true;
+}
+
+// A document that is no object, such as an absent condition, has no member to convert.
+bool has(const Json::Value& doc, const char* key) { return doc.isObject() && doc.isMember(key); }
+
+const char* textOrEmpty(const char* text) { return text == nullptr ? "" : text; }
+
+void dumpColumn(int index, const char* name, const char* value) {
+  OAUTH_DIAG(kRow, "##### [%d][%s = %s]", index, name, textOrEmpty(value));
+}
+
+// Runs the body of a row callback. SQLite is C: no exception may unwind through it, so a row that
+// cannot be delivered fails the statement (SQLITE_ABORT) instead of going missing.
+template <class Body>
+int deliver(Body body) noexcept {
+  try {
+    body();
+    return 0;
+  } catch (...) {
+    return 1;
+  }
+}
+
+bool badParameters(OAUTHDBBasic& store) {
+  store.SetErrCode(kErrBadParameters);
+  store.SetErrMsg("Bad parameters");
+  OAUTH_FAIL("Bad parameters");
+  return false;
+}
+
+// A value between single quotes, those inside doubled. It ends at its first NUL byte, where
+// SQLite would take the statement to end.
+std::string quoted(const Json::Value& value) {
+  std::string text = value.asString();
+  text.resize(std::strlen(text.c_str()));
+  boost::algorithm::replace_all(text, "'", "''");
+  return "'" + text + "'";
+}
+
+}  // namespace
+
+// --- Construction and schema ---
+
+OAUTHDBBasic::OAUTHDBBasic() : OAUTHDBBasic(nullptr) {
+  int result;
+  {
+    const RaisedPrivilege raised;
+    result = sqlite3_open(names::path::kDatabase, &db_);
+  }
+  if (result != SQLITE_OK) {
+    SetErrCode(result);
+    SetErrMsg("Open DB failed!!");
+    OAUTH_FAIL("Open DB failed!![%d]", result);
+  }
+  // Also after a failed open: SQLite hands out a handle then too, and what fails on it is logged.
+  DBInit();
+}
+
+OAUTHDBBasic::~OAUTHDBBasic() {
+  if (db_ == nullptr) return;
+  int result;
+  {
+    const RaisedPrivilege raised;
+    result = sqlite3_close(db_);
+  }
+  if (result != SQLITE_OK) OAUTH_FAIL("Close DB failed!![%d]", result);
+}
+
+int OAUTHDBBasic::GetErrCode() const { return errCode_; }
+void OAUTHDBBasic::SetErrCode(int code) { errCode_ = code; }
+std::string OAUTHDBBasic::GetErrMsg() const { return errMsg_; }
+void OAUTHDBBasic::SetErrMsg(const std::string& msg) { errMsg_ = msg; }
+std::string OAUTHDBBasic::GetTabName() const { return tabName_; }
+void OAUTHDBBasic::SetTabName(const std::string& name) { tabName_ = name; }
+
+bool OAUTHDBBasic::DBInit() {
+  if (db_ == nullptr) return ready_;
+  const auto create = [this](const char* sql, const char* table) {
+    if (CreateDBTab(sql)) return true;
+    OAUTH_FAIL("Create Table failed!![%s]", table);
+    return false;
+  };
+
+  OAUTH_DIAG(kEntry, "==> %s[init meta table]", __func__);
+  if (!IsDBTabExist(names::table::kMeta)) {
+    if (!CreateDBTab(names::schema::kMeta)) {
+      OAUTH_FAIL("Create Table failed!![meta]");
+      return ready_;
+    }
+    AddMetaData();
+  }
+  // Two of these five traces are entry traces and three are results: log filters rely on it.
+  OAUTH_DIAG(kEntry, "==> %s[init client table]", __func__);
+  if (!create(names::schema::kClientInfo, names::table::kClientInfo)) return ready_;
+  OAUTH_DIAG(kResult, "==> %s[init token table]", __func__);
+  if (!create(names::schema::kToken, names::table::kToken)) return ready_;
+  OAUTH_DIAG(kResult, "==> %s[init grantCode table]", __func__);
+  if (!create(names::schema::kGrantCode, names::table::kGrantCode)) return ready_;
+  OAUTH_DIAG(kResult, "==> %s[init log table]", __func__);
+  if (!create(names::schema::kLog, names::table::kLog)) return ready_;
+  ready_ = true;
+  return true;
+}
+
+bool OAUTHDBBasic::CreateDBTab(const std::string& sql) {
+  if (!DBCmdRun(sql, nullptr, nullptr)) {
+    SetErrCode(kErrCreateTable);
+    SetErrMsg("Create table failed");
+    return false;
+  }
+  OAUTH_DIAG(kEntry, "Create tab success");
+  return true;
+}
+
+bool OAUTHDBBasic::IsDBTabExist(const std::string& name) {
+  Json::Value probe;
+  probe[names::result::kExist] = false;
+  const std::string sql = "SELECT * FROM sqlite_master WHERE name='" + name + "' and type='table';";
+  if (!DBCmdRun(sql, IsTabExistCallback, &probe)) return false;
+  if (!probe[names::result::kExist].asBool()) return false;
+  OAUTH_DIAG(kEntry, "Tab[%s] is exist", name.c_str());
+  return true;
+}
+
+void OAUTHDBBasic::AddMetaData() {
+  OAUTH_ENTER();
+  const std::pair<const char*, const char*> versions[] = {
+      {names::table::kClientInfo, names::version::kClientInfo},
+      {names::table::kGrantCode, names::version::kGrantCode},
+      {names::table::kToken, names::version::kToken},
+  };
+  for (const auto& [table, version] : versions) {
+    const std::string sql = std::string("INSERT INTO ") + names::table::kMeta +
+                            "(tab_name, version) VALUES('" + table + "', " + version + ");";
+    if (!DBCmdRun(sql, nullptr, nullptr)) OAUTH_FAIL("Add Meta failed");
+  }
+}
+
+bool OAUTHDBBasic::DBDrop() {
+  OAUTH_ENTER();
+  const bool ok = DBCmdRun("DROP TABLE IF EXISTS " + tabName_ + ";", nullptr, nullptr);
+  // Unlike other failures this one is silent unless diagnostics are on.
+  if (!ok) OAUTH_DIAG(kResult, "Drop [%s] failed", tabName_.c_str());
+  return ok;
+}
+
+// --- Statements ---
+
+bool OAUTHDBBasic::DBCmdRun(const std::string& sql, RowCallback callback, Json::Value* result) {
+  OAUTH_DIAG(kEntry, "==> %s[%s]", __func__, sql.c_str());
+  char* errorText = nullptr;
+  const int code = sqlite3_exec(db_, sql.c_str(), callback, result, &errorText);
+  const SqliteText error(errorText);
+  if (code == SQLITE_OK) return true;
+  // On a handle whose open failed there is a code without a text.
+  const char* const text = textOrEmpty(error.get());
+  SetErrCode(code);
+  SetErrMsg(text);
+  OAUTH_FAIL("Run Command failed!![%s][%d]", text, code);
+  return false;
+}
+
+bool OAUTHDBBasic::DBCmd(const std::string& sql, RowCallback callback, Json::Value* result) {
+  OAUTH_ENTER();
+  if (db_ != nullptr && ready_) return DBCmdRun(sql, callback, result);
+  // The error state stays: it tells why the store is not ready.
+  OAUTH_FAIL("DB is not ready!!");
+  return false;
+}
+
+int OAUTHDBBasic::IsTabExistCallback(void* context, int columns, char** values,
+                                     char** columnNames) {
+  OAUTH_ENTER();
+  for (int i = 0; i < columns; ++i) dumpColumn(i, columnNames[i], values[i]);
+  return deliver([&] {
+    if (context != nullptr) (*static_cast<Json::Value*>(context))[names::result::kExist] = true;
+  });
+}
+
+int OAUTHDBBasic::TabCountCallback(void* context, int /*columns*/, char** values,
+                                   char** /*columnNames*/) {
+  OAUTH_ENTER();
+  return deliver([&] {
+    if (context != nullptr) static_cast<Json::Value*>(context)->append(textOrEmpty(values[0]));
+  });
+}
+
+int OAUTHDBBasic::TabGetCallback(void* context, int columns, char** values, char** columnNames) {
+  OAUTH_ENTER();
+  return deliver([&] {
+    Json::Value row;
+    for (int i = 0; i < columns; ++i) {
+      dumpColumn(i, columnNames[i], values[i]);
+      row[columnNames[i]] = textOrEmpty(values[i]);
+    }
+    if (!ParamDecrypt(row)) OAUTH_FAIL("Decrypt data failed");
+    if (context != nullptr) static_cast<Json::Value*>(context)->append(std::move(row));
+  });
+}
+
+bool OAUTHDBBasic::DBGetRowCount(Json::Value* result) {
+  OAUTH_ENTER();
+  if (result == nullptr) return badParameters(*this);
+  *result = Json::Value(Json::arrayValue);
+  const std::string sql = "SELECT COUNT(*) FROM " + tabName_ + ";";
+  if (DBCmd(sql, TabCountCallback, result)) return true;
+  OAUTH_FAIL("Get Row Count failed[%s]", tabName_.c_str());
+  return false;
+}
+
+bool OAUTHDBBasic::DBCheckRowMax(unsigned long max) {
+  OAUTH_ENTER();
+  Json::Value rows;
+  if (!DBGetRowCount(&rows)) {
+    OAUTH_FAIL("Check Row Max failed[%s]", tabName_.c_str());
+    return false;
+  }
+  const auto count = static_cast<unsigned long>(decimalValue(rows[0U]));
+  OAUTH_DIAG(kResult, "Table Row Count[%lu]", count);
+  return count < max;
+}
+
+// --- Request to SQL ---
+
+std::string OAUTHDBBasic::GetInsertParam(const Json::Value& record) {
+  OAUTH_ENTER();
+  std::string columns, values;
+  for (auto member = record.begin(); member != record.end(); ++member) {
+    if (!columns.empty()) {
+      columns += ", ";
+      values += ", ";
+    }
+    columns += member.name();
+    if (!member->isNull())
+      values += quoted(*member);
+    else if (member.name() == names::column::kTimestamp)
+      values += "strftime('%s','now')";
+    else
+      values += "NULL";
+  }
+  return " (" + columns + ") VALUES(" + values + ")";
+}
+
+std::string OAUTHDBBasic::ConcateParam(const Json::Value& values, const std::string& separator) {
+  OAUTH_ENTER();
+  std::string result;
+  for (auto member = values.begin(); member != values.end(); ++member) {
+    if (!result.empty()) result += separator;
+    result += member.name() + "=" + quoted(*member);
+  }
+  return result;
+}
+
+std::string OAUTHDBBasic::GetConditionParam(const Json::Value& condition) {
+  OAUTH_ENTER();
+  if (condition.empty()) return {};
+  return " WHERE " + ConcateParam(condition, " and ");
+}
+
+std::string OAUTHDBBasic::GetUpdateParam(const Json::Value& request) {
+  OAUTH_ENTER();
+  return " SET " + ConcateParam(request[names::request::kModified], ", ") +
+         GetConditionParam(request[names::request::kCondition]);
+}
+
+// --- Record operations ---
+
+bool OAUTHDBBasic::DBAdd(Json::Value& record) {
+  OAUTH_ENTER();
+  if (!ParamEncrypt(record)) {
+    SetErrCode(kErrCrypt);
+    SetErrMsg("Data Encrypt failed");
+    return false;
+  }
+  if (!DBCmd("INSERT INTO " + tabName_ + GetInsertParam(record) + ";", nullptr, nullptr)) {
+    OAUTH_FAIL("Add failed[%s]", tabName_.c_str());
+    return false;
+  }
+  OAUTH_DIAG(kResult, "[%s] Add success, changed[%d]", tabName_.c_str(), sqlite3_changes(db_));
+  return true;
+}
+
+bool OAUTHDBBasic::DBDel(Json::Value& request) {
+  OAUTH_ENTER();
+  Json::Value& condition = request[names::request::kCondition];
+  if (!ParamEncrypt(condition)) {
+    SetErrCode(kErrCrypt);
+    SetErrMsg("Data Encrypt failed");
+    return false;
+  }
+  const std::string sql = "DELETE FROM " + tabName_ + GetConditionParam(condition) + ";";
+  if (!DBCmd(sql, nullptr, nullptr) || sqlite3_changes(db_) <= 0) {
+    OAUTH_FAIL("Delete failed[%s]", tabName_.c_str());
+    return false;
+  }
+  // "ClientInfo" is printed for every table here and below: log filters rely on it.
+  OAUTH_DIAG(kResult, "ClientInfo Delete success, changed[%d]", sqlite3_changes(db_));
+  return true;
+}
+
+bool OAUTHDBBasic::DBGet(Json::Value& request, Json::Value* rows) {
+  OAUTH_ENTER();
+  if (rows == nullptr) return badParameters(*this);
+  Json::Value& condition = request[names::request::kCondition];
+  if (!ParamEncrypt(condition)) {
+    SetErrCode(kErrCrypt);
+    SetErrMsg("Data Decrypt failed");  // callers know a failed read by this text
+    return false;
+  }
+  *rows = Json::Value(Json::arrayValue);
+  std::string sql = "SELECT * FROM " + tabName_;
+  if (request.isMember(names::request::kConditionLike))
+    sql += " WHERE " + request[names::request::kConditionLike].asString();
+  else
+    sql += GetConditionParam(condition);
+  // Read through a const reference, so that an absent option is not added to the request.
+  sql += " " + std::as_const(request)[names::request::kOption].asString() + ";";
+  if (!DBCmd(sql, TabGetCallback, rows)) {
+    OAUTH_FAIL("Get failed[%s]", tabName_.c_str());
+    return false;
+  }
+  OAUTH_DIAG(kResult, "ClientInfo Get Done");
+  return true;
+}
+
+bool OAUTHDBBasic::DBEdit(Json::Value& request) {
+  OAUTH_ENTER();
+  if (!ParamEncrypt(request[names::request::kCondition]) ||
+      !ParamEncrypt(request[names::request::kModified])) {
+    SetErrCode(kErrCrypt);
+    SetErrMsg("Data Encrypt failed");
+    return false;
+  }
+  const std::string sql = "UPDATE " + tabName_ + GetUpdateParam(request) + ";";
+  if (!DBCmd(sql, nullptr, nullptr) || sqlite3_changes(db_) <= 0) {
+    OAUTH_FAIL("Edit failed[%s]", tabName_.c_str());
+    return false;
+  }
+  OAUTH_DIAG(kResult, "ClientInfo Edit success, changed[%d]", sqlite3_changes(db_));
+  return true;
+}
+
+// --- Sensitive values ---
+
+bool OAUTHDBBasic::ParamEncrypt(Json::Value& doc) {
+  if (has(doc, names::column::kClientId)) {
+    OAUTH_DIAG(kResult, "==> %s[client_id]", __func__);
+    if (!replaceMember(doc, names::column::kClientId, EncryptValue)) return false;
+  }
+  if (has(doc, names::column::kClientSecret)) {
+    OAUTH_DIAG(kResult, "==> %s[client_secret]", __func__);
+    if (!replaceMember(doc, names::column::kClientSecret, EncryptValue)) return false;
+  }
+  return true;
+}
+
+bool OAUTHDBBasic::ParamDecrypt(Json::Value& doc) {
+  if (has(doc, names::column::kClientId)) {
+    OAUTH_DIAG(kResult, "==> %s[client_id]", __func__);
+    if (!replaceMember(doc, names::column::kClientId, DecryptValue)) return false;
+  }
+  if (has(doc, names::column::kClientSecret)) {
+    OAUTH_DIAG(kResult, "==> %s[client_secret]", __func__);
+    if (!replaceMember(doc, names::column::kClientSecret, DecryptValue)) return false;
+  }
+  return true;
+}
+
+}  // namespace ZEVOOAUTHSERVER
