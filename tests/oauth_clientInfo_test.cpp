@@ -1,0 +1,3 @@
+#include "oauth_clientInfo.h"
+
+#include "store_test.h"

@@ -1,0 +1,3 @@
+#include "oauth_db_basic.h"
+
+#include "store_test.h"

@@ -1,0 +1,3 @@
+#include "oauth_grantCode.h"
+
+#include "store_test.h"

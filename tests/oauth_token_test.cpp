@@ -1,0 +1,3 @@
+#include "oauth_token.h"
+
+#include "store_test.h"

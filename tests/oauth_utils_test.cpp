@@ -1,0 +1,3 @@
+#include "oauth_utils.h"
+
+#include "store_test.h"

@@ -1,0 +1,23 @@
+// Everything sent to the system log while an object of this class lives. Linking this seam
+// replaces syslog() in the whole program; without an object the lines are dropped.
+
+#pragma once
+
+#include <string>
+#include <vector>
+
+class CapturedSyslog {
+ public:
+  CapturedSyslog();
+  ~CapturedSyslog();
+  CapturedSyslog(const CapturedSyslog&) = delete;
+  CapturedSyslog& operator=(const CapturedSyslog&) = delete;
+
+  // Each line as "<priority> <file> <text>", in order, the line number left out:
+  // "3 oauth_token.cpp Bad parameters". What does not have the library's form stands as
+  // "<priority> <whole line>".
+  std::vector<std::string> lines() const;
+  // The formats as they were handed over: "%s:%d Bad parameters".
+  std::vector<std::string> formats() const;
+  void clear();
+};

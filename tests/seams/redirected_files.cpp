@@ -1,0 +1,114 @@
+#include "redirected_files.h"
+
+#include <dlfcn.h>
+#include <sqlite3.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+#include <cstdarg>
+#include <cstdio>
+#include <cstring>
+#include <filesystem>
+#include <stdexcept>
+
+namespace {
+
+constexpr char kDatabase[] = "/var/packages/Keyloft/target/etc/oauth.db";
+constexpr char kSettings[] = "/var/packages/Keyloft/target/etc/oauth.cfg";
+constexpr char kDebugMarker[] = "/tmp/zevooauth_debug";
+
+struct State {
+  std::string directory;
+  bool readOnly = false;
+  int openCode = SQLITE_OK, closeCode = SQLITE_OK;
+  bool failFormatting = false;
+  std::vector<std::string> calls;
+};
+State state;
+
+std::string freshDirectory() {
+  std::string name = std::filesystem::temp_directory_path() / "zevooauth-test-XXXXXX";
+  if (mkdtemp(name.data()) == nullptr) throw std::runtime_error("cannot make " + name);
+  return name;
+}
+
+// For programs without a fixture.
+const std::string& directory() {
+  static struct Own {
+    ~Own() {
+      if (!path.empty()) std::filesystem::remove_all(path);
+    }
+    std::string path;
+  } own;
+  if (!state.directory.empty()) return state.directory;
+  if (own.path.empty()) own.path = freshDirectory();
+  return own.path;
+}
+
+std::string redirected(const char* path) {
+  if (std::strcmp(path, kDatabase) == 0) return directory() + "/oauth.db";
+  if (std::strcmp(path, kSettings) == 0) return directory() + "/oauth.cfg";
+  if (std::strcmp(path, kDebugMarker) == 0) return directory() + "/zevooauth_debug";
+  return path;
+}
+
+template <class Function>
+Function* next(const char* name, Function*) {
+  return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
+}
+
+}  // namespace
+
+RedirectedFiles::RedirectedFiles() {
+  state = State();
+  state.directory = freshDirectory();
+}
+RedirectedFiles::~RedirectedFiles() {
+  std::filesystem::remove_all(state.directory);
+  state = State();
+}
+
+std::string RedirectedFiles::directory() const { return state.directory; }
+std::string RedirectedFiles::database() const { return redirected(kDatabase); }
+std::string RedirectedFiles::settings() const { return redirected(kSettings); }
+std::string RedirectedFiles::debugMarker() const { return redirected(kDebugMarker); }
+void RedirectedFiles::removeDirectory() { std::filesystem::remove_all(state.directory); }
+void RedirectedFiles::openReadOnly() { state.readOnly = true; }
+void RedirectedFiles::openWithoutHandle(int code) { state.openCode = code; }
+void RedirectedFiles::failClose(int code) { state.closeCode = code; }
+void RedirectedFiles::failFormatting() { state.failFormatting = true; }
+const std::vector<std::string>& RedirectedFiles::calls() const { return state.calls; }
+
+extern "C" int sqlite3_open(const char* path, sqlite3** db) {
+  state.calls.push_back(std::string("open ") + path);
+  if (state.openCode != SQLITE_OK) {
+    *db = nullptr;
+    return state.openCode;
+  }
+  const int flags =
+      state.readOnly ? SQLITE_OPEN_READONLY : SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE;
+  return sqlite3_open_v2(redirected(path).c_str(), db, flags, nullptr);
+}
+
+extern "C" int sqlite3_close(sqlite3* db) {
+  state.calls.emplace_back("close");
+  const int code = next("sqlite3_close", sqlite3_close)(db);
+  return state.closeCode != SQLITE_OK ? state.closeCode : code;
+}
+
+extern "C" char* sqlite3_mprintf(const char* format, ...) {
+  if (state.failFormatting) return nullptr;
+  va_list arguments;
+  va_start(arguments, format);
+  char* const text = sqlite3_vmprintf(format, arguments);
+  va_end(arguments);
+  return text;
+}
+
+extern "C" FILE* fopen64(const char* path, const char* mode) {
+  return next("fopen64", fopen64)(redirected(path).c_str(), mode);
+}
+
+extern "C" int access(const char* path, int mode) noexcept {
+  return next("access", access)(redirected(path).c_str(), mode);
+}

@@ -1,0 +1,36 @@
+// The fixed paths of the library, redirected to a fresh directory. Linking this seam replaces
+// sqlite3_open(), fopen64() and access() for those paths in the whole program; a program that
+// makes no object of this class gets a directory of its own at first use.
+
+#pragma once
+
+#include <string>
+#include <vector>
+
+class RedirectedFiles {
+ public:
+  // Makes an empty directory; the destructor removes it with all it holds.
+  RedirectedFiles();
+  ~RedirectedFiles();
+  RedirectedFiles(const RedirectedFiles&) = delete;
+  RedirectedFiles& operator=(const RedirectedFiles&) = delete;
+
+  std::string directory() const;
+  std::string database() const;
+  std::string settings() const;
+  std::string debugMarker() const;
+
+  // Makes opening the database fail as in a missing directory.
+  void removeDirectory();
+  // Opens the database for reading only.
+  void openReadOnly();
+  // sqlite3_open() answers this code and hands out no handle, as it does without memory.
+  void openWithoutHandle(int code);
+  // sqlite3_close() closes, and answers this code.
+  void failClose(int code);
+  // sqlite3_mprintf() finds no memory.
+  void failFormatting();
+
+  // Every call of the library that opens or closes: "open <path>", "close".
+  const std::vector<std::string>& calls() const;
+};
