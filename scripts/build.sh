@@ -1,0 +1,23 @@
+#!/usr/bin/env bash
+# Configures and builds one preset.
+#
+#   scripts/build.sh PRESET FOLDER [CMAKE OPTION...]
+#
+# FOLDER is a name below build/; where the checkout belongs to somebody else it lies in the user's
+# own cache folder instead. The last line tells where.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+preset=$1 folder=$2
+shift 2
+root=$PWD/build
+if ! mkdir -p "$root" 2>/dev/null || [ ! -w "$root" ] ||
+  { [ -e "$root/$folder" ] && [ ! -w "$root/$folder" ]; }; then
+  root=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth
+  mkdir -p "$root" 2>/dev/null || root=$(mktemp --directory --tmpdir zevooauth-build-XXXXXX)
+fi
+
+echo "build: preset $preset in $root/$folder" >&2
+cmake --preset "$preset" -B "$root/$folder" "$@" >/dev/null
+cmake --build "$root/$folder" -- --quiet >&2
+echo "$root/$folder"

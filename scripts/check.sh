@@ -1,0 +1,30 @@
+#!/usr/bin/env bash
+# What a machine can say about the code: formatting, shell scripts, clang-tidy, branch coverage of
+# src/. Installs what is missing (scripts/packages.sh, groups build, test and check).
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+required_branches=95 # percent
+
+scripts/packages.sh build test check
+
+mapfile -t sources < <(find include src platform examples tests -name '*.cpp' -o -name '*.h' | sort)
+clang-format --dry-run -Werror "${sources[@]}"
+echo "check: ${#sources[@]} files are formatted"
+
+shellcheck .ci/run scripts/*.sh tests/*.sh
+echo "check: shell scripts are sound"
+
+folder=$(scripts/build.sh dev dev | tail -n 1)
+printf '%s\n' "${sources[@]}" | grep '\.cpp$' |
+  xargs --max-procs="$(nproc)" --max-args=1 clang-tidy --quiet -p "$folder" --warnings-as-errors='*'
+echo "check: clang-tidy has nothing to say"
+
+folder=$(scripts/build.sh coverage coverage | tail -n 1)
+find "$folder" -name '*.gcda' -delete
+ctest --test-dir "$folder" --parallel "$(nproc)" --output-on-failure --quiet
+# What a throw could do after every call is not a branch that anybody wrote.
+gcovr --root . --filter src/ --exclude-throw-branches --exclude-unreachable-branches \
+  --object-directory "$folder" --print-summary --fail-under-branch "$required_branches" "$folder"
+echo "check: at least $required_branches % of the branches in src/ are covered"
+echo "check: passed"

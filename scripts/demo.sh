@@ -1,0 +1,17 @@
+#!/usr/bin/env bash
+# Builds the library and tells the story of examples/lifecycle.cpp on the real database file.
+# Installs what is missing (scripts/packages.sh, group build). Makes the database's folder if there
+# is none, and the database and the key of the encryption stand-in in it; rows it makes are removed.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+data=/var/packages/Keyloft/target/etc
+
+scripts/packages.sh build
+folder=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF | tail -n 1)
+if ! mkdir -p "$data" 2>/dev/null || [ ! -w "$data" ]; then
+  echo "demo: cannot write to $data: run it as root, or as the owner of that folder" >&2
+  exit 1
+fi
+umask 077 # the database holds tokens in plain text
+"$folder/examples/lifecycle"

@@ -1,0 +1,33 @@
+#!/usr/bin/env bash
+# Installs what the named groups need from Debian's packages, as far as it is missing.
+#
+#   scripts/packages.sh GROUP...     groups: build test check
+set -euo pipefail
+
+declare -A groups=(
+  [build]="g++ cmake ninja-build pkg-config libsqlite3-dev libjsoncpp-dev libboost-dev nettle-dev"
+  [test]="binutils libgtest-dev libgmock-dev"
+  [check]="clang-format clang-tidy gcovr shellcheck"
+)
+
+missing=()
+for group in "$@"; do
+  for package in ${groups[$group]:?"packages: no group $group"}; do
+    status=$(dpkg-query --show --showformat='${db:Status-Status}' "$package" 2>/dev/null || true)
+    [ "$status" = installed ] || missing+=("$package")
+  done
+done
+
+if [ ${#missing[@]} -eq 0 ]; then
+  echo "packages: everything for $* is there"
+  exit 0
+fi
+if [ "$(id -u)" -ne 0 ]; then
+  echo "packages: as root, please: apt-get install --no-install-recommends ${missing[*]}" >&2
+  exit 1
+fi
+echo "packages: installing ${missing[*]}"
+export DEBIAN_FRONTEND=noninteractive
+apt-get update -qq
+apt-get install -qq --yes --no-install-recommends "${missing[@]}" >/dev/null
+echo "packages: installed ${#missing[@]} for $*"
