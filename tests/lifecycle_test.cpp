@@ -34,7 +34,7 @@ class LifecycleTest : public StoreTest {
     for (const std::string table :
          {"oauth_meta", "oauth_clientInfo", "oauth_grantCode", "oauth_token", "oauth_log"})
       for (const std::string& row : query("SELECT * FROM " + table))
-        rows.push_back(table + ": " + row);
+        rows.push_back(std::string(table).append(": ").append(row));
     return rows;
   }
 

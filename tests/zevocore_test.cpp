@@ -32,7 +32,7 @@ class ZevocoreTest : public testing::Test {
     EXPECT_THAT(out_.substr(static_cast<std::size_t>(size)), Each('#'));
     return result;
   }
-  std::string out() const { return out_.c_str(); }
+  std::string out() const { return out_.substr(0, out_.find('\0')); }
 
   std::string out_;
 };

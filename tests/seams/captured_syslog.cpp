@@ -43,6 +43,7 @@ template <class Print>
 std::vector<std::string> printed(Print print) {
   const std::lock_guard<std::mutex> lock(guard);
   std::vector<std::string> result;
+  result.reserve(entries.size());
   for (const Entry& entry : entries) result.push_back(print(entry));
   return result;
 }
@@ -83,6 +84,7 @@ extern "C" void syslog(int priority, const char* format, ...) {
 }
 
 // What the compiler calls instead where _FORTIFY_SOURCE is set.
+// NOLINTNEXTLINE(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): its name is given
 extern "C" void __syslog_chk(int priority, int, const char* format, ...) {
   va_list arguments;
   va_start(arguments, format);

@@ -2,11 +2,11 @@
 
 #include <dlfcn.h>
 #include <sqlite3.h>
-#include <stdlib.h>
 #include <unistd.h>
 
 #include <cstdarg>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <stdexcept>
