@@ -56,6 +56,7 @@ std::string secondsFromNow(long seconds) {
 class Traces {
  public:
   ~Traces() {
+    if (undos_.empty()) return;
     bool removed = true;
     for (auto undo = undos_.rbegin(); undo != undos_.rend(); ++undo) removed &= (*undo)();
     if (removed)

@@ -4,7 +4,7 @@
 #   scripts/build.sh PRESET FOLDER [CMAKE OPTION...]
 #
 # FOLDER is a name below build/; where the checkout belongs to somebody else it lies in the user's
-# own cache folder instead. The last line tells where.
+# own cache folder instead, or in /tmp if there is none. The last line tells where.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -14,7 +14,14 @@ root=$PWD/build
 if ! mkdir -p "$root" 2>/dev/null || [ ! -w "$root" ] ||
   { [ -e "$root/$folder" ] && [ ! -w "$root/$folder" ]; }; then
   root=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth
-  mkdir -p "$root" 2>/dev/null || root=$(mktemp --directory --tmpdir zevooauth-build-XXXXXX)
+  if ! mkdir -p "$root" 2>/dev/null; then
+    root=/tmp/zevooauth-build-$(id -u)
+    mkdir -p -m 700 "$root"
+  fi
+  if [ ! -O "$root" ]; then
+    echo "build: $root belongs to somebody else" >&2
+    exit 1
+  fi
 fi
 
 echo "build: preset $preset in $root/$folder" >&2

@@ -7,11 +7,11 @@ cd "$(dirname "$0")/.."
 
 data=/var/packages/Keyloft/target/etc
 
-scripts/packages.sh build
-folder=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF | tail -n 1)
 if ! mkdir -p "$data" 2>/dev/null || [ ! -w "$data" ]; then
   echo "demo: cannot write to $data: run it as root, or as the owner of that folder" >&2
   exit 1
 fi
+scripts/packages.sh build
+folder=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF | tail -n 1)
 umask 077 # the database holds tokens in plain text
 "$folder/examples/lifecycle"
