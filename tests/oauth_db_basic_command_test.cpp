@@ -1,9 +1,10 @@
+#include "oauth_db_basic.h"
+
 #include <json/writer.h>
 
 #include <climits>
 
 #include "oauth_clientInfo.h"
-#include "oauth_db_basic.h"
 #include "oauth_log.h"
 #include "store_test.h"
 
@@ -24,7 +25,7 @@ std::string text(const Json::Value& document) {
   return Json::writeString(writer, document);
 }
 
-Json::Value array() { return Json::Value(Json::arrayValue); }
+Json::Value array() { return {Json::arrayValue}; }
 
 struct Column {
   const char* name;

@@ -1,3 +1,5 @@
+#include "oauth_db_basic.h"
+
 #include <dlfcn.h>
 #include <sqlite3.h>
 #include <unistd.h>
@@ -7,13 +9,11 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
-#include <memory>
 #include <optional>
 #include <stdexcept>
 #include <type_traits>
 
 #include "oauth_clientInfo.h"
-#include "oauth_db_basic.h"
 #include "oauth_grantCode.h"
 #include "oauth_log.h"
 #include "oauth_token.h"

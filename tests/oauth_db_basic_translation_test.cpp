@@ -1,3 +1,342 @@
-#include "oauth_db_basic.h"
+#include <json/reader.h>
 
+#include <stdexcept>
+
+#include "oauth_db_basic.h"
 #include "store_test.h"
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using ZEVOOAUTHSERVER::OAUTHDBBasic;
+
+namespace {
+
+Json::Value parse(const std::string& text) {
+  Json::Value document;
+  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+  if (!reader->parse(text.data(), text.data() + text.size(), &document, nullptr))
+    throw std::invalid_argument(text);
+  return document;
+}
+
+Json::Value member(const std::string& name, const Json::Value& value) {
+  Json::Value document;
+  document[name] = value;
+  return document;
+}
+
+struct Row {
+  const char* json;
+  const char* sql;
+};
+
+// Every row's document must become exactly the row's text.
+template <class Rows, class Translate>
+void expectEach(const Rows& rows, Translate translate) {
+  for (const Row& row : rows) EXPECT_EQ(row.sql, translate(parse(row.json))) << row.json;
+}
+
+// What a value looks like in any fragment. A null is the one that they do not share.
+constexpr Row kValues[] = {
+    {R"("abc")", "'abc'"},
+    {R"("")", "''"},
+    {R"(" a  b ")", "' a  b '"},
+    {R"("5")", "'5'"},
+    {R"("NULL")", "'NULL'"},
+    // Single quotes, all of them and nothing else.
+    {R"("O'Hara")", "'O''Hara'"},
+    {R"("'")", "''''"},
+    {R"("''")", "''''''"},
+    {R"("'a'b'")", "'''a''b'''"},
+    {R"("O''Brien")", "'O''''Brien'"},
+    {R"("x'; DROP TABLE oauth_log; --")", "'x''; DROP TABLE oauth_log; --'"},
+    {R"("\\ % _ \" ` ; -- /* ? $1")", R"('\ % _ " ` ; -- /* ? $1')"},
+    {R"("\t\n\r\u0001\u007f")", "'\t\n\r\x01\x7f'"},
+    {R"("Grüße, 東京 🔑")", "'Grüße, 東京 🔑'"},
+    // Integers as decimal text.
+    {"5", "'5'"},
+    {"0", "'0'"},
+    {"-1", "'-1'"},
+    {"2147483647", "'2147483647'"},
+    {"2147483648", "'2147483648'"},
+    {"-2147483649", "'-2147483649'"},
+    {"9223372036854775807", "'9223372036854775807'"},
+    {"-9223372036854775808", "'-9223372036854775808'"},
+    {"18446744073709551615", "'18446744073709551615'"},
+    // SQLite would take the statement to end at a NUL byte, so the value ends there.
+    {R"("a\u0000b")", "'a'"},
+    {R"("\u0000' OR 1")", "''"},
+    {R"("it's\u0000'")", "'it''s'"},
+};
+
+// Values that no text can be made of.
+constexpr const char* kRefused[] = {R"({"a": {}})", R"({"a": []})", R"({"a": {"b": "1"}})",
+                                    R"({"a": ["1"]})", R"({"a": "1", "b": {}})"};
+
+// 200000 bytes, every other a single quote, and what it reads like in a fragment.
+std::string manyQuotes() {
+  std::string text;
+  for (int i = 0; i < 100'000; ++i) text += "a'";
+  return text;
+}
+std::string manyQuotesQuoted() {
+  std::string text = "'";
+  for (int i = 0; i < 100'000; ++i) text += "a''";
+  return text + "'";
+}
+
+class TranslationTest : public StoreTest {
+ protected:
+  // The lines that the translation sends with every class of diagnostics on.
+  template <class Body>
+  std::vector<std::string> traceOf(Body body) const {
+    withDiagnostics(15, body);
+    return log_.lines();
+  }
+};
+
+// --- Name and value pairs ---
+
+class PairsTest : public TranslationTest {
+ protected:
+  static std::string concatenated(const Json::Value& values) {
+    return OAUTHDBBasic::ConcateParam(values, ", ");
+  }
+};
+
+constexpr Row kPairs[] = {
+    {"{}", ""},
+    {"null", ""},
+    {R"({"a": "1"})", "a='1'"},
+    {R"({"b": "2", "a": "1"})", "a='1', b='2'"},
+    {R"({"c": "3", "a": "1", "b": "2"})", "a='1', b='2', c='3'"},
+    {R"({"a": "", "b": ""})", "a='', b=''"},
+    {R"({"a": null})", "a=''"},
+    {R"({"a": null, "b": "2"})", "a='', b='2'"},
+    {R"({"timestamp": null})", "timestamp=''"},
+    {R"({"id": 5, "name": "O'Hara"})", "id='5', name='O''Hara'"},
+    {R"({"a": "x, y", "b": "z"})", "a='x, y', b='z'"},
+    // Byte order: capitals, then the underscore, then small letters, a prefix before the longer
+    // name, and what is not ASCII last.
+    {R"({"ü": "6", "aa": "5", "a": "4", "_": "3", "Z": "2", "B": "1"})",
+     "B='1', Z='2', _='3', a='4', aa='5', ü='6'"},
+    {R"({"client_id": "x", "client": "y"})", "client='y', client_id='x'"},
+    // Names are the system's own.
+    {R"({"it's": "1"})", "it's='1'"},
+    {R"({"a b": "1", "c\\d": "2"})", "a b='1', c\\d='2'"},
+};
+
+TEST_F(PairsTest, ComeInByteOrderOfTheirNames) { expectEach(kPairs, concatenated); }
+
+TEST_F(PairsTest, QuoteTheirValues) {
+  for (const Row& value : kValues)
+    EXPECT_EQ(std::string("a=") + value.sql, concatenated(member("a", parse(value.json))))
+        << value.json;
+}
+
+TEST_F(PairsTest, TakeTheSeparatorAsItIs) {
+  const Json::Value values = parse(R"({"b": "2", "a": "1", "c": "3"})");
+  EXPECT_EQ("a='1' and b='2' and c='3'", OAUTHDBBasic::ConcateParam(values, " and "));
+  EXPECT_EQ("a='1'b='2'c='3'", OAUTHDBBasic::ConcateParam(values, ""));
+  EXPECT_EQ("a='1''b='2''c='3'", OAUTHDBBasic::ConcateParam(values, "'"));
+}
+
+TEST_F(PairsTest, HaveNoLimitOfLength) {
+  EXPECT_EQ("a=" + manyQuotesQuoted(), concatenated(member("a", manyQuotes())));
+}
+
+TEST_F(PairsTest, PassOnTheRefusalOfAValue) {
+  for (const char* const json : kRefused)
+    EXPECT_THROW(concatenated(parse(json)), Json::Exception) << json;
+}
+
+TEST_F(PairsTest, AreTraced) {
+  EXPECT_THAT(traceOf([] { concatenated(parse(R"({"a": "1"})")); }),
+              ElementsAre("3 oauth_db_basic.cpp ==> ConcateParam"));
+  EXPECT_THAT(log_.formats(), ElementsAre("%s:%d ==> %s"));
+}
+
+// --- The condition ---
+
+class ConditionTest : public TranslationTest {};
+
+constexpr Row kConditions[] = {
+    {"{}", ""},
+    {"null", ""},
+    {R"({"id": 5})", " WHERE id='5'"},
+    {R"({"client_id": "abc", "code": "x1"})", " WHERE client_id='abc' and code='x1'"},
+    {R"({"c": "3", "b": "2", "a": "1"})", " WHERE a='1' and b='2' and c='3'"},
+    {R"({"a": null})", " WHERE a=''"},
+    {R"({"timestamp": null})", " WHERE timestamp=''"},
+    {R"({"scope": "read and write"})", " WHERE scope='read and write'"},
+    {R"({"it's": "1"})", " WHERE it's='1'"},
+};
+
+TEST_F(ConditionTest, JoinsItsPairsOrIsNothing) {
+  expectEach(kConditions, OAUTHDBBasic::GetConditionParam);
+}
+
+TEST_F(ConditionTest, QuotesItsValues) {
+  for (const Row& value : kValues)
+    EXPECT_EQ(std::string(" WHERE a=") + value.sql,
+              OAUTHDBBasic::GetConditionParam(member("a", parse(value.json))))
+        << value.json;
+}
+
+TEST_F(ConditionTest, PassesOnTheRefusalOfAValue) {
+  for (const char* const json : kRefused)
+    EXPECT_THROW(OAUTHDBBasic::GetConditionParam(parse(json)), Json::Exception) << json;
+}
+
+TEST_F(ConditionTest, IsTraced) {
+  EXPECT_THAT(traceOf([] { OAUTHDBBasic::GetConditionParam(parse(R"({"a": "1"})")); }),
+              ElementsAre("3 oauth_db_basic.cpp ==> GetConditionParam",
+                          "3 oauth_db_basic.cpp ==> ConcateParam"));
+  EXPECT_THAT(log_.formats(), ElementsAre("%s:%d ==> %s", "%s:%d ==> %s"));
+}
+
+TEST_F(ConditionTest, MakesNoPairsOfNothing) {
+  EXPECT_THAT(traceOf([] { OAUTHDBBasic::GetConditionParam(parse("{}")); }),
+              ElementsAre("3 oauth_db_basic.cpp ==> GetConditionParam"));
+}
+
+// --- What an update sets ---
+
+class UpdateTest : public TranslationTest {};
+
+constexpr Row kUpdates[] = {
+    {R"({"modified": {"enable": "0", "scope": "a b"}, "condition": {"client_id": "abc"}})",
+     " SET enable='0', scope='a b' WHERE client_id='abc'"},
+    {R"({"modified": {"c": "3", "b": "2", "a": "1"}, "condition": {"e": "5", "d": "4"}})",
+     " SET a='1', b='2', c='3' WHERE d='4' and e='5'"},
+    {R"({"modified": {"a": "1"}})", " SET a='1'"},
+    {R"({"modified": {"a": "1"}, "condition": {}})", " SET a='1'"},
+    {R"({"modified": {"a": "1"}, "condition": null})", " SET a='1'"},
+    // Nothing to set is left to the database to refuse.
+    {R"({"modified": {}, "condition": {"id": 5}})", " SET  WHERE id='5'"},
+    {R"({"modified": null, "condition": {"id": 5}})", " SET  WHERE id='5'"},
+    {R"({"condition": {"id": 5}})", " SET  WHERE id='5'"},
+    {"{}", " SET "},
+    {"null", " SET "},
+    {R"({"modified": {"a": null, "timestamp": null}})", " SET a='', timestamp=''"},
+    {R"({"modified": {"name": "it's"}, "condition": {"name": "O'Hara"}})",
+     " SET name='it''s' WHERE name='O''Hara'"},
+    // Only reading knows the other keys.
+    {R"({"modified": {"a": "1"}, "condition_like": "b like '%c%'", "option": "LIMIT 1"})",
+     " SET a='1'"},
+};
+
+TEST_F(UpdateTest, SetsWhatIsModifiedUnderTheCondition) {
+  expectEach(kUpdates, OAUTHDBBasic::GetUpdateParam);
+}
+
+TEST_F(UpdateTest, QuotesItsValues) {
+  for (const Row& value : kValues) {
+    Json::Value request;
+    request["modified"]["a"] = parse(value.json);
+    request["condition"]["b"] = parse(value.json);
+    EXPECT_EQ(std::string(" SET a=") + value.sql + " WHERE b=" + value.sql,
+              OAUTHDBBasic::GetUpdateParam(request))
+        << value.json;
+  }
+}
+
+TEST_F(UpdateTest, PassesOnTheRefusalOfAValue) {
+  for (const char* const key : {"modified", "condition"})
+    for (const char* const json : kRefused)
+      EXPECT_THROW(OAUTHDBBasic::GetUpdateParam(member(key, parse(json))), Json::Exception)
+          << key << " " << json;
+}
+
+TEST_F(UpdateTest, IsTraced) {
+  EXPECT_THAT(
+      traceOf([] {
+        OAUTHDBBasic::GetUpdateParam(parse(R"({"modified": {"a": "1"}, "condition": {"b": "2"}})"));
+      }),
+      ElementsAre(
+          "3 oauth_db_basic.cpp ==> GetUpdateParam", "3 oauth_db_basic.cpp ==> ConcateParam",
+          "3 oauth_db_basic.cpp ==> GetConditionParam", "3 oauth_db_basic.cpp ==> ConcateParam"));
+}
+
+// --- What an insert writes ---
+
+class InsertTest : public TranslationTest {};
+
+constexpr Row kInserts[] = {
+    {R"({"name": "O'Hara", "id": null, "timestamp": null})",
+     " (id, name, timestamp) VALUES(NULL, 'O''Hara', strftime('%s','now'))"},
+    {R"({"a": "1"})", " (a) VALUES('1')"},
+    {R"({"b": "2", "a": "1"})", " (a, b) VALUES('1', '2')"},
+    {R"({"a": "", "b": ""})", " (a, b) VALUES('', '')"},
+    {R"({"a": null, "b": null})", " (a, b) VALUES(NULL, NULL)"},
+    {R"({"id": 5, "name": "x"})", " (id, name) VALUES('5', 'x')"},
+    {R"({"ü": "5", "aa": "4", "a": "3", "_": "2", "B": "1"})",
+     " (B, _, a, aa, ü) VALUES('1', '2', '3', '4', '5')"},
+    {R"({"it's": "1"})", " (it's) VALUES('1')"},
+    {R"({"a": "x, y) VALUES("})", " (a) VALUES('x, y) VALUES(')"},
+    // An empty record is left to the database to refuse.
+    {"{}", " () VALUES()"},
+    {"null", " () VALUES()"},
+    // Only a null under this very name asks for the database's clock.
+    {R"({"timestamp": null})", " (timestamp) VALUES(strftime('%s','now'))"},
+    {R"({"timestamp": "1700000000"})", " (timestamp) VALUES('1700000000')"},
+    {R"({"timestamp": 1700000000})", " (timestamp) VALUES('1700000000')"},
+    {R"({"timestamp": ""})", " (timestamp) VALUES('')"},
+    {R"json({"timestamp": "strftime('%s','now')"})json",
+     " (timestamp) VALUES('strftime(''%s'',''now'')')"},
+    {R"({"Timestamp": null, "expired_time": null, "time": null, "timestamps": null})",
+     " (Timestamp, expired_time, time, timestamps) VALUES(NULL, NULL, NULL, NULL)"},
+    // The keys of a request are columns like any other here.
+    {R"({"condition": "a", "modified": null})", " (condition, modified) VALUES('a', NULL)"},
+};
+
+TEST_F(InsertTest, ListsColumnsBesideTheirValues) {
+  expectEach(kInserts, OAUTHDBBasic::GetInsertParam);
+}
+
+TEST_F(InsertTest, QuotesItsValues) {
+  for (const Row& value : kValues)
+    EXPECT_EQ(std::string(" (a) VALUES(") + value.sql + ")",
+              OAUTHDBBasic::GetInsertParam(member("a", parse(value.json))))
+        << value.json;
+}
+
+TEST_F(InsertTest, HasNoLimitOfLength) {
+  EXPECT_EQ(" (a) VALUES(" + manyQuotesQuoted() + ")",
+            OAUTHDBBasic::GetInsertParam(member("a", manyQuotes())));
+}
+
+TEST_F(InsertTest, PassesOnTheRefusalOfAValue) {
+  for (const char* const json : kRefused)
+    EXPECT_THROW(OAUTHDBBasic::GetInsertParam(parse(json)), Json::Exception) << json;
+}
+
+TEST_F(InsertTest, IsTraced) {
+  EXPECT_THAT(traceOf([] { OAUTHDBBasic::GetInsertParam(parse(R"({"a": "1", "b": null})")); }),
+              ElementsAre("3 oauth_db_basic.cpp ==> GetInsertParam"));
+  EXPECT_THAT(log_.formats(), ElementsAre("%s:%d ==> %s"));
+}
+
+// --- All four ---
+
+void translateEverything() {
+  const Json::Value request = parse(R"({"modified": {"a": "1"}, "condition": {"b": "2"}})");
+  OAUTHDBBasic::GetInsertParam(request["modified"]);
+  OAUTHDBBasic::ConcateParam(request["modified"], ", ");
+  OAUTHDBBasic::GetConditionParam(request["condition"]);
+  OAUTHDBBasic::GetUpdateParam(request);
+}
+
+TEST_F(TranslationTest, IsSilentWithoutEntryTraces) {
+  withDiagnostics(7, translateEverything);
+  EXPECT_THAT(log_.lines(), IsEmpty());
+}
+
+TEST_F(TranslationTest, NeedsNoDatabase) {
+  translateEverything();
+  EXPECT_THAT(files_.calls(), IsEmpty());
+  EXPECT_EQ("", databaseBytes());
+  EXPECT_THAT(log_.lines(), IsEmpty());
+}
+
+}  // namespace

@@ -106,7 +106,7 @@ class GrantCodeTest : public StoreTest {
   Lines rows() const { return query("SELECT * FROM oauth_grantCode ORDER BY id"); }
   Lines ids() const { return query("SELECT id FROM oauth_grantCode ORDER BY id"); }
   std::string stored(const char* column) const {
-    return query(std::string("SELECT ") + column + " FROM oauth_grantCode").front();
+    return query(std::string("SELECT ") + column + " FROM oauth_grantCode").at(0);
   }
 
   // Writes a row past the store, where no length rule holds. An id serves as the code's

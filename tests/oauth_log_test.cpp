@@ -258,7 +258,7 @@ TEST_F(LogRotationTest, DoesNotSpoilTheInsertsResult) {
 }
 
 TEST_F(LogRotationTest, NamesItsFailureWithTheDebugSwitchAlone) {
-  OAUTHDBLog(std::string("oauth_log")).Add("old");
+  OAUTHDBLog("oauth_log").Add("old");
   ageRowsBy(10);
   writeSettings(R"({"log_max": 1, "log_level": 0})");
   createDebugMarker();
@@ -360,7 +360,7 @@ TEST_F(LogGetTest, ComparesAQuoteInTheKeywordAsItIs) {
 }
 
 TEST_F(LogGetTest, FindsAWrittenQuoteByItsStoredPair) {
-  OAUTHDBLog(std::string("oauth_log")).Add("O'Hara");
+  OAUTHDBLog("oauth_log").Add("O'Hara");
   EXPECT_THAT(found("O'Hara", ""), IsEmpty());
   EXPECT_THAT(found("O''Hara", ""), ElementsAre("O''Hara"));
 }

@@ -112,7 +112,7 @@ class TokenTest : public StoreTest {
   Lines rows() const { return query("SELECT * FROM oauth_token ORDER BY id"); }
   Lines ids() const { return query("SELECT id FROM oauth_token ORDER BY id"); }
   std::string stored(const char* column) const {
-    return query(std::string("SELECT ") + column + " FROM oauth_token").front();
+    return query(std::string("SELECT ") + column + " FROM oauth_token").at(0);
   }
 
   // Writes a row past the store, where no length rule holds. An id serves as the token's

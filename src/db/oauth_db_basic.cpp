@@ -26,18 +26,24 @@ namespace {
 class RaisedPrivilege {
  public:
   RaisedPrivilege() : user_(geteuid()), group_(getegid()) {
-    if ((group_ == kRoot || setGroup(kRoot)) && (user_ == kRoot || setUser(kRoot)))
+    if ((group_ == kRoot || setGroup(kRoot)) && (user_ == kRoot || setUser(kRoot))) {
       errno = 0;
-    else
-      refused("ENTERCriticalSection");
+      return;
+    }
+    errno = 1;
+    OAUTH_LOG(LOG_AUTH | LOG_ERR, "ERROR: ENTERCriticalSection");
+    errno = 1;  // whatever sending the line made of it
   }
   ~RaisedPrivilege() {
     const bool user = geteuid() != user_;
     const bool group = getegid() != group_;
-    if ((!user || setUser(kRoot)) && (!group || setGroup(group_)) && (!user || setUser(user_)))
+    if ((!user || setUser(kRoot)) && (!group || setGroup(group_)) && (!user || setUser(user_))) {
       errno = 0;
-    else
-      refused("LEAVECriticalSection");
+      return;
+    }
+    errno = 1;
+    OAUTH_LOG(LOG_AUTH | LOG_ERR, "ERROR: LEAVECriticalSection");
+    errno = 1;
   }
   RaisedPrivilege(const RaisedPrivilege&) = delete;
   RaisedPrivilege& operator=(const RaisedPrivilege&) = delete;
@@ -61,12 +67,6 @@ class RaisedPrivilege {
     if (id == kRoot)
       OAUTH_LOG(LOG_AUTH | LOG_INFO, "WARNING: set%s(%d, %d, %d)", call, -1, target, -1);
     return true;
-  }
-
-  static void refused(const char* section) {
-    errno = 1;
-    OAUTH_LOG(LOG_AUTH | LOG_ERR, "ERROR: %s", section);
-    errno = 1;  // whatever sending the line made of it
   }
 
   const unsigned user_, group_;

@@ -18,7 +18,7 @@ std::mutex guard;
 std::vector<Entry> entries;
 CapturedSyslog* current = nullptr;
 
-void record(int priority, const char* format, va_list arguments) {
+[[gnu::format(printf, 2, 0)]] void record(int priority, const char* format, va_list arguments) {
   va_list again;
   va_copy(again, arguments);
   const int length = std::vsnprintf(nullptr, 0, format, arguments);

@@ -15,6 +15,7 @@ struct State {
   int encryptCountdown = 0, decryptCountdown = 0;  // fails on reaching 0
   bool overfill = false;
   std::optional<std::string> remoteIp;
+  int remoteIpCode = 0;
   std::vector<std::string> calls;
 };
 std::mutex guard;
@@ -51,7 +52,11 @@ void FakeHost::failEncrypt(int nth) { state.encryptCountdown = nth; }
 void FakeHost::failDecrypt(int nth) { state.decryptCountdown = nth; }
 void FakeHost::overfill() { state.overfill = true; }
 const std::vector<std::string>& FakeHost::calls() const { return state.calls; }
-void FakeHost::setRemoteIp(const std::string& address) { state.remoteIp = address; }
+void FakeHost::setRemoteIp(const std::string& address) { setRemoteIp(address, 0); }
+void FakeHost::setRemoteIp(const std::string& address, int code) {
+  state.remoteIp = address;
+  state.remoteIpCode = code;
+}
 
 std::string FakeHost::sealed(const std::string& plain) {
   return kMark + std::string(plain.rbegin(), plain.rend());
@@ -77,5 +82,5 @@ extern "C" int ZevoCgiGetRemoteIP(char* out, int outSize) {
   const std::lock_guard<std::mutex> lock(guard);
   note("ip", outSize);
   if (!state.remoteIp && !state.overfill) return -1;
-  return put(state.remoteIp.value_or(""), out, outSize) ? 0 : -1;
+  return put(state.remoteIp.value_or(""), out, outSize) ? state.remoteIpCode : -1;
 }

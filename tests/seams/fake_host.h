@@ -25,6 +25,8 @@ class FakeHost {
 
   // Inside a web request of this client; outside of any at first.
   void setRemoteIp(const std::string& address);
+  // Writes the address and answers this code, which is no success unless it is 0.
+  void setRemoteIp(const std::string& address, int code);
 
   static std::string sealed(const std::string& plain);
 };
