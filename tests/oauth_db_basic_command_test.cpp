@@ -1,9 +1,8 @@
 #include "oauth_db_basic.h"
 
-#include <json/writer.h>
-
 #include <climits>
 
+#include "json_text.h"
 #include "oauth_clientInfo.h"
 #include "oauth_log.h"
 #include "store_test.h"
@@ -16,14 +15,6 @@ using ZEVOOAUTHSERVER::OAUTHDBClientInfo;
 using ZEVOOAUTHSERVER::OAUTHDBLog;
 
 namespace {
-
-// A document on one line, members in the order of their names: [{"a":"1","b":"x"}]
-std::string text(const Json::Value& document) {
-  Json::StreamWriterBuilder writer;
-  writer["indentation"] = "";
-  writer["emitUTF8"] = true;
-  return Json::writeString(writer, document);
-}
 
 Json::Value array() { return {Json::arrayValue}; }
 

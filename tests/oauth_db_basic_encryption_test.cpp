@@ -1,8 +1,7 @@
-#include <json/reader.h>
-#include <json/writer.h>
 
 #include <stdexcept>
 
+#include "json_text.h"
 #include "oauth_clientInfo.h"
 #include "oauth_db_basic.h"
 #include "oauth_grantCode.h"
@@ -17,22 +16,6 @@ using ZEVOOAUTHSERVER::OAUTHDBGrantCode;
 using ZEVOOAUTHSERVER::OAUTHDBToken;
 
 namespace {
-
-Json::Value parse(const std::string& text) {
-  Json::Value document;
-  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-  if (!reader->parse(text.data(), text.data() + text.size(), &document, nullptr))
-    throw std::invalid_argument(text);
-  return document;
-}
-
-// A document on one line, members in the order of their names: [{"a":"1","b":"x"}]
-std::string text(const Json::Value& document) {
-  Json::StreamWriterBuilder writer;
-  writer["indentation"] = "";
-  writer["emitUTF8"] = true;
-  return Json::writeString(writer, document);
-}
 
 // --- A document ---
 
@@ -171,13 +154,9 @@ TEST_F(EncryptionTest, FailsOnAResultOf1024Bytes) {
 TEST_F(EncryptionTest, TakesNoMoreThanTheBufferHolds) {
   host_.overfill();
   EXPECT_TRUE(encrypt(R"({"client_id":"abc"})"));
-  const std::string encrypted = doc_["client_id"].asString();
-  EXPECT_LE(encrypted.size(), 1024U);
-  EXPECT_EQ(times(1023, 'x'), encrypted.substr(0, 1023));
+  EXPECT_EQ(times(1023, 'x'), doc_["client_id"].asString());
   EXPECT_TRUE(decrypt(R"({"client_id":"sealed:cba"})"));
-  const std::string decrypted = doc_["client_id"].asString();
-  EXPECT_LE(decrypted.size(), 1024U);
-  EXPECT_EQ(times(1023, 'x'), decrypted.substr(0, 1023));
+  EXPECT_EQ(times(1023, 'x'), doc_["client_id"].asString());
 }
 
 TEST_F(EncryptionTest, LeavesTheSecretWhenTheIdentifierFails) {

@@ -1,9 +1,8 @@
-#include <json/reader.h>
-#include <json/writer.h>
 
 #include <optional>
 #include <stdexcept>
 
+#include "json_text.h"
 #include "oauth_db_basic.h"
 #include "oauth_token.h"
 #include "store_test.h"
@@ -16,22 +15,6 @@ using ZEVOOAUTHSERVER::OAUTHDBBasic;
 using ZEVOOAUTHSERVER::OAUTHDBToken;
 
 namespace {
-
-Json::Value parse(const std::string& text) {
-  Json::Value document;
-  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-  if (!reader->parse(text.data(), text.data() + text.size(), &document, nullptr))
-    throw std::invalid_argument(text);
-  return document;
-}
-
-// A document on one line, members in the order of their names: [{"a":"1","b":"x"}]
-std::string text(const Json::Value& document) {
-  Json::StreamWriterBuilder writer;
-  writer["indentation"] = "";
-  writer["emitUTF8"] = true;
-  return Json::writeString(writer, document);
-}
 
 constexpr const char* kTables[] = {"oauth_clientInfo", "oauth_grantCode", "oauth_token",
                                    "oauth_log"};
@@ -400,6 +383,19 @@ TEST_F(DeleteTest, RemovesEveryRowWithoutACondition) {
   EXPECT_TRUE(del("{}"));
   EXPECT_THAT(names(), IsEmpty());
   expectNoFailure();
+}
+
+// A condition that is no object must not pass for none, which would take every row.
+TEST_F(DeleteTest, RemovesNothingForAConditionOfAnotherKind) {
+  for (const std::string condition : {R"([])", R"(["b"])", R"("b")", R"("")", "7", "true"}) {
+    SCOPED_TRACE(condition);
+    log_.clear();
+    EXPECT_FALSE(del(R"({"condition": )" + condition + "}"));
+    EXPECT_EQ(1, store_->GetErrCode());
+    EXPECT_EQ(2U, log_.lines().size());
+    EXPECT_EQ("3 oauth_db_basic.cpp Delete failed[t]", log_.lines().back());
+    EXPECT_THAT(names(), ElementsAre("a", "b", "b", "%"));
+  }
 }
 
 TEST_F(DeleteTest, TakesAnIntegerForARowId) {

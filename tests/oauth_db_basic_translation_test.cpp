@@ -1,7 +1,7 @@
-#include <json/reader.h>
 
 #include <stdexcept>
 
+#include "json_text.h"
 #include "oauth_db_basic.h"
 #include "store_test.h"
 
@@ -10,14 +10,6 @@ using testing::IsEmpty;
 using ZEVOOAUTHSERVER::OAUTHDBBasic;
 
 namespace {
-
-Json::Value parse(const std::string& text) {
-  Json::Value document;
-  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-  if (!reader->parse(text.data(), text.data() + text.size(), &document, nullptr))
-    throw std::invalid_argument(text);
-  return document;
-}
 
 Json::Value member(const std::string& name, const Json::Value& value) {
   Json::Value document;

@@ -78,7 +78,7 @@ using HostCipher = int (*)(const char* text, char* out, int outSize);
 bool convert(HostCipher cipher, const std::string& text, std::string& out) {
   char buffer[1024] = {};
   if (cipher(text.c_str(), buffer, sizeof buffer) == 0) return false;
-  out.assign(buffer, strnlen(buffer, sizeof buffer));
+  out.assign(buffer, strnlen(buffer, sizeof buffer - 1));
   return true;
 }
 
@@ -356,14 +356,17 @@ std::string OAUTHDBBasic::ConcateParam(const Json::Value& values, const std::str
 
 std::string OAUTHDBBasic::GetConditionParam(const Json::Value& condition) {
   OAUTH_ENTER();
-  if (condition.empty()) return {};
+  // An array is nobody's condition, an empty one neither: its statement must fail, not take all.
+  if (condition.empty() && !condition.isArray()) return {};
   return " WHERE " + ConcateParam(condition, " and ");
 }
 
 std::string OAUTHDBBasic::GetUpdateParam(const Json::Value& request) {
   OAUTH_ENTER();
-  return " SET " + ConcateParam(request[names::request::kModified], ", ") +
-         GetConditionParam(request[names::request::kCondition]);
+  // A statement each: operands of one sum are evaluated, and traced, in any order.
+  const std::string modified = ConcateParam(request[names::request::kModified], ", ");
+  const std::string condition = GetConditionParam(request[names::request::kCondition]);
+  return " SET " + modified + condition;
 }
 
 // --- Record operations ---
