@@ -16,7 +16,7 @@ if ! mkdir -p "$root" 2>/dev/null || [ ! -w "$root" ] ||
   root=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth
   if ! mkdir -p "$root" 2>/dev/null; then
     root=/tmp/zevooauth-build-$(id -u)
-    mkdir -p -m 700 "$root"
+    [ -d "$root" ] || mkdir -m 700 "$root"
   fi
   if [ ! -O "$root" ]; then
     echo "build: $root belongs to somebody else" >&2

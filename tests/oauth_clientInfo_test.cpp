@@ -1010,6 +1010,48 @@ TEST_F(ClientInfoIndexTest, IsZeroAfterAFailedRead) {
 
 // --- Diagnostics ---
 
+Lines linesAfterOpeningTheLog(const Client& client) {
+  const std::string insertClient =
+      "INSERT INTO oauth_clientInfo (client_id, client_secret, display_name, enable, id, "
+      "redirect_uri, scope) VALUES('" +
+      FakeHost::sealed(client.client_id) + "', '" + FakeHost::sealed(client.client_secret) +
+      "', 'Mail', '1', NULL, 'example.com/cb', 'read');";
+  const std::string insertMessage =
+      "INSERT INTO oauth_log (id, msg, timestamp) "
+      "VALUES(NULL, 'Application registed[Mail]', strftime('%s','now'));";
+  const std::string trim =
+      "DELETE FROM oauth_log WHERE timestamp IN (SELECT timestamp FROM oauth_log "
+      "ORDER BY timestamp DESC LIMIT -1 OFFSET 1000)";
+  return {
+      "3 oauth_db_basic.cpp ==> DBCheckRowMax",
+      "3 oauth_db_basic.cpp ==> DBGetRowCount",
+      "3 oauth_db_basic.cpp ==> DBCmd",
+      "3 oauth_db_basic.cpp ==> DBCmdRun[SELECT COUNT(*) FROM oauth_clientInfo;]",
+      "3 oauth_db_basic.cpp ==> TabCountCallback",
+      "3 oauth_db_basic.cpp Table Row Count[0]",
+      "3 oauth_utils.cpp checkStrLen[" + client.client_id + "]",
+      "3 oauth_utils.cpp checkStrLen[" + client.client_secret + "]",
+      "3 oauth_utils.cpp checkStrLen[example.com/cb]",
+      "3 oauth_utils.cpp checkStrLen[read]",
+      "3 oauth_utils.cpp checkStrLen[Mail]",
+      "3 oauth_db_basic.cpp ==> DBAdd",
+      "3 oauth_db_basic.cpp ==> ParamEncrypt[client_id]",
+      "3 oauth_db_basic.cpp ==> ParamEncrypt[client_secret]",
+      "3 oauth_db_basic.cpp ==> GetInsertParam",
+      "3 oauth_db_basic.cpp ==> DBCmd",
+      "3 oauth_db_basic.cpp ==> DBCmdRun[" + insertClient + "]",
+      "3 oauth_db_basic.cpp [oauth_clientInfo] Add success, changed[1]",
+      "3 oauth_log.cpp ==> Add",
+      "3 oauth_db_basic.cpp ==> DBAdd",
+      "3 oauth_db_basic.cpp ==> GetInsertParam",
+      "3 oauth_db_basic.cpp ==> DBCmd",
+      "3 oauth_db_basic.cpp ==> DBCmdRun[" + insertMessage + "]",
+      "3 oauth_db_basic.cpp [oauth_log] Add success, changed[1]",
+      "3 oauth_db_basic.cpp ==> DBCmd",
+      "3 oauth_db_basic.cpp ==> DBCmdRun[" + trim + "]",
+  };
+}
+
 class ClientInfoTraceTest : public ClientInfoTest {
  protected:
   using Registration = int (*)(OAUTHDBClientInfo&, const Client&, Json::Value&);
@@ -1030,40 +1072,7 @@ class ClientInfoTraceTest : public ClientInfoTest {
       client.client_id = result["client_id"].asString();
       client.client_secret = result["client_secret"].asString();
     });
-    const std::string sealedId = FakeHost::sealed(client.client_id);
-    const std::string sealedSecret = FakeHost::sealed(client.client_secret);
-    const Lines after{
-        "3 oauth_db_basic.cpp ==> DBCheckRowMax",
-        "3 oauth_db_basic.cpp ==> DBGetRowCount",
-        "3 oauth_db_basic.cpp ==> DBCmd",
-        "3 oauth_db_basic.cpp ==> DBCmdRun[SELECT COUNT(*) FROM oauth_clientInfo;]",
-        "3 oauth_db_basic.cpp ==> TabCountCallback",
-        "3 oauth_db_basic.cpp Table Row Count[0]",
-        "3 oauth_utils.cpp checkStrLen[" + client.client_id + "]",
-        "3 oauth_utils.cpp checkStrLen[" + client.client_secret + "]",
-        "3 oauth_utils.cpp checkStrLen[example.com/cb]",
-        "3 oauth_utils.cpp checkStrLen[read]",
-        "3 oauth_utils.cpp checkStrLen[Mail]",
-        "3 oauth_db_basic.cpp ==> DBAdd",
-        "3 oauth_db_basic.cpp ==> ParamEncrypt[client_id]",
-        "3 oauth_db_basic.cpp ==> ParamEncrypt[client_secret]",
-        "3 oauth_db_basic.cpp ==> GetInsertParam",
-        "3 oauth_db_basic.cpp ==> DBCmd",
-        "3 oauth_db_basic.cpp ==> DBCmdRun[INSERT INTO oauth_clientInfo (client_id, "
-        "client_secret, display_name, enable, id, redirect_uri, scope) VALUES('" +
-            sealedId + "', '" + sealedSecret + "', 'Mail', '1', NULL, 'example.com/cb', 'read');]",
-        "3 oauth_db_basic.cpp [oauth_clientInfo] Add success, changed[1]",
-        "3 oauth_log.cpp ==> Add",
-        "3 oauth_db_basic.cpp ==> DBAdd",
-        "3 oauth_db_basic.cpp ==> GetInsertParam",
-        "3 oauth_db_basic.cpp ==> DBCmd",
-        "3 oauth_db_basic.cpp ==> DBCmdRun[INSERT INTO oauth_log (id, msg, timestamp) "
-        "VALUES(NULL, 'Application registed[Mail]', strftime('%s','now'));]",
-        "3 oauth_db_basic.cpp [oauth_log] Add success, changed[1]",
-        "3 oauth_db_basic.cpp ==> DBCmd",
-        "3 oauth_db_basic.cpp ==> DBCmdRun[DELETE FROM oauth_log WHERE timestamp IN (SELECT "
-        "timestamp FROM oauth_log ORDER BY timestamp DESC LIMIT -1 OFFSET 1000)]",
-    };
+    const Lines after = linesAfterOpeningTheLog(client);
     Lines expected{"3 oauth_clientInfo.cpp ==> Add"};
     expected.insert(expected.end(), opening.begin(), opening.end());
     expected.insert(expected.end(), after.begin(), after.end());
