@@ -25,7 +25,7 @@ user=()
 [ "$(id -u)" -ne 0 ] || user=(setpriv --reuid=65534 --regid=65534 --clear-groups)
 if "${user[@]}" test -x "$folder/tests"; then
   for program in "$folder"/tests/*_test; do
-    "${user[@]}" "$program" --gtest_shuffle --gtest_brief=1
+    "${user[@]}" "$program" --gtest_shuffle --gtest_brief=1 | grep -v '^Running main'
   done
   echo "check: tests pass in any order, in one process, for an ordinary user"
 else
@@ -34,9 +34,11 @@ fi
 
 folder=$(scripts/build.sh coverage coverage | tail -n 1)
 find "$folder" -name '*.gcda' -delete
-ctest --test-dir "$folder" --parallel "$(nproc)" --output-on-failure --quiet
+# Without the look at the library's imports: counting branches brings in some of its own.
+ctest --test-dir "$folder" --parallel "$(nproc)" --output-on-failure --exclude-regex SharedLibrary \
+  >"$folder/ctest.log" || { cat "$folder/ctest.log" && exit 1; }
 # What a throw could do after every call is not a branch that anybody wrote.
 gcovr --root . --filter src/ --exclude-throw-branches --exclude-unreachable-branches \
-  --object-directory "$folder" --print-summary --fail-under-branch "$required_branches" "$folder"
+  --print-summary --fail-under-branch "$required_branches" "$folder/CMakeFiles/zevooauth.dir"
 echo "check: at least $required_branches % of the branches in src/ are covered"
 echo "check: passed"

@@ -85,7 +85,8 @@ extern "C" void syslog(int priority, const char* format, ...) {
 
 // What the compiler calls instead where _FORTIFY_SOURCE is set.
 // NOLINTNEXTLINE(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): its name is given
-extern "C" [[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int, const char* format, ...) {
+extern "C" [[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int, const char* format,
+                                                           ...) {
   va_list arguments;
   va_start(arguments, format);
   record(priority, format, arguments);
