@@ -5,9 +5,7 @@
 #include <unistd.h>
 
 #include <csignal>
-#include <cstdlib>
 #include <ctime>
-#include <functional>
 #include <iostream>
 #include <stdexcept>
 #include <vector>
@@ -33,7 +31,9 @@ struct Trouble : std::runtime_error {
 };
 
 [[noreturn]] void giveUp(const OAUTHDBBasic& store, const std::string& what) {
-  throw Trouble("cannot " + what + " in " + kDatabase + ": " + store.GetErrMsg());
+  const std::string reason = store.GetErrMsg();
+  throw Trouble("cannot " + what + " in " + kDatabase + ": " +
+                (reason.empty() ? "not found" : reason));
 }
 
 void title(const std::string& text) {
@@ -52,23 +52,43 @@ std::string secondsFromNow(long seconds) {
   return std::to_string(static_cast<long long>(std::time(nullptr)) + seconds);
 }
 
-// What the story made, undone in reverse order on every way out.
+// Deletes by value, never by row id: an id that is free again may have become somebody else's.
+// True if no such row is left.
+bool removeRow(const std::string& table, const std::string& column, const std::string& value) {
+  OAUTHDBBasic store;
+  store.SetTabName(table);
+  Json::Value request;
+  request["condition"][column] = value;
+  return store.DBDel(request) || store.GetErrCode() == kErrNone;
+}
+
+// The rows that the story made, removed on every way out.
 class Traces {
  public:
-  ~Traces() {
-    if (undos_.empty()) return;
+  ~Traces() { remove(); }
+
+  void note(const std::string& table, const std::string& column, const std::string& value) {
+    rows_.push_back({table, column, value});
+  }
+
+  // True if nothing is left.
+  bool remove() {
+    if (rows_.empty()) return true;
     bool removed = true;
-    for (auto undo = undos_.rbegin(); undo != undos_.rend(); ++undo) removed &= (*undo)();
+    for (const Row& row : rows_) removed &= removeRow(row.table, row.column, row.value);
+    rows_.clear();
     if (removed)
       std::cout << "\nThe rows that this demo made are removed again.\n";
     else
       std::cerr << "lifecycle: some rows of this demo could not be removed\n";
+    return removed;
   }
-  // Returns whether nothing is left.
-  void undoWith(std::function<bool()> undo) { undos_.push_back(std::move(undo)); }
 
  private:
-  std::vector<std::function<bool()>> undos_;
+  struct Row {
+    std::string table, column, value;
+  };
+  std::vector<Row> rows_;
 };
 
 // One row as it lies in the file, encrypted columns and all, past the library.
@@ -77,7 +97,7 @@ void showRow(const std::string& table, long long id) {
   sqlite3_open(kDatabase, &db);
   const std::string sql = "SELECT * FROM " + table + " WHERE id=" + std::to_string(id);
   say(table);
-  const auto print = [](void*, int columns, char** values, char** names) {
+  const auto print = [](void*, int columns, char** values, char** names) noexcept {
     for (int i = 0; i < columns; ++i)
       say("  " + std::string(names[i]) + " = " + (values[i] == nullptr ? "NULL" : values[i]));
     return 0;
@@ -114,26 +134,11 @@ Client registerClient(Traces& traces) {
     if (!added) giveUp(clients, "register a client");
     client.identifier = made["client_id"].asString();
     client.secret = made["client_secret"].asString();
-    traces.undoWith([identifier = client.identifier] {
-      OAUTHDBClientInfo store("oauth_clientInfo");
-      Json::Value found;
-      if (!store.Get(identifier, &found)) return false;
-      return found.empty() || store.Del(idOf(found[0U])) != 0;
-    });
+    traces.note("oauth_clientInfo", "client_id", client.identifier);
+    traces.note("oauth_log", "msg", "Application registed[" + name + "]");
     if (!clients.Get(client.identifier, &rows) || rows.empty()) giveUp(clients, "find the client");
     client.id = idOf(rows[0U]);
   }
-  traces.undoWith([name] {
-    OAUTHDBLog log("oauth_log");
-    Json::Value lines;
-    bool removed = log.Get(name, "", &lines) != 0;
-    for (const Json::Value& line : lines) {
-      Json::Value request;
-      request["condition"]["id"] = line["id"];
-      removed &= log.DBDel(request);
-    }
-    return removed;
-  });
   OAUTHDBLog log("oauth_log");
   Json::Value lines;
   if (!log.Get(name, "", &lines) || lines.empty()) giveUp(log, "find the audit line");
@@ -160,12 +165,7 @@ void tradeCode(Traces& traces, const Client& client) {
       giveUp(codes, "issue a code");
   }
   const std::string code = issued["code"].asString();
-  traces.undoWith([code] {
-    OAUTHDBGrantCode store("oauth_grantCode");
-    Json::Value found;
-    if (!store.Get(code, &found)) return false;
-    return found.empty() || store.Del(idOf(found[0U])) != 0;
-  });
+  traces.note("oauth_grantCode", "code", code);
   say("code " + brief(code) + " lives for " +
       std::to_string(getExpiredPeriod("grantcode_expired")) + " seconds");
 
@@ -173,16 +173,10 @@ void tradeCode(Traces& traces, const Client& client) {
   OAUTHDBGrantCode codes("oauth_grantCode");
   Json::Value rows;
   if (!codes.Get(code, &rows) || rows.empty()) giveUp(codes, "find the code");
-  const long long id = idOf(rows[0U]);
-  if (!codes.Del(id)) giveUp(codes, "spend the code");
-  say("deleted: yes; a second try: " + std::string(codes.Del(id) ? "YES" : "no, it is gone"));
-}
-
-bool forget(const std::string& accessToken) {
-  OAUTHDBToken store("oauth_token");
-  Json::Value found;
-  if (!store.GetWithAccessToken(accessToken, &found)) return false;
-  return found.empty() || store.Revoke(idOf(found[0U])) != 0;
+  if (!codes.Del(idOf(rows[0U]))) giveUp(codes, "spend the code");
+  if (!codes.Get(code, &rows)) giveUp(codes, "look the code up again");
+  say(std::string("deleted: yes; a second try finds ") +
+      (rows.empty() ? "nothing" : "IT STILL THERE"));
 }
 
 Json::Value issueTokens(Traces& traces, const Client& client) {
@@ -190,7 +184,7 @@ Json::Value issueTokens(Traces& traces, const Client& client) {
   Json::Value issued;
   if (!tokens.Add("alice", client.identifier, "read", "code", "xyz", kIp, issued))
     giveUp(tokens, "issue tokens");
-  traces.undoWith([token = issued["access_token"].asString()] { return forget(token); });
+  traces.note("oauth_token", "access_token", issued["access_token"].asString());
   say("access token  " + brief(issued["access_token"]));
   say("refresh token " + brief(issued["refresh_token"]));
   return issued;
@@ -222,17 +216,19 @@ Json::Value refresh(Traces& traces, const Client& client, const Json::Value& old
   return issued;
 }
 
-// True if another row expires within the next minute or has: sweeping would take it too.
-template <class Store>
-bool othersExpire(const char* table, const std::string& ownAccessToken) {
-  Store store(table);
+// True if a sweep could take another row too: one that has expired, will within the next minute,
+// or names no plain number.
+bool othersMayExpire(OAUTHDBToken& tokens, const std::string& ownAccessToken) {
   Json::Value rows;
-  if (!store.Get(&rows)) giveUp(store, "read " + std::string(table));
+  if (!tokens.Get(&rows)) giveUp(tokens, "read the tokens");
   const long long soon = static_cast<long long>(std::time(nullptr)) + 60;
-  for (const Json::Value& row : rows)
-    if (row["access_token"].asString() != ownAccessToken &&
-        std::strtoll(row["expired_time"].asString().c_str(), nullptr, 10) < soon)
+  for (const Json::Value& row : rows) {
+    const std::string expiry = row["expired_time"].asString();
+    const bool plain = !expiry.empty() && expiry.size() <= 18 &&
+                       expiry.find_first_not_of("0123456789") == std::string::npos;
+    if (row["access_token"].asString() != ownAccessToken && (!plain || std::stoll(expiry) < soon))
       return true;
+  }
   return false;
 }
 
@@ -246,21 +242,19 @@ void expireToken(Traces& traces, const Client& client) {
                     "code", "xyz", kIp, issued))
       giveUp(tokens, "issue a token");
   }
-  traces.undoWith([access] { return forget(access); });
+  traces.note("oauth_token", "access_token", access);
   verify("at once          ", access);
   std::cout.flush();
   sleep(3);
   verify("three seconds on ", access);
 
   title("The sweep takes what has expired");
-  if (othersExpire<OAUTHDBToken>("oauth_token", access) ||
-      othersExpire<OAUTHDBGrantCode>("oauth_grantCode", "")) {
+  OAUTHDBToken tokens("oauth_token");
+  if (othersMayExpire(tokens, access)) {
     say("skipped: this file holds expired rows of others, which a sweep would delete too");
     return;
   }
-  OAUTHDBToken tokens("oauth_token");
-  OAUTHDBGrantCode codes("oauth_grantCode");
-  if (!tokens.Purge() || !codes.Purge()) giveUp(tokens, "purge");
+  if (!tokens.Purge()) giveUp(tokens, "purge");
   Json::Value rows;
   if (!tokens.GetWithAccessToken(access, &rows)) giveUp(tokens, "look the token up");
   say(std::string("the expired token is ") + (rows.empty() ? "gone" : "STILL THERE"));
@@ -281,7 +275,8 @@ void showLog(const Client& client) {
   }
 }
 
-void tell() {
+// True if the story was told and nothing of it is left in the file.
+bool tell() {
   checkRoomInLog();
   Traces traces;
   const Client client = registerClient(traces);
@@ -304,6 +299,7 @@ void tell() {
   showRow("oauth_clientInfo", client.id);
   showRow("oauth_token", idOf(rows[0U]));
   showRow("oauth_log", client.logId);
+  return traces.remove();
 }
 
 }  // namespace
@@ -314,11 +310,10 @@ int main() {
     std::signal(signal, [](int) { interrupted = 1; });
   std::signal(SIGPIPE, SIG_IGN);
   try {
-    tell();
+    return tell() ? 0 : 1;
   } catch (const std::exception& error) {
     std::cout.flush();
     std::cerr << "lifecycle: " << error.what() << '\n';
     return 1;
   }
-  return 0;
 }

@@ -4,6 +4,7 @@
 
 #include "oauth_db_basic.h"
 
+#pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
 // Columns of a row: "enable" ("1" or "0"), "client_id", "client_secret", "redirect_uri", "scope",
@@ -11,7 +12,7 @@ namespace ZEVOOAUTHSERVER {
 //
 // Lengths in bytes: client_id and client_secret 64; redirect_uri 3 to 2048; scope 1 to 2048;
 // display_name 1 to 64. Anything else is kErrBadParameters.
-class [[gnu::visibility("default")]] OAUTHDBClientInfo : public OAUTHDBBasic {
+class OAUTHDBClientInfo : public OAUTHDBBasic {
  public:
   // tabName: "oauth_clientInfo"
   explicit OAUTHDBClientInfo(const std::string& tabName);
@@ -44,10 +45,11 @@ class [[gnu::visibility("default")]] OAUTHDBClientInfo : public OAUTHDBBasic {
   // Reads rows into *out: by identifier, by row id, or all.
   int Get(const std::string& client_id, Json::Value* out);
   int Get(long long id, Json::Value* out);
-  int Get(Json::Value * out);
+  int Get(Json::Value* out);
 
   // Row id of the client, its low 32 bits; 0 for an unknown client or a failed look-up.
   int GetIndex(const std::string& client_id);
 };
 
 }  // namespace ZEVOOAUTHSERVER
+#pragma GCC visibility pop

@@ -9,10 +9,11 @@
 
 struct sqlite3;
 
+#pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
 // Values of GetErrCode(). Any positive value other than kErrNone is an SQLite result code, with
-// SQLite's own text in GetErrMsg().
+// SQLite's own text in GetErrMsg(), or "Open DB failed!!" when the file could not be opened.
 inline constexpr int kErrNone = 255;          // "": nothing recorded since construction
 inline constexpr int kErrCreateTable = -1;    // "Create table failed"
 inline constexpr int kErrBadParameters = -2;  // "Bad parameters"
@@ -29,23 +30,25 @@ inline constexpr int kErrTableFull = -5;      // "<table> Table is full", in the
 //
 // Operations return true, or non-zero, on success. A failure leaves its reason in GetErrCode()
 // and GetErrMsg(), unless its comment says "log only"; a success leaves the previous error there.
+// Log only, for every operation: no row to change or delete, and a store that is not ready, whose
+// error still tells why it is not.
 //
 // Two document shapes come back throughout:
-//   rows     [ {"<column>": string, ...}, ... ]   numbers as decimal text, in column order of the
-//            table; "client_id" and "client_secret" decrypted
+//   rows     [ {"<column>": string, ...}, ... ]   numbers as decimal text; "client_id" and
+//            "client_secret" decrypted
 //   request  {"condition": {"<column>": string or integer, ...},   all must be equal
 //             "condition_like": string,    ready-made SQL condition, wins over "condition"
 //             "option": string,            ready-made SQL after the condition
 //             "modified": {"<column>": string, ...}}               columns to write
 // "condition_like" and "option" enter the statement as they are: never pass on a user's text.
 // A value ends at its first NUL byte.
-class [[gnu::visibility("default")]] OAUTHDBBasic {
+class OAUTHDBBasic {
  public:
   // Row callback, as sqlite3_exec() calls it; context is the result document.
   using RowCallback = int (*)(void* context, int columns, char** values, char** columnNames);
 
-  // Opens and initialises. Never throws for a database failure: the error is recorded and every
-  // later operation fails with the log line "DB is not ready!!".
+  // Opens and initialises. Never throws for a database failure: the error is recorded, and every
+  // later operation on records fails with the log line "DB is not ready!!".
   OAUTHDBBasic();
   ~OAUTHDBBasic();
   OAUTHDBBasic(const OAUTHDBBasic&) = delete;
@@ -94,7 +97,7 @@ class [[gnu::visibility("default")]] OAUTHDBBasic {
 
   // Counts the rows of the table: result becomes [ string ], the count as decimal text.
   // kErrBadParameters if result is null.
-  bool DBGetRowCount(Json::Value * result);
+  bool DBGetRowCount(Json::Value* result);
   // Whether the table holds fewer than max rows. False also when it cannot be counted.
   bool DBCheckRowMax(unsigned long max);
 
@@ -116,25 +119,25 @@ class [[gnu::visibility("default")]] OAUTHDBBasic {
   // leaves kErrCrypt and the database untouched.
 
   // Inserts the record {"<column>": string or null, ...}.
-  bool DBAdd(Json::Value & record);
-  // Deletes the rows that match "condition", or every row without one. Fails (log only) when
-  // there was no row to delete.
-  bool DBDel(Json::Value & request);
+  bool DBAdd(Json::Value& record);
+  // Deletes the rows that match "condition", or every row without one. Fails when there was no
+  // row to delete.
+  bool DBDel(Json::Value& request);
   // Reads the rows that match "condition_like" or else "condition" into *rows; no row is a
   // success. kErrBadParameters if rows is null.
-  bool DBGet(Json::Value & request, Json::Value * rows);
-  // Writes "modified" into the rows that match "condition". Fails (log only) when no row matched.
-  bool DBEdit(Json::Value & request);
+  bool DBGet(Json::Value& request, Json::Value* rows);
+  // Writes "modified" into the rows that match "condition". Fails when no row matched.
+  bool DBEdit(Json::Value& request);
 
   // Replace the members "client_id" and "client_secret" of a document by their encrypted or plain
   // forms. The first failure stops and leaves the rest as it was (log only).
-  static bool ParamEncrypt(Json::Value & doc);
-  static bool ParamDecrypt(Json::Value & doc);
+  static bool ParamEncrypt(Json::Value& doc);
+  static bool ParamDecrypt(Json::Value& doc);
 
  private:
   // The public constructor delegates to this one first, so that the destructor closes the
   // connection when a later step of the construction throws.
-  explicit OAUTHDBBasic(sqlite3 * db) : db_(db) {}
+  explicit OAUTHDBBasic(sqlite3* db) : db_(db) {}
 
   int errCode_ = kErrNone;
   bool ready_ = false;
@@ -144,3 +147,4 @@ class [[gnu::visibility("default")]] OAUTHDBBasic {
 };
 
 }  // namespace ZEVOOAUTHSERVER
+#pragma GCC visibility pop

@@ -4,6 +4,7 @@
 
 #include "oauth_db_basic.h"
 
+#pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
 // Columns of a row: "username", "client_id" (encrypted in the file, plain in results), "scope",
@@ -12,7 +13,7 @@ namespace ZEVOOAUTHSERVER {
 // Lengths in bytes: username 1 to 256; client_id and code 64; scope and state 1 to 2048;
 // expired_time 1 to 128. ip is empty or an IPv4 or IPv6 address. A code is expired once the
 // current time is greater than its expired_time.
-class [[gnu::visibility("default")]] OAUTHDBGrantCode : public OAUTHDBBasic {
+class OAUTHDBGrantCode : public OAUTHDBBasic {
  public:
   // tabName: "oauth_grantCode"
   explicit OAUTHDBGrantCode(const std::string& tabName);
@@ -41,7 +42,7 @@ class [[gnu::visibility("default")]] OAUTHDBGrantCode : public OAUTHDBBasic {
   // expired code is found like any other.
   int Get(const std::string& code, Json::Value* out);
   int Get(long long id, Json::Value* out);
-  int Get(Json::Value * out);
+  int Get(Json::Value* out);
 
   // Row id of the code, its low 32 bits; 0 for an unknown code or a failed look-up.
   int GetIndex(const std::string& code);
@@ -50,8 +51,9 @@ class [[gnu::visibility("default")]] OAUTHDBGrantCode : public OAUTHDBBasic {
   int Revoke(long long id);
 
   // Deletes every expired code. 0 only if a row could not be deleted: a failed read deletes
-  // nothing and is a success.
+  // nothing and is a success, though it leaves its error.
   int Purge();
 };
 
 }  // namespace ZEVOOAUTHSERVER
+#pragma GCC visibility pop

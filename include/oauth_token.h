@@ -5,6 +5,7 @@
 
 #include "oauth_db_basic.h"
 
+#pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
 // Columns of a row: "username", "client_id" (encrypted in the file, plain in results), "scope",
@@ -17,7 +18,7 @@ namespace ZEVOOAUTHSERVER {
 //
 // expired_time concerns the access token: it is expired once the current time is greater. The
 // refresh token has no expiry of its own and goes with the row.
-class [[gnu::visibility("default")]] OAUTHDBToken : public OAUTHDBBasic {
+class OAUTHDBToken : public OAUTHDBBasic {
  public:
   // tabName: "oauth_token"
   explicit OAUTHDBToken(const std::string& tabName);
@@ -52,13 +53,14 @@ class [[gnu::visibility("default")]] OAUTHDBToken : public OAUTHDBBasic {
   int GetWithAccessToken(const std::string& access_token, Json::Value* out);
   int GetWithRefreshToken(const std::string& refresh_token, Json::Value* out);
   int Get(long long id, Json::Value* out);
-  int Get(Json::Value * out);
+  int Get(Json::Value* out);
 
   // Row id of the access token, its low 32 bits; 0 for an unknown token or a failed look-up.
   int GetIndex(const std::string& access_token);
 
   // Deletes every row whose access token has expired, refresh token included. 0 only if a row
-  // could not be deleted: a failed read deletes nothing and is a success.
+  // could not be deleted: a failed read deletes nothing and is a success, though it leaves
+  // its error.
   int Purge();
 
   // Checks a presented access token against the clock.
@@ -71,3 +73,4 @@ class [[gnu::visibility("default")]] OAUTHDBToken : public OAUTHDBBasic {
 };
 
 }  // namespace ZEVOOAUTHSERVER
+#pragma GCC visibility pop

@@ -45,7 +45,8 @@ std::string getSQLFormatLikeStr(const std::string& column, const std::string& va
 
 // Random lower-case hexadecimal digits for secrets: version-4 UUIDs (RFC 4122) without hyphens,
 // from the operating system's entropy. The length is rounded up to a multiple of 32: 40 gives 64
-// digits, 0 gives none. Throws if the system has no entropy to give: a guessable secret is worse.
+// digits, 0 gives none. Empty if the system has no entropy to give, which the stores then refuse as
+// too short: a guessable secret would be worse.
 std::string getRandomStr(unsigned int length);
 
 }  // namespace ZEVOOAUTHSERVER

@@ -13,7 +13,7 @@ shift 2
 root=$PWD/build
 if ! mkdir -p "$root" 2>/dev/null || [ ! -w "$root" ] ||
   { [ -e "$root/$folder" ] && [ ! -w "$root/$folder" ]; }; then
-  root=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth
+  root=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth-$(cksum <<<"$PWD" | cut -d ' ' -f 1)
   if ! mkdir -p "$root" 2>/dev/null; then
     root=/tmp/zevooauth-build-$(id -u)
     [ -d "$root" ] || mkdir -m 700 "$root"

@@ -13,8 +13,8 @@ declare -A groups=(
 missing=()
 for group in "$@"; do
   for package in ${groups[$group]:?"packages: no group $group"}; do
-    status=$(dpkg-query --show --showformat='${db:Status-Status}' "$package" 2>/dev/null || true)
-    [ "$status" = installed ] || missing+=("$package")
+    dpkg-query --show --showformat='${db:Status-Status}\n' "$package" 2>/dev/null |
+      grep -qx installed || missing+=("$package")
   done
 done
 
@@ -28,6 +28,9 @@ if [ "$(id -u)" -ne 0 ]; then
 fi
 echo "packages: installing ${missing[*]}"
 export DEBIAN_FRONTEND=noninteractive
-apt-get update -qq
-apt-get install -qq --yes --no-install-recommends "${missing[@]}" >/dev/null
+if ! apt-get update -qq ||
+  ! apt-get install -qq --yes --no-install-recommends "${missing[@]}" >/dev/null; then
+  echo "packages: could not install ${missing[*]}" >&2
+  exit 1
+fi
 echo "packages: installed ${#missing[@]} for $*"

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include "oauth_clientInfo.h"
+#include "oauth_grantCode.h"
 #include "oauth_log.h"
 #include "oauth_token.h"
 #include "store_test.h"
@@ -51,7 +52,7 @@ TEST_F(LifecycleTest, TellsTheWholeLife) {
       "client_id = sealed:",
       "client_secret = sealed:",
       "redirect_uri = album.example/callback",
-      "deleted: yes; a second try: no, it is gone",
+      "deleted: yes; a second try finds nothing",
       "a resource server asks: yes, this is alice with scope \"read\"",
       "the old access token: no, Access Token Expired [-3]",
       "the new access token: yes, this is alice with scope \"read\"",
@@ -72,6 +73,7 @@ TEST_F(LifecycleTest, TellsTheWholeLife) {
 
 TEST_F(LifecycleTest, RemovesTheRowsItMade) {
   run();
+  EXPECT_EQ(0, exitCode_);
   for (const char* const table :
        {"oauth_clientInfo", "oauth_grantCode", "oauth_token", "oauth_log"})
     EXPECT_EQ(0, rowCount(table)) << table;
@@ -96,6 +98,54 @@ TEST_F(LifecycleTest, LeavesExpiredRowsOfOthersToTheirOwner) {
   EXPECT_EQ(0, exitCode_);
   EXPECT_THAT(output_, HasSubstr("skipped: this file holds expired rows of others"));
   EXPECT_EQ(before, allRows());
+}
+
+TEST_F(LifecycleTest, LeavesExpiredCodesOfOthersToTheirOwner) {
+  Json::Value result;
+  OAUTHDBGrantCode("oauth_grantCode").Add("bob", times(64), "read", "s", "", result);
+  clock_.advance(100'000);
+  const std::vector<std::string> before = allRows();
+  run();
+  EXPECT_EQ(0, exitCode_);
+  EXPECT_EQ(before, allRows());
+}
+
+TEST_F(LifecycleTest, LeavesTokensOfOthersWhoseExpiryIsNoPlainNumber) {
+  for (const std::string expiry : {"1900000000 ", "+1900000000", "never", "99999999999999999999"}) {
+    SCOPED_TRACE(expiry);
+    Json::Value result;
+    OAUTHDBToken("oauth_token")
+        .Add("bob", times(64), "read", times(64, 'r'), times(64, 'a'), expiry, "code", "s", "",
+             result);
+    const std::vector<std::string> before = allRows();
+    run();
+    EXPECT_EQ(0, exitCode_);
+    EXPECT_EQ(before, allRows());
+    execute("DELETE FROM oauth_token");
+  }
+}
+
+TEST_F(LifecycleTest, RemovesItsAuditLineWhenItsClientCannotBeFound) {
+  OAUTHDBLog("oauth_log").Add("one");
+  const std::vector<std::string> before = allRows();
+  host_.failEncrypt(3);  // after identifier and secret, that of the look-up
+  run();
+  EXPECT_EQ(1, exitCode_);
+  EXPECT_EQ(
+      "lifecycle: cannot find the client in /var/packages/Keyloft/target/etc/oauth.db:"
+      " Data Decrypt failed\n",
+      errors_);
+  EXPECT_EQ(before, allRows());
+}
+
+TEST_F(LifecycleTest, FailsWhenRowsAreLeftBehind) {
+  OAUTHDBLog("oauth_log").Add("one");
+  execute(
+      "CREATE TRIGGER t BEFORE DELETE ON oauth_clientInfo BEGIN SELECT RAISE(ABORT, 'no'); END");
+  run();
+  EXPECT_EQ(1, exitCode_);
+  EXPECT_EQ("lifecycle: some rows of this demo could not be removed\n", errors_);
+  EXPECT_EQ(1, rowCount("oauth_clientInfo"));
 }
 
 TEST_F(LifecycleTest, RefusesToPushOutAuditLinesOfOthers) {

@@ -197,6 +197,21 @@ class TokenTest : public StoreTest {
   }
 };
 
+// --- Without entropy ---
+
+// A token that could be guessed would be worse than none.
+TEST_F(TokenTest, IssuesNothingWithoutEntropy) {
+  OAUTHDBToken tokens("oauth_token");
+  files_.failEntropy();
+  Json::Value result;
+  EXPECT_EQ(0, tokens.Add("alice", times(64), "read", "code", "xyz", "", result));
+  EXPECT_EQ(-2, tokens.GetErrCode());
+  EXPECT_EQ("Bad parameters", tokens.GetErrMsg());
+  EXPECT_THAT(log_.lines(), ElementsAre("3 oauth_token.cpp Bad parameters"));
+  EXPECT_EQ(0U, result.size());
+  EXPECT_EQ(0, rowCount("oauth_token"));
+}
+
 // --- Add with the caller's values ---
 
 class TokenAddTest : public TokenTest {};

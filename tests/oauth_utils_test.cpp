@@ -609,6 +609,12 @@ TEST_F(RemoteIpTest, IgnoresTheEnvironment) {
 
 class RandomStrTest : public StoreTest {};
 
+TEST_F(RandomStrTest, IsEmptyWithoutEntropy) {
+  files_.failEntropy();
+  for (const unsigned length : {0U, 1U, 32U, 64U}) EXPECT_EQ("", getRandomStr(length)) << length;
+  EXPECT_THAT(log_.lines(), IsEmpty());
+}
+
 TEST_F(RandomStrTest, RoundsTheLengthUpToWholeBlocks) {
   static constexpr std::pair<unsigned, std::size_t> kRows[] = {
       {0, 0},   {1, 32},  {31, 32}, {32, 32}, {33, 64},     {40, 64},

@@ -81,8 +81,9 @@ TEST_F(ZevocoreKeyTest, MakesAKeyOnFirstUse) {
 }
 
 TEST_F(ZevocoreKeyTest, KeepsTheKeyFromOthers) {
-  umask(0);
+  const mode_t before = umask(0);
   load();
+  umask(before);
   EXPECT_EQ(fs::perms::owner_read | fs::perms::owner_write, fs::status(keyFile_).permissions());
 }
 

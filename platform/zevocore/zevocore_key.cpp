@@ -50,7 +50,8 @@ bool writeRandomKey(int descriptor) {
 }
 
 // Writes a temporary file and links it into place, which fails where a key exists already: the
-// first process wins, the others use its key.
+// first process wins, the others use its key. A process killed in between leaves its temporary
+// file behind, of mode 0600 like the key.
 void makeKey(const std::string& directory, const std::string& path) {
   std::string temporary = directory + "/.zevocore.key.XXXXXX";
   const File file(mkostemp(temporary.data(), O_CLOEXEC));

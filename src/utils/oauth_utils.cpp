@@ -4,6 +4,8 @@
 #include <json/value.h>
 #include <unistd.h>
 
+// The device and not the system call, which older kernels of the appliance lack.
+#define BOOST_UUID_RANDOM_PROVIDER_FORCE_POSIX
 #include <boost/algorithm/string/replace.hpp>
 #include <boost/uuid/random_generator.hpp>
 #include <boost/uuid/uuid_io.hpp>
@@ -107,7 +109,7 @@ std::string getSQLFormatLikeStr(const std::string& column, const std::string& va
   return taken(SqliteText(sqlite3_mprintf("%s like '%%%q%%'", column.c_str(), value.c_str())));
 }
 
-std::string getRandomStr(unsigned int length) {
+std::string getRandomStr(unsigned int length) try {
   std::string result;
   while (result.size() < length) {
     // Reads the operating system's entropy for every UUID; no generator is kept between calls.
@@ -116,6 +118,8 @@ std::string getRandomStr(unsigned int length) {
     result += uuid;
   }
   return result;
+} catch (const boost::uuids::entropy_error&) {
+  return {};
 }
 
 }  // namespace ZEVOOAUTHSERVER

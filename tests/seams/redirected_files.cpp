@@ -1,9 +1,11 @@
 #include "redirected_files.h"
 
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <sqlite3.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
@@ -21,7 +23,7 @@ struct State {
   std::string directory;
   bool readOnly = false;
   int openCode = SQLITE_OK, closeCode = SQLITE_OK;
-  bool failFormatting = false;
+  bool failFormatting = false, failEntropy = false;
   std::vector<std::string> calls;
 };
 State state;
@@ -76,6 +78,7 @@ void RedirectedFiles::removeDirectory() { std::filesystem::remove_all(state.dire
 void RedirectedFiles::openReadOnly() { state.readOnly = true; }
 void RedirectedFiles::openWithoutHandle(int code) { state.openCode = code; }
 void RedirectedFiles::failClose(int code) { state.closeCode = code; }
+void RedirectedFiles::failEntropy() { state.failEntropy = true; }
 void RedirectedFiles::failFormatting() { state.failFormatting = true; }
 const std::vector<std::string>& RedirectedFiles::calls() const { return state.calls; }
 
@@ -107,6 +110,18 @@ extern "C" char* sqlite3_mprintf(const char* format, ...) {
 
 extern "C" FILE* fopen64(const char* path, const char* mode) {
   return next("fopen64", fopen64)(redirected(path).c_str(), mode);
+}
+
+extern "C" int open64(const char* path, int flags, ...) {
+  if (state.failEntropy && std::strcmp(path, "/dev/urandom") == 0) {
+    errno = EMFILE;
+    return -1;
+  }
+  va_list arguments;
+  va_start(arguments, flags);
+  const auto mode = va_arg(arguments, unsigned);  // unused by a call that gives none
+  va_end(arguments);
+  return next("open64", open64)(path, flags, mode);
 }
 
 extern "C" int access(const char* path, int mode) noexcept {

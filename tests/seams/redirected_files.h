@@ -1,6 +1,7 @@
 // The fixed paths of the library, redirected to a fresh directory. Linking this seam replaces
-// sqlite3_open(), fopen64() and access() for those paths in the whole program; a program that
-// makes no object of this class gets a directory of its own at first use.
+// sqlite3_open(), fopen64() and access() for those paths, and open64() for the device of entropy,
+// in the whole program; a program that makes no object of this class gets a directory of its own at
+// first use.
 
 #pragma once
 
@@ -28,6 +29,8 @@ class RedirectedFiles {
   void openWithoutHandle(int code);
   // sqlite3_close() closes, and answers this code.
   void failClose(int code);
+  // The device of the operating system's entropy cannot be opened.
+  void failEntropy();
   // sqlite3_mprintf() finds no memory.
   void failFormatting();
 
