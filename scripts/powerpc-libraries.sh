@@ -1,0 +1,89 @@
+#!/usr/bin/env bash
+# Builds what the PowerPC target needs from Debian's source packages: SQLite, JsonCpp, GoogleTest
+# and nettle; Boost is headers only and taken from this machine.
+#
+#   scripts/powerpc-libraries.sh FOLDER
+#
+# What FOLDER holds already is not built again. The system's package configuration is left alone:
+# sources are fetched through one of their own, made from the places the system has.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+host=powerpc-linux-gnu
+mkdir -p "$1"
+prefix=$(cd "$1" && pwd)
+work=$prefix/work
+# Large files and 64-bit times, as in the library itself.
+flags="-O2 -D_FILE_OFFSET_BITS=64 -D_TIME_BITS=64"
+
+fetch() { # PACKAGE: leaves its source tree in $work/PACKAGE
+  local apt=$work/apt
+  if [ ! -e "$apt/sources.list" ]; then
+    mkdir -p "$apt/lists/partial" "$apt/cache/archives/partial"
+    apt-get indextargets --format 'deb-src $(REPO_URI) $(RELEASE) $(COMPONENT)' \
+      'Created-By: Packages' 'Origin: Debian' | sort -u >"$apt/sources.list"
+    cat >"$apt/apt.conf" <<END
+Dir::Etc::SourceList "$apt/sources.list";
+Dir::Etc::SourceParts "/dev/null";
+Dir::State::Lists "$apt/lists";
+Dir::Cache "$apt/cache";
+APT::Sandbox::User "root";
+END
+    APT_CONFIG=$apt/apt.conf apt-get update -qq
+  fi
+  rm -rf "${work:?}/$1" "$work/download"
+  mkdir "$work/download"
+  (cd "$work/download" && APT_CONFIG=$apt/apt.conf apt-get source -qq "$1" >/dev/null)
+  mv "$work"/download/*/ "$work/$1"
+}
+
+cross_cmake() { # PACKAGE OPTION...
+  cmake -S "$work/$1" -B "$work/$1/cross" -G Ninja -DCMAKE_SYSTEM_NAME=Linux \
+    -DCMAKE_SYSTEM_PROCESSOR=ppc -DCMAKE_C_COMPILER=$host-gcc -DCMAKE_CXX_COMPILER=$host-g++ \
+    -DCMAKE_C_FLAGS="$flags" -DCMAKE_CXX_FLAGS="$flags" -DCMAKE_BUILD_TYPE=Release \
+    -DCMAKE_INSTALL_PREFIX="$prefix" -DCMAKE_INSTALL_LIBDIR=lib "${@:2}"
+  cmake --build "$work/$1/cross"
+  cmake --install "$work/$1/cross"
+}
+
+# The amalgamation is made natively: on the way helper programs are built and run.
+build_sqlite3() {
+  (cd "$work/sqlite3" && ./configure && make sqlite3.c sqlite3.h)
+  $host-gcc $flags -fPIC -shared -Wl,-soname,libsqlite3.so.0 -DSQLITE_THREADSAFE=1 \
+    -DSQLITE_SECURE_DELETE -DSQLITE_ENABLE_COLUMN_METADATA -DSQLITE_ENABLE_UNLOCK_NOTIFY \
+    -o "$prefix/lib/libsqlite3.so.0" "$work/sqlite3/sqlite3.c"
+  ln -sf libsqlite3.so.0 "$prefix/lib/libsqlite3.so"
+  cp "$work/sqlite3/sqlite3.h" "$prefix/include/"
+}
+
+build_libjsoncpp() {
+  cross_cmake libjsoncpp -DJSONCPP_WITH_TESTS=OFF -DJSONCPP_WITH_POST_BUILD_UNITTEST=OFF \
+    -DBUILD_OBJECT_LIBS=OFF -DBUILD_STATIC_LIBS=OFF -DBUILD_SHARED_LIBS=ON
+}
+
+build_googletest() {
+  cross_cmake googletest
+}
+
+build_nettle() {
+  cd "$work/nettle"
+  touch aclocal.m4 configure stamp-h.in # newer than what they are made from: nothing to remake
+  CFLAGS=$flags ./configure --host=$host --prefix="$prefix" --libdir="$prefix/lib" \
+    --disable-public-key --disable-assembler --disable-static --disable-openssl \
+    --disable-documentation
+  make -j"$(nproc)" libnettle.so
+  make install-shared-nettle install-headers install-pkgconfig
+}
+
+mkdir -p "$prefix/include" "$prefix/lib" "$work"
+ln -sfn /usr/include/boost "$prefix/include/boost"
+for package in sqlite3 libjsoncpp googletest nettle; do
+  if [ ! -e "$prefix/$package.done" ]; then
+    echo "powerpc-libraries: building $package"
+    fetch "$package"
+    (build_$package) >"$work/$package.log" 2>&1 || { tail -n 40 "$work/$package.log" && exit 1; }
+    touch "$prefix/$package.done"
+    rm -rf "${work:?}/$package"
+  fi
+done
+echo "powerpc-libraries: $prefix is ready"
