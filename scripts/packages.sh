@@ -1,12 +1,13 @@
 #!/usr/bin/env bash
 # Installs what the named groups need from Debian's packages, as far as it is missing.
 #
-#   scripts/packages.sh GROUP...     groups: build test check
+#   scripts/packages.sh GROUP...     groups: build test powerpc check
 set -euo pipefail
 
 declare -A groups=(
   [build]="g++ cmake ninja-build pkg-config libsqlite3-dev libjsoncpp-dev libboost-dev nettle-dev"
   [test]="binutils libgtest-dev libgmock-dev"
+  [powerpc]="g++-powerpc-linux-gnu qemu-user dpkg-dev make m4 tcl"
   [check]="clang-format clang-tidy gcovr shellcheck"
 )
 

@@ -14,12 +14,13 @@ mkdir -p "$1"
 prefix=$(cd "$1" && pwd)
 work=$prefix/work
 # Large files and 64-bit times, as in the library itself.
-flags="-O2 -D_FILE_OFFSET_BITS=64 -D_TIME_BITS=64"
+flags=(-O2 -D_FILE_OFFSET_BITS=64 -D_TIME_BITS=64)
 
 fetch() { # PACKAGE: leaves its source tree in $work/PACKAGE
   local apt=$work/apt
   if [ ! -e "$apt/sources.list" ]; then
     mkdir -p "$apt/lists/partial" "$apt/cache/archives/partial"
+    # shellcheck disable=SC2016 # apt-get expands these itself
     apt-get indextargets --format 'deb-src $(REPO_URI) $(RELEASE) $(COMPONENT)' \
       'Created-By: Packages' 'Origin: Debian' | sort -u >"$apt/sources.list"
     cat >"$apt/apt.conf" <<END
@@ -40,7 +41,7 @@ END
 cross_cmake() { # PACKAGE OPTION...
   cmake -S "$work/$1" -B "$work/$1/cross" -G Ninja -DCMAKE_SYSTEM_NAME=Linux \
     -DCMAKE_SYSTEM_PROCESSOR=ppc -DCMAKE_C_COMPILER=$host-gcc -DCMAKE_CXX_COMPILER=$host-g++ \
-    -DCMAKE_C_FLAGS="$flags" -DCMAKE_CXX_FLAGS="$flags" -DCMAKE_BUILD_TYPE=Release \
+    -DCMAKE_C_FLAGS="${flags[*]}" -DCMAKE_CXX_FLAGS="${flags[*]}" -DCMAKE_BUILD_TYPE=Release \
     -DCMAKE_INSTALL_PREFIX="$prefix" -DCMAKE_INSTALL_LIBDIR=lib "${@:2}"
   cmake --build "$work/$1/cross"
   cmake --install "$work/$1/cross"
@@ -49,7 +50,7 @@ cross_cmake() { # PACKAGE OPTION...
 # The amalgamation is made natively: on the way helper programs are built and run.
 build_sqlite3() {
   (cd "$work/sqlite3" && ./configure && make sqlite3.c sqlite3.h)
-  $host-gcc $flags -fPIC -shared -Wl,-soname,libsqlite3.so.0 -DSQLITE_THREADSAFE=1 \
+  $host-gcc "${flags[@]}" -fPIC -shared -Wl,-soname,libsqlite3.so.0 -DSQLITE_THREADSAFE=1 \
     -DSQLITE_SECURE_DELETE -DSQLITE_ENABLE_COLUMN_METADATA -DSQLITE_ENABLE_UNLOCK_NOTIFY \
     -o "$prefix/lib/libsqlite3.so.0" "$work/sqlite3/sqlite3.c"
   ln -sf libsqlite3.so.0 "$prefix/lib/libsqlite3.so"
@@ -68,7 +69,7 @@ build_googletest() {
 build_nettle() {
   cd "$work/nettle"
   touch aclocal.m4 configure stamp-h.in # newer than what they are made from: nothing to remake
-  CFLAGS=$flags ./configure --host=$host --prefix="$prefix" --libdir="$prefix/lib" \
+  CFLAGS="${flags[*]}" ./configure --host=$host --prefix="$prefix" --libdir="$prefix/lib" \
     --disable-public-key --disable-assembler --disable-static --disable-openssl \
     --disable-documentation
   make -j"$(nproc)" libnettle.so

@@ -580,6 +580,19 @@ TEST_F(TokenIssueTest, CountsPast2038) {
   EXPECT_EQ(0, tokens.Verify(result["access_token"].asString(), result));
 }
 
+TEST_F(TokenIssueTest, IssuesTokensThatAreValidIn2040) {
+  if (sizeof(std::time_t) < 8) GTEST_SKIP() << "this system's own time ends in 2038";
+  clock_.set(2'208'988'800);  // its first second
+  OAUTHDBToken tokens("oauth_token");
+  Json::Value issued, who;
+  EXPECT_EQ(1, issue(tokens, Grant(), issued));
+  EXPECT_EQ("2208989400", stored("expired_time"));
+  EXPECT_EQ(1, tokens.Verify(issued["access_token"].asString(), who));
+  EXPECT_EQ("alice", who["username"].asString());
+  EXPECT_EQ(1, tokens.Purge());
+  EXPECT_EQ(1, rowCount("oauth_token"));
+}
+
 TEST_F(TokenIssueTest, ChecksTheCallersValues) {
   OAUTHDBToken tokens("oauth_token");
   for (const LengthRule& rule : kShortEditRules) {

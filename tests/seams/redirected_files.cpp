@@ -21,6 +21,7 @@ constexpr char kDebugMarker[] = "/tmp/zevooauth_debug";
 
 struct State {
   std::string directory;
+  bool temporary = true;
   bool readOnly = false;
   int openCode = SQLITE_OK, closeCode = SQLITE_OK;
   bool failFormatting = false, failEntropy = false;
@@ -65,8 +66,13 @@ RedirectedFiles::RedirectedFiles() {
   state = State();
   state.directory = freshDirectory();
 }
+RedirectedFiles::RedirectedFiles(const std::string& directory) {
+  state = State();
+  state.directory = directory;
+  state.temporary = false;
+}
 RedirectedFiles::~RedirectedFiles() {
-  std::filesystem::remove_all(state.directory);
+  if (state.temporary) std::filesystem::remove_all(state.directory);
   state = State();
 }
 

@@ -12,6 +12,8 @@ class RedirectedFiles {
  public:
   // Makes an empty directory; the destructor removes it with all it holds.
   RedirectedFiles();
+  // Uses a directory that exists, and leaves it there.
+  explicit RedirectedFiles(const std::string& directory);
   ~RedirectedFiles();
   RedirectedFiles(const RedirectedFiles&) = delete;
   RedirectedFiles& operator=(const RedirectedFiles&) = delete;

@@ -1,0 +1,21 @@
+#!/usr/bin/env bash
+# The tests on the machine that the library ships to: cross-compiled for 32-bit big-endian PowerPC
+# and run under emulation, then databases exchanged with this machine's own build.
+# Installs what is missing (scripts/packages.sh, groups build, test and powerpc) and keeps what it
+# builds for the target (scripts/powerpc-libraries.sh) for the next time.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+scripts/packages.sh build test powerpc
+native=$(scripts/build.sh dev dev | tail -n 1)
+libraries=$(dirname "$native")/powerpc-libraries
+scripts/powerpc-libraries.sh "$libraries"
+folder=$(scripts/build.sh powerpc powerpc -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
+
+ctest --test-dir "$folder" --output-on-failure --parallel "$(nproc)"
+
+here="$native/tests/database_exchange"
+there="qemu-ppc -L /usr/powerpc-linux-gnu $folder/tests/database_exchange"
+tests/database_exchange_test.sh "$here" "$there"
+tests/database_exchange_test.sh "$there" "$here"
+echo "test-powerpc: passed, and databases go both ways between the architectures"
