@@ -25,8 +25,6 @@ using ZEVOOAUTHSERVER::OAUTHDBLog;
 
 namespace {
 
-using Lines = std::vector<std::string>;
-
 // Every column of a row but its id.
 struct Client {
   std::string enable = "1";
@@ -122,19 +120,6 @@ class ClientInfoTest : public StoreTest {
             "', '" + client.redirect_uri + "', '" + client.scope + "', '" + client.display_name +
             "', " + id + ")");
     return client;
-  }
-
-  // For failures that must leave the error state as they found it.
-  static void recordEarlierError(OAUTHDBClientInfo& clients) {
-    clients.SetErrCode(77);
-    clients.SetErrMsg("earlier");
-  }
-  static void expectError(const OAUTHDBClientInfo& clients, int code, const std::string& msg) {
-    EXPECT_EQ(code, clients.GetErrCode());
-    EXPECT_EQ(msg, clients.GetErrMsg());
-  }
-  static void expectEarlierError(const OAUTHDBClientInfo& clients) {
-    expectError(clients, 77, "earlier");
   }
 
   // What the body logs with this level mask on a store of its own.

@@ -45,10 +45,6 @@ class CommandTest : public StoreTest {
             std::to_string(count) +
             ") INSERT INTO oauth_log(timestamp, msg) SELECT 1700000000, 'row' FROM n");
   }
-  static void expectError(const OAUTHDBBasic& store, int code, const std::string& msg) {
-    EXPECT_EQ(code, store.GetErrCode());
-    EXPECT_EQ(msg, store.GetErrMsg());
-  }
   // The document that the general row reader makes of a statement.
   static std::string read(OAUTHDBBasic& store, const std::string& sql) {
     Json::Value rows = array();

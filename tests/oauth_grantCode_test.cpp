@@ -25,8 +25,6 @@ using ZEVOOAUTHSERVER::OAUTHDBGrantCode;
 
 namespace {
 
-using Lines = std::vector<std::string>;
-
 // Every column of a row but its id. The clock of the tests starts 600 seconds before its expiry.
 struct Grant {
   std::string username = "alice";
@@ -123,19 +121,6 @@ class GrantCodeTest : public StoreTest {
   void refuseDeletes(const std::string& condition) const {
     execute("CREATE TRIGGER refusal BEFORE DELETE ON oauth_grantCode WHEN " + condition +
             " BEGIN SELECT RAISE(ABORT, 'kept'); END");
-  }
-
-  // For failures that must leave the error state as they found it.
-  static void recordEarlierError(OAUTHDBGrantCode& codes) {
-    codes.SetErrCode(77);
-    codes.SetErrMsg("earlier");
-  }
-  static void expectError(const OAUTHDBGrantCode& codes, int code, const std::string& msg) {
-    EXPECT_EQ(code, codes.GetErrCode());
-    EXPECT_EQ(msg, codes.GetErrMsg());
-  }
-  static void expectEarlierError(const OAUTHDBGrantCode& codes) {
-    expectError(codes, 77, "earlier");
   }
 
   // What the body logs with this level mask on a store of its own.

@@ -17,8 +17,6 @@ using ZEVOOAUTHSERVER::OAUTHDBLog;
 
 namespace {
 
-using Lines = std::vector<std::string>;
-
 class LogTest : public StoreTest {
  protected:
   static void createDatabase() { const OAUTHDBLog log("oauth_log"); }
@@ -42,16 +40,6 @@ class LogTest : public StoreTest {
     execute("INSERT INTO oauth_log VALUES(" + std::to_string(timestamp) + ", '" + msg + "', NULL)");
   }
   Lines messages() const { return query("SELECT msg FROM oauth_log ORDER BY id"); }
-
-  static void recordEarlierError(OAUTHDBLog& log) {
-    log.SetErrCode(77);
-    log.SetErrMsg("earlier");
-  }
-  static void expectError(const OAUTHDBLog& log, int code, const std::string& msg) {
-    EXPECT_EQ(code, log.GetErrCode());
-    EXPECT_EQ(msg, log.GetErrMsg());
-  }
-  static void expectEarlierError(const OAUTHDBLog& log) { expectError(log, 77, "earlier"); }
 
   // What the body logs with this level mask on a store of its own.
   Lines traced(int mask, const std::function<void(OAUTHDBLog&)>& body) {

@@ -26,8 +26,6 @@ using ZEVOOAUTHSERVER::OAUTHDBToken;
 
 namespace {
 
-using Lines = std::vector<std::string>;
-
 // Every column of a row but its id. The clock of the tests starts 600 seconds before its expiry.
 struct Grant {
   std::string username = "alice";
@@ -131,17 +129,6 @@ class TokenTest : public StoreTest {
     execute("CREATE TRIGGER refusal BEFORE DELETE ON oauth_token WHEN " + condition +
             " BEGIN SELECT RAISE(ABORT, 'kept'); END");
   }
-
-  // For failures that must leave the error state as they found it.
-  static void recordEarlierError(OAUTHDBToken& tokens) {
-    tokens.SetErrCode(77);
-    tokens.SetErrMsg("earlier");
-  }
-  static void expectError(const OAUTHDBToken& tokens, int code, const std::string& msg) {
-    EXPECT_EQ(code, tokens.GetErrCode());
-    EXPECT_EQ(msg, tokens.GetErrMsg());
-  }
-  static void expectEarlierError(const OAUTHDBToken& tokens) { expectError(tokens, 77, "earlier"); }
 
   // What the body logs with this level mask on a store of its own.
   Lines traced(int mask, const std::function<void(OAUTHDBToken&)>& body) {

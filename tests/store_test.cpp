@@ -34,7 +34,7 @@ void StoreTest::createDebugMarker() const { std::ofstream(files_.debugMarker()) 
 
 void StoreTest::runOnThread(const std::function<void()>& body) { std::thread(body).join(); }
 
-std::vector<std::string> StoreTest::query(const std::string& sql) const {
+Lines StoreTest::query(const std::string& sql) const {
   sqlite3* handle = nullptr;
   const int opened = sqlite3_open_v2(files_.database().c_str(), &handle,
                                      SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE, nullptr);
@@ -51,6 +51,21 @@ void StoreTest::execute(const std::string& sql) const { query(sql); }
 int StoreTest::rowCount(const std::string& table) const {
   if (query("SELECT 1 FROM sqlite_master WHERE name='" + table + "'").empty()) return -1;
   return std::stoi(query("SELECT COUNT(*) FROM " + table).front());
+}
+
+void StoreTest::recordEarlierError(ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
+  store.SetErrCode(77);
+  store.SetErrMsg("earlier");
+}
+
+void StoreTest::expectEarlierError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
+  expectError(store, 77, "earlier");
+}
+
+void StoreTest::expectError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, int code,
+                            const std::string& msg) {
+  EXPECT_EQ(code, store.GetErrCode());
+  EXPECT_EQ(msg, store.GetErrMsg());
 }
 
 std::string StoreTest::databaseBytes() const {

@@ -15,7 +15,10 @@
 #include "fake_clock.h"
 #include "fake_host.h"
 #include "fake_ids.h"
+#include "oauth_db_basic.h"
 #include "redirected_files.h"
+
+using Lines = std::vector<std::string>;
 
 class StoreTest : public testing::Test {
  protected:
@@ -38,12 +41,18 @@ class StoreTest : public testing::Test {
 
   // Statements on the database file by a connection of the test's own. query() gives each row
   // with its values joined by '|', an SQL NULL as "NULL".
-  std::vector<std::string> query(const std::string& sql) const;
+  Lines query(const std::string& sql) const;
   void execute(const std::string& sql) const;
   // The number of rows of a table, -1 if there is no such table.
   int rowCount(const std::string& table) const;
   // The whole file's bytes; "" if there is none.
   std::string databaseBytes() const;
+
+  // For failures that must leave the error state as they found it.
+  static void recordEarlierError(ZEVOOAUTHSERVER::OAUTHDBBasic& store);
+  static void expectEarlierError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
+  static void expectError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, int code,
+                          const std::string& msg);
 
   RedirectedFiles files_;
   FakeClock clock_;
