@@ -28,6 +28,9 @@ inline constexpr int kErrTableFull = -5;      // "<table> Table is full", in the
 // Opening and closing raise the effective user and group id of the whole process to root for the
 // length of that one call: no other thread may depend on the ids meanwhile.
 //
+// Many processes may use the file at once: each statement waits up to 5 seconds for the others
+// and then fails with SQLite's code 5, "database is locked".
+//
 // Operations return true, or non-zero, on success. A failure leaves its reason in GetErrCode()
 // and GetErrMsg(), unless its comment says "log only"; a success leaves the previous error there.
 // Log only, for every operation: no row to change or delete, and a store that is not ready, whose
@@ -65,8 +68,8 @@ class OAUTHDBBasic {
 
   // Schema. These run before the store is ready.
 
-  // Creates the tables that are missing, and the schema-version rows with the meta table. True
-  // once all five exist.
+  // Creates the tables that are missing; the meta table and the schema-version rows in it come
+  // together or not at all. True once all five exist.
   bool DBInit();
   // Runs one CREATE statement; kErrCreateTable on failure.
   bool CreateDBTab(const std::string& sql);
@@ -135,9 +138,14 @@ class OAUTHDBBasic {
   static bool ParamDecrypt(Json::Value& doc);
 
  private:
+  friend class Transaction;
+
   // The public constructor delegates to this one first, so that the destructor closes the
   // connection when a later step of the construction throws.
   explicit OAUTHDBBasic(sqlite3* db) : db_(db) {}
+
+  bool lookUpTable(const std::string& name, bool& exists);
+  bool createMetaTable();
 
   int errCode_ = kErrNone;
   bool ready_ = false;

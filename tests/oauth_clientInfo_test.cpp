@@ -506,13 +506,14 @@ TEST_F(ClientInfoAuditTest, RotatesTheAuditLog) {
 
 TEST_F(ClientInfoAuditTest, OpensTheAuditLogForEveryAttempt) {
   const std::string opened = "open /var/packages/Keyloft/target/etc/oauth.db";
+  const std::string waits = "busy_timeout 5000";
   OAUTHDBClientInfo clients("oauth_clientInfo");
   EXPECT_EQ(1, add(clients, Client()));
   EXPECT_EQ(0, add(clients, clientWith(&Client::scope, "")));
   writeSettings(R"({"client_info_max": 1})");
   EXPECT_EQ(0, add(clients, Client()));
-  EXPECT_THAT(files_.calls(),
-              ElementsAre(opened, opened, "close", opened, "close", opened, "close"));
+  EXPECT_THAT(files_.calls(), ElementsAre(opened, waits, opened, waits, "close", opened, waits,
+                                          "close", opened, waits, "close"));
 }
 
 // --- Add with credentials of its own ---

@@ -284,8 +284,8 @@ TYPED_TEST(EveryStoreTest, StartsWithoutAnError) {
 
 TYPED_TEST(EveryStoreTest, ClosesWhatItOpened) {
   { const TypeParam store("oauth_token"); }
-  EXPECT_THAT(this->files_.calls(),
-              ElementsAre("open /var/packages/Keyloft/target/etc/oauth.db", "close"));
+  EXPECT_THAT(this->files_.calls(), ElementsAre("open /var/packages/Keyloft/target/etc/oauth.db",
+                                                "busy_timeout 5000", "close"));
 }
 
 TYPED_TEST(EveryStoreTest, CannotBeCopied) {
@@ -628,18 +628,17 @@ TEST_F(InitTest, WritesNoVersionsWithoutAMetaTable) {
   EXPECT_THAT(query(kTables), ElementsAre("occupied"));
 }
 
-TEST_F(InitTest, GoesOnWithoutVersionRows) {
+TEST_F(InitTest, CreatesNothingWithoutVersionRows) {
   execute("CREATE VIEW oauth_meta AS SELECT 1 AS tab_name, 2 AS version");
+  const std::string before = databaseBytes();
   OAUTHDBBasic store;
   const std::string failed =
       "3 oauth_db_basic.cpp Run Command failed!![cannot modify oauth_meta because it is a view][1]";
   EXPECT_THAT(log_.lines(), ElementsAre(failed, "3 oauth_db_basic.cpp Add Meta failed", failed,
                                         "3 oauth_db_basic.cpp Add Meta failed", failed,
                                         "3 oauth_db_basic.cpp Add Meta failed"));
-  expectError(store, 1, "cannot modify oauth_meta because it is a view");
-  expectReady(store);
-  EXPECT_THAT(query(kTables),
-              ElementsAre("oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"));
+  expectUnready(store, 1, "cannot modify oauth_meta because it is a view");
+  EXPECT_EQ(before, databaseBytes());
 }
 
 // A table that cannot be created, and the tables that are there nevertheless.
@@ -680,6 +679,9 @@ INSTANTIATE_TEST_SUITE_P(
 
 // --- Diagnostics of the initialisation ---
 
+constexpr char kLooksForMeta[] =
+    "3 oauth_db_basic.cpp ==> DBCmdRun[SELECT * FROM sqlite_master "
+    "WHERE name='oauth_meta' and type='table';]";
 constexpr char kCreatesMeta[] =
     "3 oauth_db_basic.cpp ==> DBCmdRun[CREATE TABLE IF NOT EXISTS oauth_meta("
     "tab_name text NOT NULL, version integer NOT NULL);]";
@@ -724,9 +726,8 @@ TEST_F(InitDiagnosticsTest, TracesTwoTablesAsEntries) {
   construct(8);
   EXPECT_THAT(
       log_.lines(),
-      ElementsAre("3 oauth_db_basic.cpp ==> DBInit[init meta table]",
-                  "3 oauth_db_basic.cpp ==> DBCmdRun[SELECT * FROM sqlite_master "
-                  "WHERE name='oauth_meta' and type='table';]",
+      ElementsAre("3 oauth_db_basic.cpp ==> DBInit[init meta table]", kLooksForMeta,
+                  "3 oauth_db_basic.cpp ==> DBCmdRun[BEGIN IMMEDIATE;]", kLooksForMeta,
                   kCreatesMeta, "3 oauth_db_basic.cpp Create tab success",
                   "3 oauth_db_basic.cpp ==> AddMetaData",
                   "3 oauth_db_basic.cpp ==> DBCmdRun[INSERT INTO oauth_meta(tab_name, version) "
@@ -735,6 +736,7 @@ TEST_F(InitDiagnosticsTest, TracesTwoTablesAsEntries) {
                   "VALUES('oauth_grantCode', 2);]",
                   "3 oauth_db_basic.cpp ==> DBCmdRun[INSERT INTO oauth_meta(tab_name, version) "
                   "VALUES('oauth_token', 2);]",
+                  "3 oauth_db_basic.cpp ==> DBCmdRun[COMMIT;]",
                   "3 oauth_db_basic.cpp ==> DBInit[init client table]", kCreatesClientInfo,
                   "3 oauth_db_basic.cpp Create tab success", kCreatesToken,
                   "3 oauth_db_basic.cpp Create tab success", kCreatesGrantCode,
@@ -747,11 +749,12 @@ TEST_F(InitDiagnosticsTest, KeepsTheFormatsOfTheTraces) {
   EXPECT_THAT(
       log_.formats(),
       ElementsAre("%s:%d ==> %s[init meta table]", "%s:%d ==> %s[%s]", "%s:%d ==> %s[%s]",
-                  "%s:%d Create tab success", "%s:%d ==> %s", "%s:%d ==> %s[%s]",
-                  "%s:%d ==> %s[%s]", "%s:%d ==> %s[%s]", "%s:%d ==> %s[init client table]",
-                  "%s:%d ==> %s[%s]", "%s:%d Create tab success", "%s:%d ==> %s[%s]",
+                  "%s:%d ==> %s[%s]", "%s:%d ==> %s[%s]", "%s:%d Create tab success",
+                  "%s:%d ==> %s", "%s:%d ==> %s[%s]", "%s:%d ==> %s[%s]", "%s:%d ==> %s[%s]",
+                  "%s:%d ==> %s[%s]", "%s:%d ==> %s[init client table]", "%s:%d ==> %s[%s]",
                   "%s:%d Create tab success", "%s:%d ==> %s[%s]", "%s:%d Create tab success",
-                  "%s:%d ==> %s[%s]", "%s:%d Create tab success"));
+                  "%s:%d ==> %s[%s]", "%s:%d Create tab success", "%s:%d ==> %s[%s]",
+                  "%s:%d Create tab success"));
 }
 
 TEST_F(InitDiagnosticsTest, HasNoRowToDumpInAFreshFile) {
@@ -775,9 +778,7 @@ TEST_F(InitDiagnosticsTest, TracesAWholeConstructionOnAnExistingFile) {
   construct(15);
   EXPECT_THAT(
       log_.lines(),
-      ElementsAre("3 oauth_db_basic.cpp ==> DBInit[init meta table]",
-                  "3 oauth_db_basic.cpp ==> DBCmdRun[SELECT * FROM sqlite_master "
-                  "WHERE name='oauth_meta' and type='table';]",
+      ElementsAre("3 oauth_db_basic.cpp ==> DBInit[init meta table]", kLooksForMeta,
                   "3 oauth_db_basic.cpp ==> IsTabExistCallback",
                   "3 oauth_db_basic.cpp ##### [0][type = table]",
                   "3 oauth_db_basic.cpp ##### [1][name = oauth_meta]",
@@ -1051,10 +1052,11 @@ class CloseTest : public LifecycleTest {};
 TEST_F(CloseTest, ClosesTheConnection) {
   std::optional<OAUTHDBBasic> store;
   store.emplace();
-  EXPECT_THAT(files_.calls(), ElementsAre("open /var/packages/Keyloft/target/etc/oauth.db"));
-  store.reset();
   EXPECT_THAT(files_.calls(),
-              ElementsAre("open /var/packages/Keyloft/target/etc/oauth.db", "close"));
+              ElementsAre("open /var/packages/Keyloft/target/etc/oauth.db", "busy_timeout 5000"));
+  store.reset();
+  EXPECT_THAT(files_.calls(), ElementsAre("open /var/packages/Keyloft/target/etc/oauth.db",
+                                          "busy_timeout 5000", "close"));
   EXPECT_THAT(log_.lines(), IsEmpty());
 }
 

@@ -1183,9 +1183,10 @@ TEST_F(GrantCodeTraceTest, PurgingTracesEveryDelete) {
   const Lines lines = traced(9, [](OAUTHDBGrantCode& codes) { EXPECT_EQ(1, codes.Purge()); });
   EXPECT_THAT(
       lines,
-      ElementsAre("3 oauth_grantCode.cpp ==> Purge", "3 oauth_grantCode.cpp ==> Get",
-                  "3 oauth_db_basic.cpp ==> DBGet", "3 oauth_db_basic.cpp ==> GetConditionParam",
-                  "3 oauth_db_basic.cpp ==> DBCmd",
+      ElementsAre("3 oauth_grantCode.cpp ==> Purge", "3 oauth_db_basic.cpp ==> DBCmd",
+                  "3 oauth_db_basic.cpp ==> DBCmdRun[BEGIN IMMEDIATE;]",
+                  "3 oauth_grantCode.cpp ==> Get", "3 oauth_db_basic.cpp ==> DBGet",
+                  "3 oauth_db_basic.cpp ==> GetConditionParam", "3 oauth_db_basic.cpp ==> DBCmd",
                   "3 oauth_db_basic.cpp ==> DBCmdRun[SELECT * FROM oauth_grantCode ;]",
                   "3 oauth_db_basic.cpp ==> TabGetCallback",
                   "3 oauth_db_basic.cpp ==> ParamDecrypt[client_id]",
@@ -1195,7 +1196,8 @@ TEST_F(GrantCodeTraceTest, PurgingTracesEveryDelete) {
                   "3 oauth_db_basic.cpp ==> DBDel", "3 oauth_db_basic.cpp ==> GetConditionParam",
                   "3 oauth_db_basic.cpp ==> ConcateParam", "3 oauth_db_basic.cpp ==> DBCmd",
                   "3 oauth_db_basic.cpp ==> DBCmdRun[DELETE FROM oauth_grantCode WHERE id='2';]",
-                  "3 oauth_db_basic.cpp ClientInfo Delete success, changed[1]"));
+                  "3 oauth_db_basic.cpp ClientInfo Delete success, changed[1]",
+                  "3 oauth_db_basic.cpp ==> DBCmd", "3 oauth_db_basic.cpp ==> DBCmdRun[COMMIT;]"));
 }
 
 // --- A store that could not be opened ---

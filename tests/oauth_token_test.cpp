@@ -1484,15 +1484,17 @@ TEST_F(TokenTraceTest, PurgingTracesEveryDelete) {
   const Lines lines = traced(8, [](OAUTHDBToken& tokens) { EXPECT_EQ(1, tokens.Purge()); });
   EXPECT_THAT(
       lines,
-      ElementsAre("3 oauth_token.cpp ==> Purge", "3 oauth_token.cpp ==> Get",
-                  "3 oauth_db_basic.cpp ==> DBGet", "3 oauth_db_basic.cpp ==> GetConditionParam",
-                  "3 oauth_db_basic.cpp ==> DBCmd",
+      ElementsAre("3 oauth_token.cpp ==> Purge", "3 oauth_db_basic.cpp ==> DBCmd",
+                  "3 oauth_db_basic.cpp ==> DBCmdRun[BEGIN IMMEDIATE;]",
+                  "3 oauth_token.cpp ==> Get", "3 oauth_db_basic.cpp ==> DBGet",
+                  "3 oauth_db_basic.cpp ==> GetConditionParam", "3 oauth_db_basic.cpp ==> DBCmd",
                   "3 oauth_db_basic.cpp ==> DBCmdRun[SELECT * FROM oauth_token ;]",
                   "3 oauth_db_basic.cpp ==> TabGetCallback",
                   "3 oauth_db_basic.cpp ==> TabGetCallback", "3 oauth_token.cpp ==> Del",
                   "3 oauth_db_basic.cpp ==> DBDel", "3 oauth_db_basic.cpp ==> GetConditionParam",
                   "3 oauth_db_basic.cpp ==> ConcateParam", "3 oauth_db_basic.cpp ==> DBCmd",
-                  "3 oauth_db_basic.cpp ==> DBCmdRun[DELETE FROM oauth_token WHERE id='2';]"));
+                  "3 oauth_db_basic.cpp ==> DBCmdRun[DELETE FROM oauth_token WHERE id='2';]",
+                  "3 oauth_db_basic.cpp ==> DBCmd", "3 oauth_db_basic.cpp ==> DBCmdRun[COMMIT;]"));
 }
 
 TEST_F(TokenTraceTest, LookupsTraceTheirNames) {

@@ -12,6 +12,7 @@
 #include "host_libraries.h"
 #include "oauth_names.h"
 #include "oauth_syslog.h"
+#include "oauth_transaction.h"
 #include "sqlite_text.h"
 
 namespace ZEVOOAUTHSERVER {
@@ -71,6 +72,8 @@ class RaisedPrivilege {
 
   const unsigned user_, group_;
 };
+
+constexpr int kBusyTimeout = 5000;  // milliseconds
 
 using HostCipher = int (*)(const char* text, char* out, int outSize);
 
@@ -154,6 +157,8 @@ OAUTHDBBasic::OAUTHDBBasic() : OAUTHDBBasic(nullptr) {
     SetErrCode(result);
     SetErrMsg("Open DB failed!!");
     OAUTH_FAIL("Open DB failed!![%d]", result);
+  } else {
+    sqlite3_busy_timeout(db_, kBusyTimeout);
   }
   // Also after a failed open: SQLite hands out a handle then too, and what fails on it is logged.
   DBInit();
@@ -185,13 +190,7 @@ bool OAUTHDBBasic::DBInit() {
   };
 
   OAUTH_DIAG(kEntry, "==> %s[init meta table]", __func__);
-  if (!IsDBTabExist(names::table::kMeta)) {
-    if (!CreateDBTab(names::schema::kMeta)) {
-      OAUTH_FAIL("Create Table failed!![meta]");
-      return ready_;
-    }
-    AddMetaData();
-  }
+  if (!IsDBTabExist(names::table::kMeta) && !createMetaTable()) return ready_;
   // Two of these five traces are entry traces and three are results: log filters rely on it.
   OAUTH_DIAG(kEntry, "==> %s[init client table]", __func__);
   if (!create(names::schema::kClientInfo, names::table::kClientInfo)) return ready_;
@@ -205,6 +204,29 @@ bool OAUTHDBBasic::DBInit() {
   return true;
 }
 
+// All or nothing, and only once: whoever comes first among several processes creates the table,
+// and the others see so inside their own transaction. A look-up that failed before is made up for
+// here; one that fails again is a failed initialisation, not a missing table.
+bool OAUTHDBBasic::createMetaTable() {
+  Transaction transaction(*this, &OAUTHDBBasic::DBCmdRun);
+  bool exists = false;
+  if (!transaction.begun() || !lookUpTable(names::table::kMeta, exists)) {
+    SetErrCode(kErrCreateTable);
+    SetErrMsg("Create table failed");
+    OAUTH_FAIL("Create Table failed!![meta]");
+    return false;
+  }
+  if (exists) return transaction.commit();
+  if (!CreateDBTab(names::schema::kMeta)) {
+    OAUTH_FAIL("Create Table failed!![meta]");
+    return false;
+  }
+  const int rowsBefore = sqlite3_total_changes(db_);
+  AddMetaData();
+  constexpr int kVersionedTables = 3;
+  return sqlite3_total_changes(db_) - rowsBefore == kVersionedTables && transaction.commit();
+}
+
 bool OAUTHDBBasic::CreateDBTab(const std::string& sql) {
   if (!DBCmdRun(sql, nullptr, nullptr)) {
     SetErrCode(kErrCreateTable);
@@ -215,12 +237,19 @@ bool OAUTHDBBasic::CreateDBTab(const std::string& sql) {
   return true;
 }
 
-bool OAUTHDBBasic::IsDBTabExist(const std::string& name) {
+// False if the look-up itself failed.
+bool OAUTHDBBasic::lookUpTable(const std::string& name, bool& exists) {
   Json::Value probe;
   probe[names::result::kExist] = false;
   const std::string sql = "SELECT * FROM sqlite_master WHERE name='" + name + "' and type='table';";
   if (!DBCmdRun(sql, IsTabExistCallback, &probe)) return false;
-  if (!probe[names::result::kExist].asBool()) return false;
+  exists = probe[names::result::kExist].asBool();
+  return true;
+}
+
+bool OAUTHDBBasic::IsDBTabExist(const std::string& name) {
+  bool exists = false;
+  if (!lookUpTable(name, exists) || !exists) return false;
   OAUTH_DIAG(kEntry, "Tab[%s] is exist", name.c_str());
   return true;
 }

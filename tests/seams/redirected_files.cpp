@@ -99,6 +99,12 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
   return sqlite3_open_v2(redirected(path).c_str(), db, flags, nullptr);
 }
 
+// Recorded and not set: what is locked in a test of one process stays locked.
+extern "C" int sqlite3_busy_timeout(sqlite3*, int milliseconds) {
+  state.calls.push_back("busy_timeout " + std::to_string(milliseconds));
+  return SQLITE_OK;
+}
+
 extern "C" int sqlite3_close(sqlite3* db) {
   state.calls.emplace_back("close");
   const int code = next("sqlite3_close", sqlite3_close)(db);

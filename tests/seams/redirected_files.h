@@ -36,6 +36,7 @@ class RedirectedFiles {
   // sqlite3_mprintf() finds no memory.
   void failFormatting();
 
-  // Every call of the library that opens or closes: "open <path>", "close".
+  // Every call of the library that opens or closes: "open <path>", "busy_timeout 5000",
+  // "close".
   const std::vector<std::string>& calls() const;
 };
