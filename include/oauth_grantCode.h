@@ -36,6 +36,7 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& expired_time, const std::string& state);
 
+  // Spends the code: of several processes that try, one succeeds.
   int Del(long long id);
 
   // Reads rows into *out: by code (64 bytes, else kErrBadParameters), by row id, or all. An
@@ -47,7 +48,8 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
   // Row id of the code, its low 32 bits; 0 for an unknown code or a failed look-up.
   int GetIndex(const std::string& code);
 
-  // Sets the expiry to now; the code counts as expired from the next second on.
+  // Sets the expiry to now; the code counts as expired from the next second on. This claims
+  // nothing: of several processes that try, all succeed.
   int Revoke(long long id);
 
   // Deletes every expired code. 0 only if a row could not be deleted: a failed read deletes

@@ -45,7 +45,8 @@ class OAUTHDBToken : public OAUTHDBBasic {
            const std::string& scope, const std::string& expired_time, const std::string& flow_type,
            const std::string& state);
 
-  // Both delete the row, access token and refresh token together.
+  // Both delete the row, access token and refresh token together. Of several processes that try,
+  // one succeeds: it may issue the new tokens of a refresh.
   int Del(long long id);
   int Revoke(long long id);
 

@@ -47,11 +47,13 @@ cross_cmake() { # PACKAGE OPTION...
   cmake --install "$work/$1/cross"
 }
 
-# The amalgamation is made natively: on the way helper programs are built and run.
+# The amalgamation is made natively: on the way helper programs are built and run. Without usleep()
+# a connection that waits for another sleeps whole seconds, and gives up after five of them.
 build_sqlite3() {
   (cd "$work/sqlite3" && ./configure && make sqlite3.c sqlite3.h)
   $host-gcc "${flags[@]}" -fPIC -shared -Wl,-soname,libsqlite3.so.0 -DSQLITE_THREADSAFE=1 \
     -DSQLITE_SECURE_DELETE -DSQLITE_ENABLE_COLUMN_METADATA -DSQLITE_ENABLE_UNLOCK_NOTIFY \
+    -DHAVE_USLEEP=1 -DHAVE_FDATASYNC=1 \
     -o "$prefix/lib/libsqlite3.so.0" "$work/sqlite3/sqlite3.c"
   ln -sf libsqlite3.so.0 "$prefix/lib/libsqlite3.so"
   cp "$work/sqlite3/sqlite3.h" "$prefix/include/"

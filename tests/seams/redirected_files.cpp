@@ -22,7 +22,7 @@ constexpr char kDebugMarker[] = "/tmp/zevooauth_debug";
 struct State {
   std::string directory;
   bool temporary = true;
-  bool readOnly = false;
+  bool readOnly = false, waitForLocks = false;
   int openCode = SQLITE_OK, closeCode = SQLITE_OK;
   bool failFormatting = false, failEntropy = false;
   std::vector<std::string> calls;
@@ -83,6 +83,7 @@ std::string RedirectedFiles::debugMarker() const { return redirected(kDebugMarke
 void RedirectedFiles::removeDirectory() { std::filesystem::remove_all(state.directory); }
 void RedirectedFiles::openReadOnly() { state.readOnly = true; }
 void RedirectedFiles::openWithoutHandle(int code) { state.openCode = code; }
+void RedirectedFiles::waitForLocks() { state.waitForLocks = true; }
 void RedirectedFiles::failClose(int code) { state.closeCode = code; }
 void RedirectedFiles::failEntropy() { state.failEntropy = true; }
 void RedirectedFiles::failFormatting() { state.failFormatting = true; }
@@ -99,10 +100,11 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
   return sqlite3_open_v2(redirected(path).c_str(), db, flags, nullptr);
 }
 
-// Recorded and not set: what is locked in a test of one process stays locked.
-extern "C" int sqlite3_busy_timeout(sqlite3*, int milliseconds) {
+// Recorded, and set only on demand: what is locked in a test of one process stays locked.
+extern "C" int sqlite3_busy_timeout(sqlite3* db, int milliseconds) {
   state.calls.push_back("busy_timeout " + std::to_string(milliseconds));
-  return SQLITE_OK;
+  return state.waitForLocks ? next("sqlite3_busy_timeout", sqlite3_busy_timeout)(db, milliseconds)
+                            : SQLITE_OK;
 }
 
 extern "C" int sqlite3_close(sqlite3* db) {

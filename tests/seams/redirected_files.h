@@ -29,6 +29,8 @@ class RedirectedFiles {
   void openReadOnly();
   // sqlite3_open() answers this code and hands out no handle, as it does without memory.
   void openWithoutHandle(int code);
+  // Locks of other processes are waited for, as long as the library asks.
+  void waitForLocks();
   // sqlite3_close() closes, and answers this code.
   void failClose(int code);
   // The device of the operating system's entropy cannot be opened.
