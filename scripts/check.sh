@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # What a machine can say about the code: formatting, shell scripts, clang-tidy, tests in any order
-# and for an ordinary user, branch coverage of src/. Installs what is missing (scripts/packages.sh, groups build, test and check).
+# and for an ordinary user, branch coverage of src/.
+# Installs what is missing (scripts/packages.sh, groups build, test and check).
 set -euo pipefail
 cd "$(dirname "$0")/.."
 

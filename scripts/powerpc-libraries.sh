@@ -18,7 +18,7 @@ flags=(-O2 -D_FILE_OFFSET_BITS=64 -D_TIME_BITS=64)
 
 fetch() { # PACKAGE: leaves its source tree in $work/PACKAGE
   local apt=$work/apt
-  if [ ! -e "$apt/sources.list" ]; then
+  if [ ! -e "$apt/updated" ]; then
     mkdir -p "$apt/lists/partial" "$apt/cache/archives/partial"
     # shellcheck disable=SC2016 # apt-get expands these itself
     apt-get indextargets --format 'deb-src $(REPO_URI) $(RELEASE) $(COMPONENT)' \
@@ -31,6 +31,7 @@ Dir::Cache "$apt/cache";
 APT::Sandbox::User "root";
 END
     APT_CONFIG=$apt/apt.conf apt-get update -qq
+    touch "$apt/updated"
   fi
   rm -rf "${work:?}/$1" "$work/download"
   mkdir "$work/download"
@@ -84,7 +85,19 @@ for package in sqlite3 libjsoncpp googletest nettle; do
   if [ ! -e "$prefix/$package.done" ]; then
     echo "powerpc-libraries: building $package"
     fetch "$package"
-    (build_$package) >"$work/$package.log" 2>&1 || { tail -n 40 "$work/$package.log" && exit 1; }
+    # Not in a condition: there the shell would go on after a step that failed.
+    set +e
+    (
+      set -e
+      build_$package
+    ) >"$work/$package.log" 2>&1
+    status=$?
+    set -e
+    if [ "$status" -ne 0 ]; then
+      tail -n 40 "$work/$package.log"
+      echo "powerpc-libraries: could not build $package" >&2
+      exit 1
+    fi
     touch "$prefix/$package.done"
     rm -rf "${work:?}/$package"
   fi
