@@ -2,6 +2,7 @@
 
 #include <sqlite3.h>
 
+#include <algorithm>
 #include <fstream>
 #include <memory>
 #include <sstream>
@@ -51,6 +52,17 @@ void StoreTest::execute(const std::string& sql) const { query(sql); }
 int StoreTest::rowCount(const std::string& table) const {
   if (query("SELECT 1 FROM sqlite_master WHERE name='" + table + "'").empty()) return -1;
   return std::stoi(query("SELECT COUNT(*) FROM " + table).front());
+}
+
+Lines StoreTest::everyRow() const {
+  Lines rows;
+  for (const std::string& table : query("SELECT name FROM sqlite_master WHERE type = 'table'")) {
+    const bool log = table == "oauth_log";
+    for (const std::string& row : query((log ? "SELECT msg, id FROM " : "SELECT * FROM ") + table))
+      rows.push_back(std::string(table).append("|").append(row));
+  }
+  std::sort(rows.begin(), rows.end());
+  return rows;
 }
 
 void StoreTest::recordEarlierError(ZEVOOAUTHSERVER::OAUTHDBBasic& store) {

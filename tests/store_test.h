@@ -45,6 +45,9 @@ class StoreTest : public testing::Test {
   void execute(const std::string& sql) const;
   // The number of rows of a table, -1 if there is no such table.
   int rowCount(const std::string& table) const;
+  // Every row of every table as "<table>|<values>", in order; without the time of a log row, which
+  // the database's own clock wrote.
+  Lines everyRow() const;
   // The whole file's bytes; "" if there is none.
   std::string databaseBytes() const;
 

@@ -7,6 +7,8 @@
 #include <cstdio>
 #include <mutex>
 
+#include "own_work.h"
+
 namespace {
 
 struct Entry {
@@ -19,6 +21,7 @@ std::vector<Entry> entries;
 CapturedSyslog* current = nullptr;
 
 [[gnu::format(printf, 2, 0)]] void record(int priority, const char* format, va_list arguments) {
+  const OwnWork seam;
   va_list again;
   va_copy(again, arguments);
   const int length = std::vsnprintf(nullptr, 0, format, arguments);

@@ -6,6 +6,7 @@
 #include <optional>
 
 #include "host_libraries.h"
+#include "own_work.h"
 
 namespace {
 
@@ -63,6 +64,7 @@ std::string FakeHost::sealed(const std::string& plain) {
 }
 
 extern "C" int ZOCLCryptSzEncrypt(const char* plain, char* out, int outSize) {
+  const OwnWork seam;
   const std::lock_guard<std::mutex> lock(guard);
   note("encrypt " + std::string(plain), outSize);
   if (fails(state.encryptCountdown)) return 0;
@@ -70,6 +72,7 @@ extern "C" int ZOCLCryptSzEncrypt(const char* plain, char* out, int outSize) {
 }
 
 extern "C" int ZOCLCryptSzDecrypt(const char* cipher, char* out, int outSize) {
+  const OwnWork seam;
   const std::lock_guard<std::mutex> lock(guard);
   note("decrypt " + std::string(cipher), outSize);
   const std::string text = cipher;
@@ -79,6 +82,7 @@ extern "C" int ZOCLCryptSzDecrypt(const char* cipher, char* out, int outSize) {
 }
 
 extern "C" int ZevoCgiGetRemoteIP(char* out, int outSize) {
+  const OwnWork seam;
   const std::lock_guard<std::mutex> lock(guard);
   note("ip", outSize);
   if (!state.remoteIp && !state.overfill) return -1;

@@ -5,6 +5,8 @@
 #include <cerrno>
 #include <map>
 
+#include "own_work.h"
+
 namespace {
 
 struct State {
@@ -16,6 +18,7 @@ struct State {
 State state;
 
 int change(const char* name, unsigned& id, unsigned real, unsigned effective, unsigned saved) {
+  const OwnWork seam;
   const std::string call = std::string(name) + "(" + std::to_string(static_cast<int>(real)) + ", " +
                            std::to_string(static_cast<int>(effective)) + ", " +
                            std::to_string(static_cast<int>(saved)) + ")";

@@ -13,6 +13,8 @@
 #include <filesystem>
 #include <stdexcept>
 
+#include "own_work.h"
+
 namespace {
 
 constexpr char kDatabase[] = "/var/packages/Keyloft/target/etc/oauth.db";
@@ -90,6 +92,7 @@ void RedirectedFiles::failFormatting() { state.failFormatting = true; }
 const std::vector<std::string>& RedirectedFiles::calls() const { return state.calls; }
 
 extern "C" int sqlite3_open(const char* path, sqlite3** db) {
+  const OwnWork seam;
   state.calls.push_back(std::string("open ") + path);
   if (state.openCode != SQLITE_OK) {
     *db = nullptr;
@@ -102,12 +105,14 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
 
 // Recorded, and set only on demand: what is locked in a test of one process stays locked.
 extern "C" int sqlite3_busy_timeout(sqlite3* db, int milliseconds) {
+  const OwnWork seam;
   state.calls.push_back("busy_timeout " + std::to_string(milliseconds));
   return state.waitForLocks ? next("sqlite3_busy_timeout", sqlite3_busy_timeout)(db, milliseconds)
                             : SQLITE_OK;
 }
 
 extern "C" int sqlite3_close(sqlite3* db) {
+  const OwnWork seam;
   state.calls.emplace_back("close");
   const int code = next("sqlite3_close", sqlite3_close)(db);
   return state.closeCode != SQLITE_OK ? state.closeCode : code;
@@ -123,10 +128,12 @@ extern "C" char* sqlite3_mprintf(const char* format, ...) {
 }
 
 extern "C" FILE* fopen64(const char* path, const char* mode) {
+  const OwnWork seam;
   return next("fopen64", fopen64)(redirected(path).c_str(), mode);
 }
 
 extern "C" int open64(const char* path, int flags, ...) {
+  const OwnWork seam;
   if (state.failEntropy && std::strcmp(path, "/dev/urandom") == 0) {
     errno = EMFILE;
     return -1;
@@ -139,5 +146,6 @@ extern "C" int open64(const char* path, int flags, ...) {
 }
 
 extern "C" int access(const char* path, int mode) noexcept {
+  const OwnWork seam;
   return next("access", access)(redirected(path).c_str(), mode);
 }
