@@ -17,7 +17,8 @@ shellcheck .ci/run scripts/*.sh tests/*.sh
 echo "check: shell scripts are sound"
 
 folder=$(scripts/build.sh dev dev | tail -n 1)
-printf '%s\n' "${sources[@]}" | grep '\.cpp$' |
+# The fuzz targets are another compiler's build: there are no commands for them in this one.
+printf '%s\n' "${sources[@]}" | grep '\.cpp$' | grep -v '^tests/fuzz/' |
   xargs --max-procs="$(nproc)" --max-args=1 clang-tidy --quiet -p "$folder" --warnings-as-errors='*' \
     2> >(grep -v ' generated\.$' >&2)
 echo "check: clang-tidy has nothing to say"

@@ -1,0 +1,58 @@
+#!/usr/bin/env bash
+# Feeds hostile input to the library: every target of tests/fuzz, each for so many seconds.
+#
+#   scripts/fuzz.sh SECONDS
+#
+# Installs what is missing (scripts/packages.sh, groups build and fuzz). Starts from the inputs kept
+# in tests/fuzz/corpus and what earlier runs found worth keeping, which stays in the build folder.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+if ! [[ ${1:-} =~ ^[1-9][0-9]*$ ]]; then
+  echo "usage: scripts/fuzz.sh SECONDS" >&2
+  exit 2
+fi
+export seconds=$1
+
+scripts/packages.sh build fuzz
+folder=$(scripts/build.sh fuzz fuzz | tail -n 1)/tests/fuzz
+export folder
+
+# Settings and databases are files: in memory where the machine offers that.
+TMPDIR=$(mktemp -d -p /dev/shm 2>/dev/null || mktemp -d)
+trap 'rm -rf "$TMPDIR"' EXIT
+export TMPDIR
+# How much freed memory is kept from use: what fits a processor's cache.
+export ASAN_OPTIONS=quarantine_size_mb=16
+
+statistic() { # LOG NAME
+  sed -n "s/^stat::$2: *//p" "$1"
+}
+
+run() { # TARGET; inputs grow to the size of the largest kept one, or 4096 bytes
+  local log=$folder/$1.log
+  mkdir -p "$folder/$1.corpus"
+  if ! "$folder/$1" -max_total_time="$seconds" -timeout=25 -rss_limit_mb=2048 \
+    -print_final_stats=1 -artifact_prefix="$folder/$1." \
+    "$folder/$1.corpus" "tests/fuzz/corpus/$1" >"$log" 2>&1; then
+    grep -E '^does not hold: |runtime error: |ERROR: ' "$log" || tail -n 20 "$log"
+    sed -n "s|.*Test unit written to |fuzz: reproduce by $folder/$1 |p" "$log"
+    echo "fuzz: $1 found something, see $log"
+    return 1
+  fi
+  echo "fuzz: $1: $(statistic "$log" number_of_executed_units) executions," \
+    "$(statistic "$log" average_exec_per_sec) a second"
+}
+export -f run statistic
+
+mapfile -t targets < <(basename --suffix=.cpp --multiple tests/fuzz/*_fuzz.cpp)
+if ! printf '%s\n' "${targets[@]}" |
+  xargs --max-procs="$(nproc)" --replace bash -euo pipefail -c 'run {}'; then
+  echo "fuzz: failed" >&2
+  exit 1
+fi
+total=0
+for target in "${targets[@]}"; do
+  total=$((total + $(statistic "$folder/$target.log" number_of_executed_units)))
+done
+echo "fuzz: $total executions of ${#targets[@]} targets in $seconds s each, nothing found"

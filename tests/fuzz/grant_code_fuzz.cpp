@@ -1,0 +1,202 @@
+// Hostile values for the store of authorization codes.
+
+#include <cstddef>
+#include <cstdint>
+#include <vector>
+
+#include "oauth_grantCode.h"
+#include "require.h"
+#include "store_world.h"
+
+namespace {
+
+constexpr char kTable[] = "oauth_grantCode";
+
+class GrantCodeFuzz {
+ public:
+  explicit GrantCodeFuzz(FuzzedDataProvider& input) : input_(input), world_(input) {}
+
+  void step() {
+    switch (input_.ConsumeIntegralInRange(0, 13)) {
+      case 0:
+        return issue();
+      case 1:
+        return del();
+      case 2:
+        return revoke();
+      case 3:
+        return purge();
+      case 4:
+        return world_.moveClock();
+      case 5:
+        return getById();
+      case 6:
+        return getAll();
+      case 7:
+        return editShort();
+      case 8:
+        return editLong();
+      case 9:
+      case 10:
+        return get();
+      default:
+        return add();
+    }
+  }
+
+ private:
+  // The arguments that Add() and Edit() share.
+  struct Grant {
+    explicit Grant(FuzzedDataProvider& input)
+        : user(textOf(input, 1, 256)),
+          client(textOf(input, 64, 64)),
+          scope(textOf(input, 1, 2048)),
+          state(textOf(input, 1, 2048)) {}
+    bool good() const {
+      return fits(user, 1, 256) && fits(client, 64, 64) && fits(scope, 1, 2048) &&
+             fits(state, 1, 2048);
+    }
+    const std::string user, client, scope, state;
+  };
+
+  std::string code() { return textOrKnown(input_, 64, 64, known_); }
+
+  // What Add() must answer, with the model changed as Add() must change the table.
+  int added(const Grant& grant, const std::string& code, const std::string& expiry,
+            const std::string& ip, Json::Value& result) {
+    Rows& rows = world_.rows(kTable);
+    if (rows.size() >= StoreWorld::kRowMax) return world_.fail(-5, "GrantCode Table is full");
+    if (!ip.empty() && !isAddress(ip)) return 0;
+    if (!grant.good() || !fits(code, 64, 64) || !fits(expiry, 1, 128)) return 0;
+    result["code"] = code;
+    for (const auto& [id, row] : rows)
+      if (row.at("code") == doubled(code))
+        return world_.fail(19, "UNIQUE constraint failed: oauth_grantCode.code");
+    world_.add(kTable, {{"username", doubled(grant.user)},
+                        {"client_id", FakeHost::sealed(doubled(grant.client))},
+                        {"scope", doubled(grant.scope)},
+                        {"code", doubled(code)},
+                        {"expired_time", untilNul(expiry)},
+                        {"state", doubled(grant.state)},
+                        {"ip", untilNul(ip)}});
+    return 1;
+  }
+
+  void add() {
+    const Grant grant(input_);
+    const std::string code = this->code();
+    const std::string expiry = expiryOf(input_);
+    const std::string ip = addressOf(input_);
+    known_.push_back(code);
+    Json::Value result, expected;
+    result["other"] = expected["other"] = "kept";
+    const int success =
+        codes_.Add(grant.user, grant.client, grant.scope, code, expiry, grant.state, ip, result);
+    world_.expect(codes_, success, added(grant, code, expiry, ip, expected));
+    StoreWorld::requireEqual(result, expected);
+  }
+  void issue() {
+    const Grant grant(input_);
+    const std::string ip = addressOf(input_);
+    Json::Value result;
+    const int success = codes_.Add(grant.user, grant.client, grant.scope, grant.state, ip, result);
+    // The code is not known before; the one in the result stands for it.
+    const std::string code = success != 0 ? result["code"].asString() : std::string(64, 'x');
+    const std::string expiry = std::to_string(world_.now() + StoreWorld::kPeriod);
+    Json::Value expected;
+    world_.expect(codes_, success, added(grant, code, expiry, ip, expected));
+    if (success != 0) known_.push_back(code);
+  }
+
+  // The short form stores values as they are.
+  void editShort() {
+    const std::int64_t id = world_.anyId(kTable);
+    const Grant grant(input_);
+    const int success = codes_.Edit(id, grant.user, grant.client, grant.scope, grant.state);
+    const auto row = world_.rows(kTable).find(id);
+    if (!grant.good() || row == world_.rows(kTable).end()) return world_.expect(codes_, success, 0);
+    row->second["username"] = untilNul(grant.user);
+    row->second["client_id"] = FakeHost::sealed(untilNul(grant.client));
+    row->second["scope"] = untilNul(grant.scope);
+    row->second["state"] = untilNul(grant.state);
+    world_.expect(codes_, success, 1);
+  }
+  void editLong() {
+    const std::int64_t id = world_.anyId(kTable);
+    const Grant grant(input_);
+    const std::string expiry = expiryOf(input_);
+    const int success = codes_.Edit(id, grant.user, grant.client, grant.scope, expiry, grant.state);
+    const auto row = world_.rows(kTable).find(id);
+    if (!grant.good() || !fits(expiry, 1, 128) || row == world_.rows(kTable).end())
+      return world_.expect(codes_, success, 0);
+    row->second["username"] = doubled(grant.user);
+    row->second["client_id"] = FakeHost::sealed(doubled(grant.client));
+    row->second["scope"] = doubled(grant.scope);
+    row->second["state"] = doubled(grant.state);
+    row->second["expired_time"] = untilNul(expiry);
+    world_.expect(codes_, success, 1);
+  }
+
+  void del() {
+    const std::int64_t id = world_.anyId(kTable);
+    world_.expect(codes_, codes_.Del(id), world_.rows(kTable).erase(id) > 0);
+  }
+  void revoke() {
+    const std::int64_t id = world_.anyId(kTable);
+    const int success = codes_.Revoke(id);
+    const auto row = world_.rows(kTable).find(id);
+    if (row == world_.rows(kTable).end()) return world_.expect(codes_, success, 0);
+    row->second["expired_time"] = std::to_string(world_.now());
+    world_.expect(codes_, success, 1);
+  }
+  void purge() {
+    const int success = codes_.Purge();
+    world_.dropExpired(kTable);
+    world_.expect(codes_, success, 1);
+  }
+
+  // The code is looked up as it is, though it is stored with its quotes doubled.
+  void get() {
+    const std::string code = this->code();
+    Json::Value rows;
+    const int success = codes_.Get(code, &rows);
+    const int index = codes_.GetIndex(code);
+    if (!fits(code, 64, 64)) {
+      require(index == 0, "a bad code has no row id");
+      return world_.expect(codes_, success, world_.fail(-2, "Bad parameters"));
+    }
+    world_.expect(codes_, success, 1);
+    std::int64_t found = 0;
+    world_.expectRows(kTable, rows, [&](const Row& row) {
+      if (row.at("code") != untilNul(code)) return false;
+      found = number(row.at("id"));
+      return true;
+    });
+    require(index == static_cast<int>(found), "the row id is the one of the row");
+  }
+  void getById() {
+    const std::int64_t id = world_.anyId(kTable);
+    Json::Value rows;
+    world_.expect(codes_, codes_.Get(id, &rows), 1);
+    world_.expectRows(kTable, rows, [&](const Row& row) { return number(row.at("id")) == id; });
+  }
+  void getAll() {
+    Json::Value rows;
+    world_.expect(codes_, codes_.Get(&rows), 1);
+    world_.expectRows(kTable, rows, [](const Row&) { return true; });
+  }
+
+  FuzzedDataProvider& input_;
+  StoreWorld world_;
+  ZEVOOAUTHSERVER::OAUTHDBGrantCode codes_{kTable};
+  std::vector<std::string> known_{std::string(64, 'd')};
+};
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  FuzzedDataProvider input(data, size);
+  GrantCodeFuzz fuzz(input);
+  for (int i = 0; i < 8 && input.remaining_bytes() > 0; ++i) fuzz.step();
+  return 0;
+}

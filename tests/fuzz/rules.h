@@ -1,0 +1,18 @@
+// What the stores make of their arguments, written down a second time to compare with.
+
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+
+// The value as SQLite takes it, up to its first NUL byte.
+std::string untilNul(const std::string& value);
+// The same with every single quote doubled: what a store keeps of a value.
+std::string doubled(const std::string& value);
+// Whether the text is min to max bytes long.
+bool fits(const std::string& text, std::size_t min, std::size_t max);
+// An address of either family, as the C library reads them.
+bool isAddress(const std::string& text);
+// Decimal text as a number, the nearest one if it is out of range; 0 for any other text.
+std::int64_t number(const std::string& text);

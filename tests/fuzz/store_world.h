@@ -1,0 +1,72 @@
+// The world of one store under fuzzing: the database in memory, its clock, and a model of what the
+// rules say it must hold.
+
+#pragma once
+
+#include <json/value.h>
+
+#include <cstdint>
+#include <map>
+#include <string>
+
+#include "fake_clock.h"
+#include "fake_host.h"
+#include "fuzz_input.h"
+#include "oauth_db_basic.h"
+#include "redirected_files.h"
+#include "rules.h"
+
+using Row = std::map<std::string, std::string>;  // stored text by column, "id" among them
+using Rows = std::map<std::int64_t, Row>;        // by id
+
+class StoreWorld {
+ public:
+  // What the settings file says, so that small inputs fill a table.
+  static constexpr std::size_t kRowMax = 5, kLogMax = 4;
+  static constexpr int kPeriod = 60;  // seconds
+
+  // Starts with the same rows in every table each time; diagnostics are all on.
+  explicit StoreWorld(FuzzedDataProvider& input);
+  StoreWorld(const StoreWorld&) = delete;
+  StoreWorld& operator=(const StoreWorld&) = delete;
+
+  // The model. Change it, then let expect() compare.
+  Rows& rows(const std::string& table) { return tables_[table]; }
+  void add(const std::string& table, Row row);  // the id is the next one
+  void addToLog(const std::string& msg);
+  void dropExpired(const std::string& table);
+
+  // Notes the error that the store must report from now on; returns 0, the result of failures.
+  int fail(int code, const std::string& msg);
+  // Requires the result, the store's error state and every table to be as the model has them.
+  void expect(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, int result, int expected) const;
+  // Requires the rows that a store delivered to be those of the model for which wanted(row) holds.
+  template <class Wanted>
+  void expectRows(const std::string& table, const Json::Value& delivered, Wanted wanted) {
+    Json::Value expected(Json::arrayValue);
+    for (const auto& [id, row] : rows(table))
+      if (wanted(row)) expected.append(plain(row));
+    requireEqual(delivered, expected);
+  }
+  static void requireEqual(const Json::Value& actual, const Json::Value& expected);
+
+  // The id of a row of the table, or any number.
+  std::int64_t anyId(const std::string& table);
+  // Moves the library's clock, or the database's.
+  void moveClock();
+  std::int64_t now() const { return clock_.now(); }
+  // The lines of the audit log that SQLite finds LIKE the pattern when it is not part of the SQL.
+  static Json::Value linesLike(const std::string& pattern, const std::string& option);
+
+ private:
+  static Json::Value plain(const Row& row);
+  static void expectTable(const std::string& table, const Rows& rows);
+
+  FuzzedDataProvider& input_;
+  RedirectedFiles files_;
+  FakeClock clock_;
+  FakeHost host_;
+  std::map<std::string, Rows> tables_;
+  int code_ = ZEVOOAUTHSERVER::kErrNone;
+  std::string msg_;
+};

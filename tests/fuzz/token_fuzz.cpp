@@ -1,0 +1,249 @@
+// Hostile values for the store of tokens.
+
+#include <cstddef>
+#include <cstdint>
+#include <vector>
+
+#include "oauth_token.h"
+#include "require.h"
+#include "store_world.h"
+
+namespace {
+
+constexpr char kTable[] = "oauth_token";
+
+class TokenFuzz {
+ public:
+  explicit TokenFuzz(FuzzedDataProvider& input) : input_(input), world_(input) {}
+
+  void step() {
+    switch (input_.ConsumeIntegralInRange(0, 15)) {
+      case 0:
+        return issue();
+      case 1:
+        return del();
+      case 2:
+        return purge();
+      case 3:
+        return world_.moveClock();
+      case 4:
+        return getById();
+      case 5:
+        return getAll();
+      case 6:
+        return editShort();
+      case 7:
+        return editLong();
+      case 8:
+        return getWithAccessToken();
+      case 9:
+        return getWithRefreshToken();
+      case 10:
+      case 11:
+        return verify();
+      default:
+        return add();
+    }
+  }
+
+ private:
+  // The arguments that Add() and Edit() share.
+  struct Grant {
+    explicit Grant(FuzzedDataProvider& input)
+        : user(textOf(input, 1, 256)),
+          client(textOf(input, 64, 64)),
+          scope(textOf(input, 1, 2048)),
+          flow(textOf(input, 1, 32)),
+          state(textOf(input, 1, 2048)) {}
+    bool good() const {
+      return fits(user, 1, 256) && fits(client, 64, 64) && fits(scope, 1, 2048) &&
+             fits(flow, 1, 32) && fits(state, 1, 2048);
+    }
+    const std::string user, client, scope, flow, state;
+  };
+
+  std::string token() { return textOrKnown(input_, 64, 64, known_); }
+
+  // What Add() must answer, with the model changed as Add() must change the table.
+  int added(const Grant& grant, const std::string& refresh, const std::string& access,
+            const std::string& expiry, const std::string& ip, Json::Value& result) {
+    Rows& rows = world_.rows(kTable);
+    if (rows.size() >= StoreWorld::kRowMax) return world_.fail(-5, "Token Table is full");
+    if (!ip.empty() && !isAddress(ip)) return 0;
+    if (!grant.good() || !fits(refresh, 64, 64) || !fits(access, 64, 64) || !fits(expiry, 1, 128))
+      return world_.fail(-2, "Bad parameters");
+    result["refresh_token"] = refresh;
+    result["access_token"] = access;
+    for (const auto& [id, row] : rows)
+      if (row.at("access_token") == doubled(access))
+        return world_.fail(19, "UNIQUE constraint failed: oauth_token.access_token");
+    world_.add(kTable, {{"username", doubled(grant.user)},
+                        {"client_id", FakeHost::sealed(doubled(grant.client))},
+                        {"scope", doubled(grant.scope)},
+                        {"refresh_token", doubled(refresh)},
+                        {"access_token", doubled(access)},
+                        {"expired_time", doubled(expiry)},
+                        {"flow_type", doubled(grant.flow)},
+                        {"state", doubled(grant.state)},
+                        {"ip", doubled(ip)}});
+    return 1;
+  }
+
+  void add() {
+    const Grant grant(input_);
+    const std::string refresh = token();
+    const std::string access = token();
+    const std::string expiry = expiryOf(input_);
+    const std::string ip = addressOf(input_);
+    known_.push_back(refresh);
+    known_.push_back(access);
+    Json::Value result, expected;
+    result["other"] = expected["other"] = "kept";
+    const int success = tokens_.Add(grant.user, grant.client, grant.scope, refresh, access, expiry,
+                                    grant.flow, grant.state, ip, result);
+    world_.expect(tokens_, success, added(grant, refresh, access, expiry, ip, expected));
+    StoreWorld::requireEqual(result, expected);
+  }
+  void issue() {
+    const Grant grant(input_);
+    const std::string ip = addressOf(input_);
+    Json::Value result;
+    const int success =
+        tokens_.Add(grant.user, grant.client, grant.scope, grant.flow, grant.state, ip, result);
+    // The tokens are not known before; those in the result stand for them.
+    const std::string unknown(64, 'x');
+    const std::string refresh = success != 0 ? result["refresh_token"].asString() : unknown;
+    const std::string access = success != 0 ? result["access_token"].asString() : unknown;
+    const std::string expiry = std::to_string(world_.now() + StoreWorld::kPeriod);
+    Json::Value expected;
+    world_.expect(tokens_, success, added(grant, refresh, access, expiry, ip, expected));
+    if (success != 0) known_.insert(known_.end(), {refresh, access});
+  }
+
+  // The short form stores values as they are.
+  void editShort() {
+    const std::int64_t id = world_.anyId(kTable);
+    const Grant grant(input_);
+    const int success =
+        tokens_.Edit(id, grant.user, grant.client, grant.scope, grant.flow, grant.state);
+    if (!grant.good()) return world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+    const auto row = world_.rows(kTable).find(id);
+    if (row == world_.rows(kTable).end()) return world_.expect(tokens_, success, 0);
+    row->second["username"] = untilNul(grant.user);
+    row->second["client_id"] = FakeHost::sealed(untilNul(grant.client));
+    row->second["scope"] = untilNul(grant.scope);
+    row->second["flow_type"] = untilNul(grant.flow);
+    row->second["state"] = untilNul(grant.state);
+    world_.expect(tokens_, success, 1);
+  }
+  void editLong() {
+    const std::int64_t id = world_.anyId(kTable);
+    const Grant grant(input_);
+    const std::string expiry = expiryOf(input_);
+    const int success =
+        tokens_.Edit(id, grant.user, grant.client, grant.scope, expiry, grant.flow, grant.state);
+    if (!grant.good() || !fits(expiry, 1, 128))
+      return world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+    const auto row = world_.rows(kTable).find(id);
+    if (row == world_.rows(kTable).end()) return world_.expect(tokens_, success, 0);
+    row->second["username"] = doubled(grant.user);
+    row->second["client_id"] = FakeHost::sealed(doubled(grant.client));
+    row->second["scope"] = doubled(grant.scope);
+    row->second["flow_type"] = doubled(grant.flow);
+    row->second["state"] = doubled(grant.state);
+    row->second["expired_time"] = untilNul(expiry);
+    world_.expect(tokens_, success, 1);
+  }
+
+  void del() {
+    const std::int64_t id = world_.anyId(kTable);
+    const int success = input_.ConsumeBool() ? tokens_.Del(id) : tokens_.Revoke(id);
+    world_.expect(tokens_, success, world_.rows(kTable).erase(id) > 0);
+  }
+  void purge() {
+    const int success = tokens_.Purge();
+    world_.dropExpired(kTable);
+    world_.expect(tokens_, success, 1);
+  }
+
+  void getWithAccessToken() {
+    const std::string access = token();
+    Json::Value rows;
+    const int success = tokens_.GetWithAccessToken(access, &rows);
+    const int index = tokens_.GetIndex(access);
+    if (!fits(access, 64, 64)) {
+      require(index == 0, "a bad token has no row id");
+      return world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+    }
+    world_.expect(tokens_, success, 1);
+    std::int64_t found = 0;
+    world_.expectRows(kTable, rows, [&](const Row& row) {
+      if (row.at("access_token") != doubled(access)) return false;
+      found = number(row.at("id"));
+      return true;
+    });
+    require(index == static_cast<int>(found), "the row id is the one of the row");
+  }
+  void getWithRefreshToken() {
+    const std::string refresh = token();
+    Json::Value rows;
+    const int success = tokens_.GetWithRefreshToken(refresh, &rows);
+    if (!fits(refresh, 64, 64))
+      return world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+    world_.expect(tokens_, success, 1);
+    world_.expectRows(kTable, rows,
+                      [&](const Row& row) { return row.at("refresh_token") == doubled(refresh); });
+  }
+  void verify() {
+    const std::string access = token();
+    Json::Value result;
+    const int success = tokens_.Verify(access, result);
+    if (!fits(access, 64, 64)) {
+      world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+      return expectRefusal(result, -2, "Bad parameters");
+    }
+    for (const auto& [id, row] : world_.rows(kTable)) {
+      if (row.at("access_token") != doubled(access)) continue;
+      if (world_.now() > number(row.at("expired_time"))) break;
+      world_.expect(tokens_, success, 1);
+      Json::Value expected;
+      for (const char* const column : {"username", "scope", "state"})
+        expected[column] = row.at(column);
+      return StoreWorld::requireEqual(result, expected);
+    }
+    world_.expect(tokens_, success, 0);
+    expectRefusal(result, -3, "Access Token Expired");
+  }
+  static void expectRefusal(const Json::Value& result, int code, const char* msg) {
+    Json::Value expected;
+    expected["err_code"] = code;
+    expected["err_msg"] = msg;
+    StoreWorld::requireEqual(result, expected);
+  }
+
+  void getById() {
+    const std::int64_t id = world_.anyId(kTable);
+    Json::Value rows;
+    world_.expect(tokens_, tokens_.Get(id, &rows), 1);
+    world_.expectRows(kTable, rows, [&](const Row& row) { return number(row.at("id")) == id; });
+  }
+  void getAll() {
+    Json::Value rows;
+    world_.expect(tokens_, tokens_.Get(&rows), 1);
+    world_.expectRows(kTable, rows, [](const Row&) { return true; });
+  }
+
+  FuzzedDataProvider& input_;
+  StoreWorld world_;
+  ZEVOOAUTHSERVER::OAUTHDBToken tokens_{kTable};
+  std::vector<std::string> known_{std::string(64, 't'), std::string(64, 'r')};
+};
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  FuzzedDataProvider input(data, size);
+  TokenFuzz fuzz(input);
+  for (int i = 0; i < 8 && input.remaining_bytes() > 0; ++i) fuzz.step();
+  return 0;
+}
