@@ -6,7 +6,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -22,11 +21,6 @@ using testing::ElementsAre;
 using namespace ZEVOOAUTHSERVER;
 
 namespace {
-
-int rounds() {
-  const char* const value = std::getenv("ZEVOOAUTH_ROUNDS");
-  return value == nullptr ? 1 : std::max(1, std::atoi(value));
-}
 
 class ContentionTest : public StoreTest {
  protected:

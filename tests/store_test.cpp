@@ -3,6 +3,7 @@
 #include <sqlite3.h>
 
 #include <algorithm>
+#include <cstdlib>
 #include <fstream>
 #include <memory>
 #include <sstream>
@@ -78,6 +79,11 @@ void StoreTest::expectError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, int code
                             const std::string& msg) {
   EXPECT_EQ(code, store.GetErrCode());
   EXPECT_EQ(msg, store.GetErrMsg());
+}
+
+int StoreTest::rounds() {
+  const char* const value = std::getenv("ZEVOOAUTH_ROUNDS");
+  return value == nullptr ? 1 : std::max(1, std::atoi(value));
 }
 
 std::string StoreTest::databaseBytes() const {

@@ -57,6 +57,9 @@ class StoreTest : public testing::Test {
   static void expectError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, int code,
                           const std::string& msg);
 
+  // How much more work than usual, from ZEVOOAUTH_ROUNDS: for longer runs by hand.
+  static int rounds();
+
   RedirectedFiles files_;
   FakeClock clock_;
   FakeHost host_;
