@@ -1,5 +1,7 @@
 // The input is the database file, with something beside it that may pass for a journal. No store
-// may fall over it, and what fails must say why.
+// may fall over it, what fails must say why, and what SQLite can read a store delivers.
+
+#include <sqlite3.h>
 
 #include <cstddef>
 #include <cstdint>
@@ -33,6 +35,13 @@ void write(const std::string& path, const std::string& bytes) {
   require(static_cast<bool>(file << bytes), "the file can be written");
 }
 
+int collect(void* context, int columns, char** values, char** names) {
+  Json::Value row;
+  for (int i = 0; i < columns; ++i) row[names[i]] = values[i] == nullptr ? "" : values[i];
+  static_cast<Json::Value*>(context)->append(row);
+  return 0;
+}
+
 // Runs operations on one store and looks at what they leave behind.
 class Observer {
  public:
@@ -53,6 +62,23 @@ class Observer {
   template <class Operation>
   void mayOnlyLog(Operation operation) {
     run(operation);
+  }
+
+  // Requires what was read last to be every row of the table that a connection of the fuzzer's own
+  // reads, with all its values; encrypted ones may be delivered as anything.
+  void requireRows(const RedirectedFiles& files, const std::string& table, Json::Value delivered) {
+    Json::Value rows(Json::arrayValue);
+    sqlite3* db = nullptr;
+    sqlite3_open_v2(files.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+    const int code = sqlite3_exec(db, ("SELECT * FROM " + table).c_str(), collect, &rows, nullptr);
+    sqlite3_close_v2(db);
+    // Of two connections, one may come upon damage that the other does not look at.
+    if (code != SQLITE_OK || !ready_ || store_.GetErrCode() == SQLITE_CORRUPT) return;
+    require(store_.GetErrCode() == kErrNone, "what can be read is delivered");
+    for (Json::Value* const document : {&rows, &delivered})
+      for (Json::Value& row : *document)
+        for (const char* const column : {"client_id", "client_secret"}) row.removeMember(column);
+    require(rows == delivered, "rows are delivered as they are");
   }
 
  private:
@@ -77,21 +103,23 @@ class Observer {
   bool ready_;
 };
 
-void useLog() {
+void useLog(const RedirectedFiles& files) {
   OAUTHDBLog log("oauth_log");
   Observer see(log);
   Json::Value rows;
   see.expectError([&] { return log.Get("a", "ORDER BY id DESC LIMIT 10", &rows); });
   see.expectError([&] { return log.Get("", "", &rows); });
+  see.requireRows(files, "oauth_log", rows);
   see.expectError([&] { return log.Add("message"); });
   see.mayOnlyLog([&] { return log.Del(); });
 }
 
-void useClients() {
+void useClients(const RedirectedFiles& files) {
   OAUTHDBClientInfo clients("oauth_clientInfo");
   Observer see(clients);
   Json::Value rows, result;
   see.expectError([&] { return clients.Get(&rows); });
+  see.requireRows(files, "oauth_clientInfo", rows);
   see.expectError([&] { return clients.Get(kClient, &rows); });
   clients.GetIndex(kClient);
   see.expectError([&] { return clients.Add("example.org/cb", "read", "App", result); });
@@ -103,11 +131,12 @@ void useClients() {
   }
 }
 
-void useCodes() {
+void useCodes(const RedirectedFiles& files) {
   OAUTHDBGrantCode codes("oauth_grantCode");
   Observer see(codes);
   Json::Value rows, result;
   see.expectError([&] { return codes.Get(&rows); });
+  see.requireRows(files, "oauth_grantCode", rows);
   see.expectError([&] { return codes.Get(kCode, &rows); });
   codes.GetIndex(kCode);
   see.expectError([&] { return codes.Add("alice", kClient, "read", "xyz", "", result); });
@@ -120,11 +149,12 @@ void useCodes() {
   see.mayOnlyLog([&] { return codes.Del(kIds[0]); });
 }
 
-void useTokens() {
+void useTokens(const RedirectedFiles& files) {
   OAUTHDBToken tokens("oauth_token");
   Observer see(tokens);
   Json::Value rows, result;
   see.expectError([&] { return tokens.Get(&rows); });
+  see.requireRows(files, "oauth_token", rows);
   see.expectError([&] { return tokens.GetWithAccessToken(kToken, &rows); });
   see.expectError([&] { return tokens.GetWithRefreshToken(kToken, &rows); });
   see.mayOnlyLog([&] { return tokens.Verify(kToken, result); });
@@ -171,16 +201,16 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   write(files.database(), input.ConsumeRemainingBytesAsString());
   switch (use) {
     case 0:
-      useLog();
+      useLog(files);
       break;
     case 1:
-      useClients();
+      useClients(files);
       break;
     case 2:
-      useCodes();
+      useCodes(files);
       break;
     case 3:
-      useTokens();
+      useTokens(files);
       break;
     case 4:
       useBase("oauth_log");
