@@ -37,7 +37,7 @@ run() { # TARGET
   if ! "$folder/$1" -max_total_time="$seconds" -max_len="$max" -timeout=25 -rss_limit_mb=2048 \
     -print_final_stats=1 -artifact_prefix="$folder/$1." "$folder/$1.corpus" "$kept" \
     >"$log" 2>&1; then
-    grep -E '^does not hold: |runtime error: |ERROR: ' "$log" || tail -n 20 "$log"
+    grep -aE '^does not hold: |runtime error: |ERROR: ' "$log" || tail -n 20 "$log"
     sed -n "s|.*Test unit written to |fuzz: reproduce by $folder/$1 |p" "$log"
     echo "fuzz: $1 found something, see $log"
     return 1
