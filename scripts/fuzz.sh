@@ -22,8 +22,9 @@ export folder
 TMPDIR=$(mktemp -d -p /dev/shm 2>/dev/null || mktemp -d)
 trap 'rm -rf "$TMPDIR"' EXIT
 export TMPDIR
-# How much freed memory is kept from use: what fits a processor's cache.
-export ASAN_OPTIONS=quarantine_size_mb=16
+# Freed memory is kept from use as far as a processor's cache goes. The stacks of allocations would
+# fill the memory; to see them, reproduce a finding.
+export ASAN_OPTIONS=quarantine_size_mb=16:malloc_context_size=1
 
 statistic() { # LOG NAME
   sed -n "s/^stat::$2: *//p" "$1"
