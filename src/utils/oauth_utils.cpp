@@ -6,9 +6,7 @@
 
 // The device and not the system call, which older kernels of the appliance lack.
 #define BOOST_UUID_RANDOM_PROVIDER_FORCE_POSIX
-#include <boost/algorithm/string/replace.hpp>
 #include <boost/uuid/random_generator.hpp>
-#include <boost/uuid/uuid_io.hpp>
 #include <cstdio>
 #include <cstring>
 #include <exception>
@@ -110,12 +108,17 @@ std::string getSQLFormatLikeStr(const std::string& column, const std::string& va
 }
 
 std::string getRandomStr(unsigned int length) try {
+  constexpr char kHexDigits[] = "0123456789abcdef";
   std::string result;
   while (result.size() < length) {
     // Reads the operating system's entropy for every UUID; no generator is kept between calls.
-    std::string uuid = to_string(boost::uuids::random_generator()());
-    boost::algorithm::replace_all(uuid, "-", "");
-    result += uuid;
+    char digits[32];
+    char* digit = digits;
+    for (const unsigned byte : boost::uuids::random_generator()()) {
+      *digit++ = kHexDigits[byte >> 4];
+      *digit++ = kHexDigits[byte & 15];
+    }
+    result.append(digits, sizeof digits);
   }
   return result;
 } catch (const boost::uuids::entropy_error&) {
