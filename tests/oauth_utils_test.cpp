@@ -212,6 +212,11 @@ TEST_F(SettingsTest, AllowsComments) {
   EXPECT_EQ(7, getTableRowMax("log_max"));
 }
 
+TEST_F(SettingsTest, PassesOverAByteOrderMark) {
+  writeSettings("\xEF\xBB\xBF{\"token_expired\": 3600}");
+  EXPECT_EQ(3600, getExpiredPeriod("token_expired"));
+}
+
 TEST_F(SettingsTest, ReadsALongFileToItsEnd) {
   for (const int length : {4000, 4095, 4096, 4097, 1000000}) {
     writeSettings(R"({"note": ")" + times(length) + R"(", "token_expired": 3600})");

@@ -11,6 +11,7 @@
 #include <cstring>
 #include <exception>
 #include <memory>
+#include <utility>
 
 #include "host_libraries.h"
 #include "oauth_names.h"
@@ -41,16 +42,26 @@ bool loadSettings(std::string& text) {
   return std::ferror(file.get()) == 0;
 }
 
+// Parses a JSON document, comments allowed, a byte order mark passed over. By the older of the JSON
+// library's readers: the newer one is made from a document of options, which takes longer than
+// reading the settings does.
+bool parseDocument(const std::string& text, Json::Value& document) {
+  constexpr char kByteOrderMark[] = "\xEF\xBB\xBF";
+  const std::size_t start = text.rfind(kByteOrderMark, 0) == 0 ? std::strlen(kByteOrderMark) : 0;
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
+  return Json::Reader().parse(text.data() + start, text.data() + text.size(), document, false);
+#pragma GCC diagnostic pop
+}
+
 // The integer stored under the key in the settings file, or 0. Whatever is wrong with the file
 // reads as 0, including what makes the parser throw, such as very deep nesting.
 int readSettingInt(const std::string& key) try {
   std::string text;
-  if (!loadSettings(text)) return 0;
   Json::Value settings;
-  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-  if (!reader->parse(text.data(), text.data() + text.size(), &settings, nullptr)) return 0;
-  if (!settings.isObject() || !settings.isMember(key) || !settings[key].isInt()) return 0;
-  return settings[key].asInt();
+  if (!loadSettings(text) || !parseDocument(text, settings) || !settings.isObject()) return 0;
+  const Json::Value& value = std::as_const(settings)[key];
+  return value.isInt() ? value.asInt() : 0;
 } catch (const std::exception&) {
   return 0;
 }
