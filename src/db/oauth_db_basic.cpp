@@ -13,6 +13,7 @@
 #include "oauth_names.h"
 #include "oauth_syslog.h"
 #include "oauth_transaction.h"
+#include "row_form.h"
 #include "sqlite_text.h"
 
 namespace ZEVOOAUTHSERVER {
@@ -108,8 +109,6 @@ bool replaceMember(Json::Value& doc, const char* key, ValueConverter converter) 
 
 // A document that is no object, such as an absent condition, has no member to convert.
 bool has(const Json::Value& doc, const char* key) { return doc.isObject() && doc.isMember(key); }
-
-const char* textOrEmpty(const char* text) { return text == nullptr ? "" : text; }
 
 void dumpColumn(int index, const char* name, const char* value) {
   OAUTH_DIAG(kRow, "##### [%d][%s = %s]", index, name, textOrEmpty(value));
@@ -320,11 +319,8 @@ int OAUTHDBBasic::TabCountCallback(void* context, int /*columns*/, char** values
 int OAUTHDBBasic::TabGetCallback(void* context, int columns, char** values, char** columnNames) {
   OAUTH_ENTER();
   return deliver([&] {
-    Json::Value row;
-    for (int i = 0; i < columns; ++i) {
-      dumpColumn(i, columnNames[i], values[i]);
-      row[columnNames[i]] = textOrEmpty(values[i]);
-    }
+    for (int i = 0; i < columns; ++i) dumpColumn(i, columnNames[i], values[i]);
+    Json::Value row = makeRow(columns, values, columnNames);
     if (!ParamDecrypt(row)) OAUTH_FAIL("Decrypt data failed");
     if (context != nullptr) static_cast<Json::Value*>(context)->append(std::move(row));
   });
