@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Installs what the named groups need from Debian's packages, as far as it is missing.
 #
-#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz
+#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench
 set -euo pipefail
 
 declare -A groups=(
@@ -10,6 +10,7 @@ declare -A groups=(
   [powerpc]="g++-powerpc-linux-gnu qemu-user dpkg-dev make m4 tcl"
   [check]="clang-format clang-tidy gcovr shellcheck"
   [fuzz]="clang libclang-rt-dev"
+  [bench]="libbenchmark-dev valgrind gnuplot-nox"
 )
 
 missing=()
