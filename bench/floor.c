@@ -257,14 +257,15 @@ static int find_expired(sqlite3* db, sqlite3_int64** ids, size_t* count) {
   return finalize(read, code == SQLITE_DONE);
 }
 
+/* Each row by a statement of its own, as the library does it. */
 static int delete_rows(sqlite3* db, const sqlite3_int64* ids, size_t count) {
-  sqlite3_stmt* removal = NULL;
-  int done = prepare(db, "DELETE FROM oauth_token WHERE id=?1;", &removal);
+  char sql[64];
+  int done = 1;
   for (size_t i = 0; done && i < count; ++i) {
-    sqlite3_bind_int64(removal, 1, ids[i]);
-    done = sqlite3_step(removal) == SQLITE_DONE && sqlite3_reset(removal) == SQLITE_OK;
+    snprintf(sql, sizeof sql, "DELETE FROM oauth_token WHERE id='%lld';", (long long)ids[i]);
+    done = run(db, sql);
   }
-  return finalize(removal, done);
+  return done;
 }
 
 int floor_purge_tokens(sqlite3* db) {
