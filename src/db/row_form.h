@@ -46,6 +46,7 @@ class RowForm {
   std::vector<std::ptrdiff_t> order_;  // for each member, which column it is
 };
 
+// The rows of our tables have forms; any other, such as a caller's own query, goes name by name.
 inline Json::Value makeRow(int columns, char** values, char** columnNames) {
   namespace column = names::column;
   static const RowForm forms[] = {
