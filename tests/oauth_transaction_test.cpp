@@ -76,6 +76,17 @@ TEST_F(FirstCreationTest, LeavesVersionRowsOfAnExistingFileAlone) {
   EXPECT_EQ(2, rowCount("oauth_meta"));
 }
 
+TEST_F(FirstCreationTest, SaysWhyWhenVersionRowsVanishWithoutAnError) {
+  execute(
+      "CREATE VIEW oauth_meta AS SELECT 1 AS tab_name, 2 AS version;"
+      "CREATE TRIGGER t INSTEAD OF INSERT ON oauth_meta BEGIN SELECT 1; END");
+  OAUTHDBBasic store;
+  expectError(store, -1, "Create table failed");
+  EXPECT_FALSE(store.DBCmd("SELECT 1;", nullptr, nullptr));
+  EXPECT_THAT(log_.lines(), ElementsAre("3 oauth_db_basic.cpp Create Table failed!![meta]",
+                                        "3 oauth_db_basic.cpp DB is not ready!!"));
+}
+
 // --- Sweep ---
 
 template <class Store>

@@ -223,7 +223,13 @@ bool OAUTHDBBasic::createMetaTable() {
   const int rowsBefore = sqlite3_total_changes(db_);
   AddMetaData();
   constexpr int kVersionedTables = 3;
-  return sqlite3_total_changes(db_) - rowsBefore == kVersionedTables && transaction.commit();
+  if (sqlite3_total_changes(db_) - rowsBefore == kVersionedTables) return transaction.commit();
+  if (errCode_ == kErrNone) {  // passed over without an error, by a view of that name for one
+    SetErrCode(kErrCreateTable);
+    SetErrMsg("Create table failed");
+    OAUTH_FAIL("Create Table failed!![meta]");
+  }
+  return false;
 }
 
 bool OAUTHDBBasic::CreateDBTab(const std::string& sql) {
