@@ -9,7 +9,7 @@ required_branches=95 # percent
 
 scripts/packages.sh build test check
 
-mapfile -t sources < <(find include src platform examples tests -name '*.cpp' -o -name '*.h' | sort)
+mapfile -t sources < <(find include src platform examples tools tests -name '*.cpp' -o -name '*.h' | sort)
 clang-format --dry-run -Werror "${sources[@]}" bench/*.{c,cpp,h}
 echo "check: sources are formatted"
 

@@ -5,7 +5,7 @@
 set -euo pipefail
 
 declare -A groups=(
-  [build]="g++ cmake ninja-build pkg-config libsqlite3-dev libjsoncpp-dev libboost-dev nettle-dev"
+  [build]="g++ cmake ninja-build pkg-config libsqlite3-dev libjsoncpp-dev libboost-dev nettle-dev libcli11-dev libsmartcols-dev"
   [test]="binutils libgtest-dev libgmock-dev"
   [powerpc]="g++-powerpc-linux-gnu qemu-user dpkg-dev make m4 tcl"
   [check]="clang-format clang-tidy gcovr shellcheck"

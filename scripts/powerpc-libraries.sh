@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# Builds what the PowerPC target needs from Debian's source packages: SQLite, JsonCpp, GoogleTest
-# and nettle; Boost is headers only and taken from this machine.
+# Builds what the PowerPC target needs from Debian's source packages: SQLite, JsonCpp, GoogleTest,
+# nettle and util-linux's libsmartcols; Boost and CLI11 are headers only and taken from this machine.
 #
 #   scripts/powerpc-libraries.sh FOLDER
 #
@@ -79,9 +79,19 @@ build_nettle() {
   make install-shared-nettle install-headers install-pkgconfig
 }
 
+build_util-linux() {
+  cd "$work/util-linux"
+  touch aclocal.m4 configure Makefile.in config.h.in # as above
+  CFLAGS="${flags[*]}" ./configure --host=$host --prefix="$prefix" --libdir="$prefix/lib" \
+    --disable-all-programs --enable-libsmartcols --disable-static --disable-nls --disable-asciidoc \
+    --without-ncursesw --without-tinfo --without-systemd --without-udev
+  make -j"$(nproc)" install
+}
+
 mkdir -p "$prefix/include" "$prefix/lib" "$work"
 ln -sfn /usr/include/boost "$prefix/include/boost"
-for package in sqlite3 libjsoncpp googletest nettle; do
+ln -sfn /usr/include/CLI "$prefix/include/CLI"
+for package in sqlite3 libjsoncpp googletest nettle util-linux; do
   if [ ! -e "$prefix/$package.done" ]; then
     echo "powerpc-libraries: building $package"
     fetch "$package"

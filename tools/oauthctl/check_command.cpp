@@ -1,0 +1,73 @@
+#include "commands.h"
+#include "content_checks.h"
+#include "database_access.h"
+#include "escaping.h"
+#include "exit_code.h"
+#include "file_checks.h"
+#include "fixed_paths.h"
+#include "table_output.h"
+#include "terminal.h"
+
+namespace oauthctl {
+namespace {
+
+void append(Findings& all, const Findings& more) {
+  all.insert(all.end(), more.begin(), more.end());
+}
+
+// Reading one damaged page must not hide what the others hold.
+template <class Check>
+void collect(Findings& findings, Check check) {
+  try {
+    append(findings, check());
+  } catch (const SqliteError& error) {
+    if (error.isBusy()) throw Failure(ExitCode::kUnavailable, "the database is busy, try again");
+    if (!error.isDamage())
+      throw Failure(ExitCode::kUnavailable,
+                    "cannot read " + fixed_paths::database() + ": " + error.what());
+    const Finding damage = {std::string("cannot be read: ") + error.what(), "restore a backup"};
+    if (findings.empty() || findings.back().problem != damage.problem) findings.push_back(damage);
+  }
+}
+
+void checkContents(Findings& findings) {
+  SqliteConnection database(fixed_paths::database(), SQLITE_OPEN_READONLY);
+  CipherCount count;
+  collect(findings, [&] { return checkStructure(database); });
+  collect(findings, [&] { return checkCiphers(database, count); });
+  collect(findings, [&] { return checkExpiries(database); });
+}
+
+void print(const Findings& findings, bool asJson) {
+  if (asJson) {
+    Json::Value documents(Json::arrayValue);
+    for (const Finding& finding : findings) {
+      Json::Value document;
+      document["problem"] = finding.problem;
+      document["advice"] = finding.advice;
+      documents.append(document);
+    }
+    printJson(documents);
+    return;
+  }
+  for (const Finding& finding : findings)
+    say(escaped(finding.problem) + ". To do: " + escaped(finding.advice) + ".");
+  if (findings.empty()) say("sound: " + fixed_paths::database());
+}
+
+}  // namespace
+
+void checkSoundness(const Invocation& invocation) {
+  requireDatabase(Access::kRead);
+  Findings findings = checkFiles();
+  const Findings journal = checkJournal();
+  append(findings, journal);
+  append(findings, checkSettings());
+  if (journal.empty()) checkContents(findings);
+  print(findings, invocation.has("--json"));
+  if (findings.empty()) return;
+  throw Failure(ExitCode::kAttention, std::to_string(findings.size()) +
+                                          (findings.size() == 1 ? " finding" : " findings"));
+}
+
+}  // namespace oauthctl

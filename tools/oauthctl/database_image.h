@@ -1,0 +1,56 @@
+// A whole database in memory: one moment of a file, checked and changed before any of it is
+// written. The tables have ceilings, so that it fits.
+
+#pragma once
+
+#include <string>
+
+#include "content_checks.h"
+#include "sqlite_connection.h"
+
+namespace oauthctl {
+
+class DatabaseImage {
+ public:
+  // Reads the file at one moment, other programs may go on writing. Throws a SqliteError.
+  explicit DatabaseImage(const std::string& path);
+
+  // No code or token is left in any of its pages.
+  void dropGrants();
+
+  // What makes it no database of ours; empty if it is one.
+  Findings problems() { return checkStructure(memory_); }
+  CipherCount countCiphers();
+  // "2 clients, 1 code, 40 tokens, 33 log lines"
+  std::string summary();
+
+  // Writes it into a file that holds nothing yet.
+  void writeTo(const std::string& path);
+
+  SqliteConnection& connection() { return memory_; }
+
+ private:
+  SqliteConnection memory_;
+};
+
+// One copy of all pages, from connection to connection.
+class DatabaseCopy {
+ public:
+  DatabaseCopy(SqliteConnection& from, SqliteConnection& to);
+  ~DatabaseCopy();
+  DatabaseCopy(const DatabaseCopy&) = delete;
+  DatabaseCopy& operator=(const DatabaseCopy&) = delete;
+
+  // Takes the target's exclusive lock, so that nobody reads or writes it until the copy is done.
+  void lockTarget() { step(0); }
+  // Copies, and commits what was copied. Until then the target is as it was.
+  void finish();
+
+ private:
+  bool step(int pages);
+
+  SqliteConnection& to_;
+  sqlite3_backup* backup_;
+};
+
+}  // namespace oauthctl
