@@ -213,7 +213,8 @@ void deleteClient(const Invocation& invocation) {
   });
   say("deleted client " + row["id"].asString() +
       (withTokens ? ", " + grants(codes, tokens)
-                  : "; its " + held + " stay valid, see 'oauthctl token revoke --client'"));
+                  : "; its " + held + " stay valid, 'oauthctl token revoke --client " + identifier +
+                        "' ends its logins"));
 }
 
 }  // namespace oauthctl

@@ -81,7 +81,7 @@ void printGrants(const GrantKind& kind, const Json::Value& rows, const Registry&
   std::vector<Column> columns = {{"ID", true}, {"USER"}, {"CLIENT"},
                                  {"SCOPE"},    {"IP"},   {"EXPIRES"}};
   if (showSecrets)
-    for (const char* const secret : kind.secrets) columns.push_back({secret});
+    for (const Secret& secret : kind.secrets) columns.push_back({secret.heading});
   Table table(columns);
   const std::int64_t now = unixNow();
   for (const Json::Value& row : rows) {
@@ -92,7 +92,7 @@ void printGrants(const GrantKind& kind, const Json::Value& rows, const Registry&
                                       row["ip"].asString(),
                                       expiryText(row, now)};
     if (showSecrets)
-      for (const char* const secret : kind.secrets) cells.push_back(row[secret].asString());
+      for (const Secret& secret : kind.secrets) cells.push_back(row[secret.column].asString());
     table.add(cells, isExpired(row, now) ? Tone::kFaint : Tone::kPlain);
   }
   table.print();
@@ -100,9 +100,12 @@ void printGrants(const GrantKind& kind, const Json::Value& rows, const Registry&
 
 }  // namespace
 
-const GrantKind kCodes = {kCodeTable, "code", "codes", {"code"}, "0"};
-const GrantKind kTokens = {
-    kTokenTable, "token", "tokens", {"access_token", "refresh_token"}, "30d"};
+const GrantKind kCodes = {kCodeTable, "code", "codes", {{"code", "CODE"}}, "0"};
+const GrantKind kTokens = {kTokenTable,
+                           "token",
+                           "tokens",
+                           {{"access_token", "ACCESS TOKEN"}, {"refresh_token", "REFRESH TOKEN"}},
+                           "30d"};
 
 std::string counted(long long count, const GrantKind& kind) {
   return std::to_string(count) + " " + (count == 1 ? kind.singular : kind.plural);
@@ -135,8 +138,8 @@ Json::Value grantDocument(const GrantKind& kind, const Json::Value& row, const R
   document["expired_time"] = Json::nullValue;
   if (expiry) document["expired_time"] = static_cast<Json::Int64>(*expiry);
   document["expired"] = isExpired(row, unixNow());
-  for (const char* const secret : kind.secrets)
-    document[secret] = masked(row[secret].asString(), showSecrets);
+  for (const auto& [column, heading] : kind.secrets)
+    document[column] = masked(row[column].asString(), showSecrets);
   return document;
 }
 

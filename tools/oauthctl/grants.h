@@ -16,11 +16,16 @@
 
 namespace oauthctl {
 
+struct Secret {
+  const char* column;
+  const char* heading;
+};
+
 struct GrantKind {
   const char* table;
   const char* singular;
   const char* plural;
-  std::vector<const char*> secrets;  // columns
+  std::vector<Secret> secrets;
   const char* defaultGrace;
 };
 extern const GrantKind kCodes, kTokens;

@@ -72,6 +72,7 @@ void printPairs(const std::vector<std::pair<std::string, std::string>>& pairs) {
 void printJson(const Json::Value& document) {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "  ";
+  builder["enableYAMLCompatibility"] = true;  // "key": value
   say(Json::writeString(builder, document));
 }
 

@@ -1,0 +1,81 @@
+// Linked into the test twin of oauthctl instead of its fixed paths: everything lies in the folder
+// that OAUTHCTL_FOLDER names, the clock stands at OAUTHCTL_NOW, and only the process's own ids are
+// used. The encryption is that of the host's seam.
+
+#include <dlfcn.h>
+#include <sqlite3.h>
+#include <sys/time.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <ctime>
+#include <string>
+
+#include "fixed_paths.h"
+
+namespace oauthctl::fixed_paths {
+
+std::string folder() {
+  const char* const name = std::getenv("OAUTHCTL_FOLDER");
+  return name == nullptr ? "/nonexistent" : name;
+}
+std::string database() { return folder() + "/oauth.db"; }
+std::string settings() { return folder() + "/oauth.cfg"; }
+std::string debugMarker() { return folder() + "/zevooauth_debug"; }
+
+}  // namespace oauthctl::fixed_paths
+
+namespace {
+
+constexpr char kInstalled[] = "/var/packages/Keyloft/target/etc";
+
+// The library's paths are fixed as well.
+std::string redirected(const char* path) {
+  using namespace oauthctl::fixed_paths;
+  if (std::strcmp(path, "/tmp/zevooauth_debug") == 0) return debugMarker();
+  if (std::strncmp(path, kInstalled, std::strlen(kInstalled)) == 0)
+    return folder() + (path + std::strlen(kInstalled));
+  return path;
+}
+
+std::time_t now() {
+  const char* const fixed = std::getenv("OAUTHCTL_NOW");
+  timespec real;
+  clock_gettime(CLOCK_REALTIME, &real);
+  return fixed == nullptr ? real.tv_sec : static_cast<std::time_t>(std::atoll(fixed));
+}
+
+template <class Function>
+Function* next(const char* name, Function*) {
+  return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
+}
+
+}  // namespace
+
+extern "C" int sqlite3_open(const char* path, sqlite3** db) {
+  return sqlite3_open_v2(redirected(path).c_str(), db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE,
+                         nullptr);
+}
+
+extern "C" FILE* fopen64(const char* path, const char* mode) {
+  return next("fopen64", fopen64)(redirected(path).c_str(), mode);
+}
+
+extern "C" int access(const char* path, int mode) noexcept {
+  return next("access", access)(redirected(path).c_str(), mode);
+}
+
+extern "C" time_t time(time_t* out) noexcept {
+  const std::time_t moment = now();
+  if (out != nullptr) *out = moment;
+  return moment;
+}
+
+// The database's own clock, which stamps the audit log.
+extern "C" int gettimeofday(timeval* out, void*) noexcept {
+  *out = {};
+  out->tv_sec = now();
+  return 0;
+}
