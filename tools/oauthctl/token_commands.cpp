@@ -93,7 +93,7 @@ void verifyToken(const Invocation& invocation) {
   if (valid) return;
   throw Failure(ExitCode::kAttention, row.isNull()
                                           ? "not valid: no such access token"
-                                          : "not valid: expired " + expiryText(row, unixNow()));
+                                          : "not valid: it expired " + expiryText(row, unixNow()));
 }
 
 }  // namespace oauthctl

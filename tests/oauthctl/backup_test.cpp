@@ -1,0 +1,369 @@
+// Backup and restore.
+
+#include <fcntl.h>
+#include <sqlite3.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+
+#include "oauthctl_test.h"
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::Not;
+using testing::StartsWith;
+using namespace ZEVOOAUTHSERVER;
+
+namespace {
+
+class BackupTest : public OauthctlTest {
+ protected:
+  BackupTest() { chmod(files_.directory().c_str(), 0700); }
+
+  Lines fileNames() const {
+    Lines names;
+    for (const auto& entry : std::filesystem::directory_iterator(files_.directory()))
+      names.push_back(entry.path().filename());
+    std::sort(names.begin(), names.end());
+    return names;
+  }
+  static mode_t modeOf(const std::string& file) {
+    struct stat status = {};
+    EXPECT_EQ(0, stat(file.c_str(), &status)) << file;
+    return status.st_mode & 07777U;
+  }
+
+  const std::string copy_ = path("copy.db");
+};
+
+TEST_F(BackupTest, CopiesEveryRow) {
+  addClient('c');
+  addToken('a');
+  addCode('k');
+  const Outcome outcome = run({"backup", copy_});
+  EXPECT_EQ(0, outcome.code) << outcome.err;
+  EXPECT_EQ("wrote " + copy_ + ": 1 client, 1 code, 1 token, 1 log line\n", outcome.out);
+  EXPECT_EQ(rowsIn(files_.database()), rowsIn(copy_));
+  EXPECT_EQ(0600U, modeOf(copy_));
+  EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
+}
+
+TEST_F(BackupTest, LeavesTheSourceAlone) {
+  addClient('c');
+  const std::string before = databaseBytes();
+  chmod(files_.database().c_str(), 0400);
+  EXPECT_EQ(0, run({"backup", copy_}).code);
+  EXPECT_EQ(before, databaseBytes());
+}
+
+TEST_F(BackupTest, NeverReplacesAFile) {
+  addClient('c');
+  std::ofstream(copy_) << "precious";
+  EXPECT_EQ("2 " + copy_ + " exists, and no file is ever replaced",
+            complaint(run({"backup", copy_})));
+  EXPECT_EQ("precious", bytesOf(copy_));
+  ASSERT_EQ(0, symlink("/nonexistent/target", path("link.db").c_str()));
+  EXPECT_EQ("2 " + path("link.db") + " exists, and no file is ever replaced",
+            complaint(run({"backup", path("link.db")})));
+  EXPECT_THAT(fileNames(), ElementsAre("copy.db", "link.db", "oauth.db"));
+}
+
+TEST_F(BackupTest, SaysWhenItCannotWrite) {
+  addClient('c');
+  EXPECT_EQ("1 cannot make a file beside /nonexistent/copy.db: No such file or directory",
+            complaint(run({"backup", "/nonexistent/copy.db"})));
+}
+
+TEST_F(BackupTest, RefusesToCopyDamage) {
+  addClient('c');
+  execute("DROP TABLE oauth_log");
+  EXPECT_EQ(
+      "1 the database is not sound, no backup was made: table oauth_log is missing; see 'oauthctl "
+      "check'",
+      complaint(run({"backup", copy_})));
+  EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
+}
+
+TEST_F(BackupTest, LeavesNoTokenBytesWhenToldSo) {
+  addClient('c');
+  for (const char c : {'1', '2', '3', '4'}) {
+    addToken(c);
+    addCode(c);
+  }
+  execute("DELETE FROM oauth_token WHERE id = 2; DELETE FROM oauth_grantCode WHERE id = 2");
+  ASSERT_EQ(0, run({"backup", path("all.db")}).code);
+  ASSERT_THAT(bytesOf(path("all.db")), HasSubstr(times(64, '1')));
+  EXPECT_EQ("wrote " + copy_ + ": 1 client, 0 codes, 0 tokens, 1 log line\n",
+            run({"backup", copy_, "--without-tokens"}).out);
+  const std::string bytes = bytesOf(copy_);
+  for (const char c : {'1', '2', '3', '4', 'r'}) EXPECT_THAT(bytes, Not(HasSubstr(times(8, c))));
+  EXPECT_THAT(bytes, Not(HasSubstr("alice")));
+  EXPECT_EQ("1", queryIn(copy_, "SELECT COUNT(*) FROM oauth_clientInfo").front());
+  EXPECT_EQ("ok", queryIn(copy_, "PRAGMA integrity_check").front());
+}
+
+TEST_F(BackupTest, IsOneMomentWhileFourProcessesIssueTokens) {
+  writeSettings(R"({"token_max": 10000})");
+  addClient('c');
+  addToken('a');
+  files_.waitForLocks();
+  std::vector<pid_t> issuers;
+  for (int n = 0; n < 4; ++n) {
+    const pid_t child = fork();
+    if (child != 0) {
+      issuers.push_back(child);
+      continue;
+    }
+    // Each token is noted once the library has said that it is there.
+    const int notes =
+        open(path("notes-" + std::to_string(n)).c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
+    for (int i = 0; i < 2000; ++i) {
+      OAUTHDBToken tokens("oauth_token");
+      Json::Value issued;
+      if (tokens.Add("alice", times(64, 'c'), "read", "code", "xyz", "", issued) == 0) _exit(1);
+      const std::string note = issued["access_token"].asString() + "\n";
+      if (write(notes, note.data(), note.size()) < 0) _exit(1);
+    }
+    _exit(0);
+  }
+  const auto acknowledged = [&] {
+    Lines tokens;
+    for (int n = 0; n < 4; ++n) {
+      std::istringstream notes(bytesOf(path("notes-" + std::to_string(n))));
+      for (std::string line; std::getline(notes, line) && line.size() == 64;)
+        tokens.push_back(line);
+    }
+    return tokens;
+  };
+  while (acknowledged().size() < 20) usleep(1000);
+
+  for (const char* const name : {"1.db", "2.db", "3.db"}) {
+    const Lines before = acknowledged();
+    const Outcome outcome = run({"backup", path(name)});
+    EXPECT_EQ(0, outcome.code) << outcome.err;
+    EXPECT_THAT(queryIn(path(name), "PRAGMA integrity_check"), ElementsAre("ok"));
+    const Lines copied = queryIn(path(name), "SELECT access_token FROM oauth_token");
+    for (const std::string& token : before)
+      EXPECT_EQ(1, std::count(copied.begin(), copied.end(), token)) << token;
+  }
+  for (const pid_t issuer : issuers) kill(issuer, SIGKILL);
+  for (const pid_t issuer : issuers) waitpid(issuer, nullptr, 0);
+
+  const Lines copied = rowsIn(path("2.db"));
+  EXPECT_EQ(0, run({"restore", path("2.db"), "--yes"}).code);
+  EXPECT_EQ(copied, rowsIn(files_.database()));
+}
+
+// Ctrl-C while it waits for the database.
+TEST_F(BackupTest, LeavesNothingWhenItIsInterrupted) {
+  addClient('c');
+  sqlite3* db = nullptr;
+  sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+  sqlite3_exec(db, "BEGIN EXCLUSIVE", nullptr, nullptr, nullptr);
+  beforeTyping_ = [this] {
+    while (fileNames().size() < 2) usleep(1000);
+  };
+  const Outcome outcome = runOnTerminal({"backup", copy_}, "\x03");
+  sqlite3_close_v2(db);
+  EXPECT_EQ(128 + SIGINT, outcome.code);
+  EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
+}
+
+class RestoreTest : public BackupTest {
+ protected:
+  RestoreTest() {
+    addClient('c');
+    addToken('a');
+    EXPECT_EQ(0, run({"backup", copy_}).code);
+    saved_ = rowsIn(copy_);
+    addToken('b');
+    addCode('k');
+  }
+  // That the file is refused for this reason, and nothing is changed.
+  void expectRefused(const std::string& reason) const {
+    const std::string before = databaseBytes();
+    const Outcome outcome = run({"restore", copy_, "--yes"});
+    EXPECT_EQ("", outcome.out);
+    EXPECT_EQ(1, outcome.code);
+    EXPECT_THAT(outcome.err,
+                StartsWith("oauthctl: " + copy_ + " is refused, nothing changed: " + reason));
+    EXPECT_EQ(before, databaseBytes());
+    EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
+  }
+
+  Lines saved_;
+  const std::string kept_ = path("oauth.db.before-restore-20231114-221320");
+};
+
+TEST_F(RestoreTest, ReplacesEveryRow) {
+  const Lines before = rowsIn(files_.database());
+  const Outcome outcome = run({"restore", copy_, "--yes"});
+  EXPECT_EQ(0, outcome.code) << outcome.err;
+  EXPECT_EQ(
+      "restored 1 client, 0 codes, 1 token, 1 log line\nwhat was there is kept in " + kept_ + "\n",
+      outcome.out);
+  EXPECT_EQ(saved_, rowsIn(files_.database()));
+  EXPECT_EQ(before, rowsIn(kept_));
+  EXPECT_EQ(0600U, modeOf(kept_));
+  EXPECT_EQ("alice", json({"token", "list"})[0U]["username"].asString());
+}
+
+TEST_F(RestoreTest, CanBeTakenBack) {
+  const Lines before = rowsIn(files_.database());
+  run({"restore", copy_, "--yes"});
+  EXPECT_EQ("restored 1 client, 1 code, 2 tokens, 1 log line\nwhat was there is kept in " + kept_ +
+                "-2\n",
+            run({"restore", kept_, "--yes"}).out);
+  EXPECT_EQ(before, rowsIn(files_.database()));
+  EXPECT_EQ(saved_, rowsIn(kept_ + "-2"));
+}
+
+TEST_F(RestoreTest, LeavesTokensOutWhenToldSo) {
+  EXPECT_EQ(0, run({"restore", copy_, "--without-tokens", "--yes"}).code);
+  EXPECT_EQ(1, rowCount("oauth_clientInfo"));
+  EXPECT_EQ(0, rowCount("oauth_token"));
+  EXPECT_EQ(0, rowCount("oauth_grantCode"));
+}
+
+TEST_F(RestoreTest, ReplacesNothingUnasked) {
+  const std::string before = databaseBytes();
+  EXPECT_EQ(2, run({"restore", copy_}).code);
+  EXPECT_EQ(before, databaseBytes());
+}
+
+TEST_F(RestoreTest, RefusesADamagedFile) {
+  std::fstream file(copy_, std::ios::in | std::ios::out | std::ios::binary);
+  for (std::size_t at = 4096; at < bytesOf(copy_).size(); at += 4096) {
+    file.seekp(static_cast<std::streamoff>(at) + 8);
+    file << times(64, '\x7f');
+  }
+  file.close();
+  expectRefused("");
+}
+
+TEST_F(RestoreTest, RefusesATruncatedFile) {
+  ASSERT_EQ(0, truncate(copy_.c_str(), 5000));
+  expectRefused("");
+}
+
+TEST_F(RestoreTest, RefusesAForeignFile) {
+  std::ofstream(copy_, std::ios::binary) << times(9000, 'x');
+  expectRefused("file is not a database");
+}
+
+TEST_F(RestoreTest, RefusesAnEmptyFile) {
+  ASSERT_EQ(0, truncate(copy_.c_str(), 0));
+  expectRefused("table oauth_clientInfo is missing (and 4 more)");
+}
+
+TEST_F(RestoreTest, RefusesADatabaseOfSomethingElse) {
+  sqlite3* db = nullptr;
+  sqlite3_open_v2(copy_.c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+  sqlite3_exec(db, "CREATE TABLE extra(a)", nullptr, nullptr, nullptr);
+  sqlite3_close_v2(db);
+  expectRefused("unknown table extra");
+}
+
+TEST_F(RestoreTest, RefusesABackupOfAnotherMachine) {
+  sqlite3* db = nullptr;
+  sqlite3_open_v2(copy_.c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+  sqlite3_exec(db,
+               "UPDATE oauth_clientInfo SET client_id = 'x', client_secret = 'y';"
+               "UPDATE oauth_token SET client_id = 'x'",
+               nullptr, nullptr, nullptr);
+  sqlite3_close_v2(db);
+  expectRefused("it was encrypted on another machine, or this one has lost its key");
+}
+
+TEST_F(RestoreTest, RefusesWhatIsNoFile) {
+  EXPECT_EQ("1 cannot read /nonexistent: No such file or directory",
+            complaint(run({"restore", "/nonexistent", "--yes"})));
+  EXPECT_EQ("1 " + files_.directory() + " is refused, nothing changed: it is not a file",
+            complaint(run({"restore", files_.directory(), "--yes"})));
+  EXPECT_EQ("2 " + files_.database() + " is the database itself",
+            complaint(run({"restore", files_.database(), "--yes"})));
+}
+
+TEST_F(RestoreTest, MakesADatabaseWhereThereIsNone) {
+  std::filesystem::remove(files_.database());
+  EXPECT_EQ("restored 1 client, 0 codes, 1 token, 1 log line\n",
+            run({"restore", copy_, "--yes"}).out);
+  EXPECT_EQ(saved_, rowsIn(files_.database()));
+  EXPECT_EQ(0600U, modeOf(files_.database()));
+}
+
+TEST_F(RestoreTest, FillsAnEmptyFile) {
+  ASSERT_EQ(0, truncate(files_.database().c_str(), 0));
+  EXPECT_EQ("restored 1 client, 0 codes, 1 token, 1 log line\n",
+            run({"restore", copy_, "--yes"}).out);
+  EXPECT_EQ(saved_, rowsIn(files_.database()));
+}
+
+// What no program can open cannot be written into either: it goes aside, journal and all.
+TEST_F(RestoreTest, ReplacesAFileThatIsNoDatabaseAnyMore) {
+  std::ofstream(files_.database(), std::ios::binary) << times(9000, 'x');
+  std::ofstream(files_.database() + "-journal", std::ios::binary) << "\xd9\xd5\x05\xf9 old";
+  EXPECT_EQ(
+      "restored 1 client, 0 codes, 1 token, 1 log line\nwhat was there is kept in " + kept_ + "\n",
+      run({"restore", copy_, "--yes"}).out);
+  EXPECT_EQ(saved_, rowsIn(files_.database()));
+  EXPECT_EQ(times(9000, 'x'), bytesOf(kept_));
+}
+
+TEST_F(RestoreTest, ReplacesADamagedDatabase) {
+  std::fstream file(files_.database(), std::ios::in | std::ios::out | std::ios::binary);
+  for (std::size_t at = 4096; at < databaseBytes().size(); at += 4096) {
+    file.seekp(static_cast<std::streamoff>(at) + 8);
+    file << times(64, '\x7f');
+  }
+  file.close();
+  const std::string damaged = databaseBytes();
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+  EXPECT_EQ(saved_, rowsIn(files_.database()));
+  EXPECT_EQ(damaged, bytesOf(kept_));
+}
+
+TEST_F(RestoreTest, KeepsOwnerAlongWithMode) {
+  chmod(files_.database().c_str(), 0640);
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+  EXPECT_EQ(0640U, modeOf(files_.database()));
+}
+
+// Whoever reads meanwhile sees all old rows or all new ones.
+TEST_F(RestoreTest, IsOneStepForOtherProcesses) {
+  ASSERT_EQ(0, run({"backup", path("more.db")}).code);
+  files_.waitForLocks();
+  const pid_t reader = fork();
+  if (reader == 0) {
+    sqlite3* db = nullptr;
+    sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+    sqlite3_busy_timeout(db, 20000);
+    int torn = 0;
+    const auto look = [](void* context, int, char** values, char**) {
+      const std::string seen = values[0];
+      *static_cast<int*>(context) += seen != "1 token, 0 codes" && seen != "2 token, 1 codes";
+      return 0;
+    };
+    for (int i = 0; i < 500; ++i)
+      if (sqlite3_exec(db,
+                       "SELECT (SELECT COUNT(*) FROM oauth_token) || ' token, ' || "
+                       "(SELECT COUNT(*) FROM oauth_grantCode) || ' codes'",
+                       look, &torn, nullptr) != SQLITE_OK)
+        ++torn;
+    _exit(torn == 0 ? 0 : 1);
+  }
+  for (const char* const name : {"copy.db", "more.db", "copy.db", "more.db"}) {
+    const Outcome outcome = run({"restore", path(name), "--yes"});
+    EXPECT_EQ(0, outcome.code) << outcome.err;
+  }
+  int status = -1;
+  waitpid(reader, &status, 0);
+  EXPECT_EQ(0, status);
+}
+
+}  // namespace

@@ -1,0 +1,274 @@
+// Every kind of damage is planted by itself, and found by itself.
+
+#include <sqlite3.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <fstream>
+
+#include "oauthctl_test.h"
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::StartsWith;
+
+namespace {
+
+class CheckTest : public OauthctlTest {
+ protected:
+  CheckTest() {
+    addClient('c');
+    addToken('a');
+    addCode('k');
+    chmod(files_.database().c_str(), 0600);
+    chmod(files_.directory().c_str(), 0700);
+  }
+
+  // The problems found, in both forms; and nothing was changed by looking.
+  Lines findings() const {
+    const std::string before = databaseBytes();
+    const Outcome outcome = run({"check"});
+    Lines problems;
+    for (const Json::Value& finding : json({"check"})) {
+      problems.push_back(finding["problem"].asString());
+      EXPECT_NE("", finding["advice"].asString());
+    }
+    EXPECT_EQ(static_cast<std::size_t>(std::count(outcome.out.begin(), outcome.out.end(), '\n')),
+              problems.empty() ? 1 : problems.size());
+    EXPECT_EQ(problems.empty() ? 0 : 1, outcome.code);
+    const std::string count = std::to_string(problems.size());
+    EXPECT_EQ(problems.empty()       ? ""
+              : problems.size() == 1 ? "oauthctl: 1 finding\n"
+                                     : "oauthctl: " + count + " findings\n",
+              outcome.err);
+    EXPECT_EQ(before, databaseBytes());
+    return problems;
+  }
+
+  void changeSchema(const std::string& sql) const {
+    execute("PRAGMA writable_schema = ON;" + sql + ";PRAGMA schema_version = 4711");
+  }
+  // Bytes of the file, from the end backwards if the offset is negative.
+  void overwrite(long offset, const std::string& bytes) const {
+    std::fstream file(files_.database(), std::ios::in | std::ios::out | std::ios::binary);
+    file.seekp(offset, offset < 0 ? std::ios::end : std::ios::beg);
+    file << bytes;
+  }
+};
+
+TEST_F(CheckTest, FindsNothingInASoundDatabase) {
+  EXPECT_THAT(findings(), ElementsAre());
+  EXPECT_EQ("sound: " + files_.database() + "\n", run({"check"}).out);
+  EXPECT_EQ("[]\n", run({"check", "--json"}).out);
+}
+
+TEST_F(CheckTest, FindsADamagedPage) {
+  const long page = 4096;
+  for (long at = page; at < static_cast<long>(databaseBytes().size()); at += page)
+    overwrite(at + 8, times(64, '\x7f'));
+  EXPECT_THAT(findings(), testing::Contains(testing::AnyOf(StartsWith("integrity check: "),
+                                                           StartsWith("cannot be read: "))));
+}
+
+TEST_F(CheckTest, FindsAnIndexThatMissesARow) {
+  changeSchema(
+      "UPDATE sqlite_master SET rootpage = (SELECT rootpage FROM sqlite_master WHERE name = "
+      "'sqlite_autoindex_oauth_grantCode_1') WHERE name = 'sqlite_autoindex_oauth_token_1'");
+  EXPECT_THAT(findings(), testing::Contains(HasSubstr("integrity check: ")));
+}
+
+TEST_F(CheckTest, FindsAFileThatIsNoDatabase) {
+  overwrite(0, "no database at all");
+  EXPECT_THAT(findings(), ElementsAre("cannot be read: file is not a database"));
+}
+
+TEST_F(CheckTest, FindsATruncatedFile) {
+  ASSERT_EQ(0, truncate(files_.database().c_str(), 4096));
+  EXPECT_THAT(findings(), testing::Not(ElementsAre()));
+}
+
+TEST_F(CheckTest, FindsAMissingTable) {
+  execute("DROP TABLE oauth_log");
+  EXPECT_THAT(findings(), ElementsAre("table oauth_log is missing"));
+}
+
+// One blank more in a definition: existing databases have it byte for byte.
+TEST_F(CheckTest, FindsEachDifferentDefinition) {
+  for (const std::string table :
+       {"oauth_meta", "oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"}) {
+    const std::string where = " WHERE name = '" + table + "'";
+    changeSchema("UPDATE sqlite_master SET sql = replace(sql, '(', '( ')" + where);
+    EXPECT_THAT(findings(), ElementsAre(StartsWith("table " + table + " is defined differently")));
+    changeSchema("UPDATE sqlite_master SET sql = replace(sql, '( ', '(')" + where);
+  }
+}
+
+TEST_F(CheckTest, FindsWhatIsNotOurs) {
+  execute("CREATE TRIGGER spy AFTER INSERT ON oauth_token BEGIN SELECT 1; END");
+  execute("CREATE TABLE extra(a)");
+  execute("CREATE INDEX fast ON oauth_token(username)");
+  EXPECT_THAT(findings(),
+              ElementsAre("unknown trigger spy", "unknown table extra", "unknown index fast"));
+}
+
+TEST_F(CheckTest, FindsAMissingVersion) {
+  execute("DELETE FROM oauth_meta WHERE tab_name = 'oauth_token'");
+  EXPECT_THAT(findings(), ElementsAre("schema version of oauth_token stands there 0 times"));
+}
+
+TEST_F(CheckTest, FindsADoubledVersion) {
+  execute("INSERT INTO oauth_meta VALUES('oauth_token', 2)");
+  EXPECT_THAT(findings(), ElementsAre("schema version of oauth_token stands there 2 times"));
+}
+
+TEST_F(CheckTest, FindsAnotherVersion) {
+  execute("UPDATE oauth_meta SET version = 3 WHERE tab_name = 'oauth_grantCode'");
+  EXPECT_THAT(findings(), ElementsAre("schema version of oauth_grantCode is 3, not 2"));
+}
+
+TEST_F(CheckTest, FindsAVersionOfNoTable) {
+  execute("INSERT INTO oauth_meta VALUES('oauth_x', 2)");
+  EXPECT_THAT(findings(), ElementsAre("schema version of an unknown table oauth_x"));
+}
+
+TEST_F(CheckTest, FindsEachValueThatDoesNotDecrypt) {
+  for (const char* const place : {"client_id in oauth_clientInfo",
+                                  "client_secret in "
+                                  "oauth_clientInfo",
+                                  "client_id in oauth_grantCode", "client_id in oauth_token"}) {
+    const std::string text = place, column = text.substr(0, text.find(' ')),
+                      table = text.substr(text.rfind(' ') + 1);
+    const std::string before = query("SELECT " + column + " FROM " + table).front();
+    plant(table, column, "not sealed");
+    EXPECT_THAT(findings(), ElementsAre(text + " does not decrypt: row 1"));
+    plant(table, column, before);
+  }
+}
+
+TEST_F(CheckTest, NamesTheFirstRowsOnly) {
+  for (const char token : {'1', '2', '3', '4', '5', '6'}) addToken(token);
+  plant("oauth_token", "client_id", "not sealed");
+  EXPECT_THAT(findings(), ElementsAre("client_id in oauth_token does not decrypt: rows 1, 2, 3, "
+                                      "4, 5 and 2 more"));
+}
+
+TEST_F(CheckTest, FindsExpiriesThatAreNoNumbers) {
+  for (const std::string value : {"never", "", "12 ", "+5", "1.5"}) {
+    plant("oauth_token", "expired_time", value);
+    EXPECT_THAT(findings(), ElementsAre("expired_time in oauth_token is no number: row 1"))
+        << value;
+  }
+  plant("oauth_token", "expired_time", "99999999999999999999");
+  EXPECT_THAT(findings(), ElementsAre());
+  plant("oauth_grantCode", "expired_time", "x");
+  EXPECT_THAT(findings(), ElementsAre("expired_time in oauth_grantCode is no number: row 1"));
+}
+
+TEST_F(CheckTest, FindsAFileOpenToOthers) {
+  for (const mode_t mode : {0644, 0660, 0602, 0604}) {
+    chmod(files_.database().c_str(), mode);
+    EXPECT_THAT(findings(), ElementsAre(StartsWith(files_.database() + " has mode 0")));
+  }
+  chmod(files_.database().c_str(), 0640);
+  EXPECT_THAT(findings(), ElementsAre());
+}
+
+TEST_F(CheckTest, FindsAFolderOpenToOthers) {
+  for (const mode_t mode : {0777, 0770, 0702}) {
+    chmod(files_.directory().c_str(), mode);
+    EXPECT_THAT(findings(), ElementsAre(HasSubstr("others can replace the database")));
+  }
+}
+
+TEST_F(CheckTest, FindsAFileOfSomebodyElse) {
+  if (getuid() != 0) GTEST_SKIP() << "only root can give files away";
+  ASSERT_EQ(0, chown(files_.database().c_str(), 1234, 1234));
+  EXPECT_THAT(findings(),
+              ElementsAre(files_.database() + " belongs to user 1234 and its folder to user 0"));
+}
+
+TEST_F(CheckTest, FindsALink) {
+  rename(files_.database().c_str(), path("real.db").c_str());
+  ASSERT_EQ(0, symlink("real.db", files_.database().c_str()));
+  EXPECT_THAT(findings(), ElementsAre(files_.database() + " is a link"));
+}
+
+TEST_F(CheckTest, FindsAnotherName) {
+  ASSERT_EQ(0, link(files_.database().c_str(), path("other.db").c_str()));
+  EXPECT_THAT(findings(), ElementsAre(files_.database() + " has other names too (1)"));
+}
+
+// A real one: the process dies between writing pages and the end of its transaction.
+TEST_F(CheckTest, FindsAJournalLeftOverWithoutTouchingIt) {
+  const std::string journal = files_.database() + "-journal", sound = databaseBytes();
+  const pid_t child = fork();
+  if (child == 0) {
+    sqlite3* db = nullptr;
+    sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+    sqlite3_exec(db,
+                 "PRAGMA cache_size = 1; BEGIN; UPDATE oauth_token SET scope = 'changed';"
+                 "WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < 500) "
+                 "INSERT INTO oauth_log SELECT i, hex(zeroblob(500)), NULL FROM n",
+                 nullptr, nullptr, nullptr);
+    kill(getpid(), SIGKILL);
+  }
+  waitpid(child, nullptr, 0);
+  ASSERT_NE(sound, databaseBytes());
+  const std::string left = bytesOf(journal);
+  ASSERT_NE("", left);
+  EXPECT_THAT(findings(), ElementsAre(StartsWith(journal + " is left over, of user ")));
+  EXPECT_EQ(left, bytesOf(journal));
+  // What the advice says helps.
+  EXPECT_EQ(0, run({"status"}).code);
+  EXPECT_THAT(findings(), ElementsAre());
+  EXPECT_EQ(sound, databaseBytes());
+}
+
+// A server in the middle of a change holds a lock, and is no cause for alarm.
+TEST_F(CheckTest, TakesNoJournalInUseForOne) {
+  sqlite3* db = nullptr;
+  sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+  sqlite3_exec(db, "BEGIN; UPDATE oauth_token SET scope = 'changed'", nullptr, nullptr, nullptr);
+  EXPECT_EQ(0, access((files_.database() + "-journal").c_str(), F_OK));
+  EXPECT_EQ(0, run({"check"}).code);
+  sqlite3_close_v2(db);
+}
+
+TEST_F(CheckTest, TakesNoHarmlessJournalForOne) {
+  std::ofstream(files_.database() + "-journal", std::ios::binary) << times(100, '\0');
+  EXPECT_THAT(findings(), ElementsAre());
+}
+
+TEST_F(CheckTest, FindsWrongSettings) {
+  writeSettings(R"({"token_max": "7", "log_max": 20000, "tokenmax": 5, "token_expired": -1})");
+  chmod(files_.settings().c_str(), 0600);
+  EXPECT_THAT(findings(),
+              ElementsAre("setting token_max: wrong type in the file, default 1000 applies",
+                          "setting log_max: clamped from 20000 10000 applies",
+                          "setting token_expired: below 1 in the file, default 600 applies",
+                          "setting tokenmax is unknown"));
+}
+
+TEST_F(CheckTest, FindsASettingsFileThatIsNoJson) {
+  writeSettings("token_max = 7");
+  chmod(files_.settings().c_str(), 0600);
+  EXPECT_THAT(findings(), ElementsAre(files_.settings() + " is not JSON, every default applies"));
+}
+
+TEST_F(CheckTest, FindsSettingsThatOthersMayWrite) {
+  writeSettings("{}");
+  chmod(files_.settings().c_str(), 0666);
+  EXPECT_THAT(findings(), ElementsAre(files_.settings() + " has mode 0666, others may write it"));
+}
+
+TEST_F(CheckTest, FindsDiagnosticsLeftOn) {
+  writeSettings("{\"log_level\": 15}");
+  chmod(files_.settings().c_str(), 0600);
+  createDebugMarker();
+  EXPECT_THAT(findings(), ElementsAre("diagnostics are on and write secrets to the system log"));
+}
+
+}  // namespace

@@ -1,0 +1,116 @@
+// Values that would take over a terminal, or break a document.
+
+#include <clocale>
+
+#include "escaping.h"
+#include "oauthctl_test.h"
+
+using testing::HasSubstr;
+using testing::Not;
+
+namespace {
+
+const std::string kHostile =
+    "\"\\ \n\r\t\x01\x1b[31m\x7f \xC2\x9B"
+    "31m \xE2\x80\xAE \xFF\xFE \xC3 \xED\xA0\x80 \xF4\x90\x80\x80 '\xC3\xA9 \xF0\x9F\x99\x82";
+
+class HostileValuesTest : public OauthctlTest {
+ protected:
+  HostileValuesTest() {
+    addClient('c');
+    addToken('a');
+    addCode('k');
+    for (const char* const column : {"display_name", "redirect_uri", "scope", "client_secret"})
+      plant("oauth_clientInfo", column, kHostile);
+    for (const char* const column : {"username", "scope", "state", "flow_type", "ip", "client_id",
+                                     "access_token", "refresh_token", "expired_time"})
+      plant("oauth_token", column, kHostile);
+    for (const char* const column :
+         {"username", "scope", "state", "ip", "client_id", "code", "expired_time"})
+      plant("oauth_grantCode", column, kHostile);
+    plant("oauth_log", "msg", kHostile);
+    execute("UPDATE oauth_meta SET tab_name = (SELECT msg FROM oauth_log) WHERE rowid = 1");
+  }
+};
+
+const std::vector<Words> kReading = {
+    {"status"},       {"check"},         {"client", "list"},     {"client", "show", "1"},
+    {"code", "list"}, {"token", "list"}, {"token", "show", "1"}, {"log"}};
+
+TEST_F(HostileValuesTest, AreSpeltOutInTables) {
+  for (const Words& words : kReading)
+    for (const bool show : {false, true}) {
+      if (show && (words[0] == "log" || words[0] == "status" || words[0] == "check")) continue;
+      Words all = words;
+      if (show) all.emplace_back("--show-secrets");
+      SCOPED_TRACE(words[0] + " " + words.back());
+      const Outcome outcome = run(all);
+      EXPECT_THAT(outcome.out, HasSubstr("\\x1b[31m"));
+      EXPECT_THAT(outcome.out, HasSubstr("\\u202e"));
+      EXPECT_THAT(outcome.out, HasSubstr("\\u009b"));
+      EXPECT_THAT(outcome.out, HasSubstr("\\xff\\xfe"));
+      for (const char* const bytes : {"\x1b", "\x01", "\x7f", "\r", "\t", "\xC2\x9B", "\xFF",
+                                      "\xED\xA0", "\xF4\x90", "\xE2\x80\xAE"})
+        EXPECT_THAT(outcome.out, Not(HasSubstr(bytes)));
+    }
+}
+
+TEST_F(HostileValuesTest, StayValidJson) {
+  for (const Words& words : kReading) {
+    SCOPED_TRACE(words[0] + " " + words.back());
+    json(words);
+  }
+  EXPECT_THAT(json({"log"})[0U]["msg"].asString(), HasSubstr("\x1b[31m"));
+}
+
+TEST_F(HostileValuesTest, AreSpeltOutInComplaints) {
+  EXPECT_EQ("1 there is no token with --user \\x1b[2J\\n\\u202e",
+            complaint(run({"token", "list", "--user", "\x1b[2J\n\xE2\x80\xAE"})));
+}
+
+TEST_F(HostileValuesTest, AreSpeltOutInQuestions) {
+  const Outcome outcome = runOnTerminal({"client", "delete", "1"}, "n\n");
+  EXPECT_THAT(outcome.out, HasSubstr("\\x1b[31m"));
+  EXPECT_THAT(outcome.out, Not(HasSubstr("\x1b[31m")));
+}
+
+// What cannot be decrypted comes as it is stored, and is masked whatever its length.
+TEST_F(HostileValuesTest, AreMaskedAsSecrets) {
+  EXPECT_EQ("...", json({"client", "list"})[0U]["client_secret"].asString().substr(
+                       json({"client", "list"})[0U]["client_secret"].asString().size() - 3));
+  EXPECT_GE(8U, json({"token", "list"})[0U]["access_token"].asString().size());
+}
+
+struct Text {
+  std::string given, ascii, utf8;
+};
+
+class EscapingTest : public testing::TestWithParam<Text> {
+ protected:
+  ~EscapingTest() override { std::setlocale(LC_CTYPE, "C"); }
+};
+
+TEST_P(EscapingTest, SpellsOutWhatIsNoPrintableText) {
+  std::setlocale(LC_CTYPE, "C");
+  EXPECT_EQ(GetParam().ascii, oauthctl::escaped(GetParam().given));
+  if (std::setlocale(LC_CTYPE, "C.UTF-8") == nullptr) return;
+  EXPECT_EQ(GetParam().utf8, oauthctl::escaped(GetParam().given));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    All, EscapingTest,
+    testing::Values(Text{"", "", ""}, Text{"plain 'text'", "plain 'text'", "plain 'text'"},
+                    Text{"\\x1b", "\\\\x1b", "\\\\x1b"}, Text{"\t\r\n", "\\t\\r\\n", "\\t\\r\\n"},
+                    Text{std::string("\0\x1f\x7f", 3), "\\x00\\x1f\\x7f", "\\x00\\x1f\\x7f"},
+                    Text{"\xC3\xA9", "\\u00e9", "\xC3\xA9"},
+                    Text{"\xF0\x9F\x99\x82", "\\U0001f642", "\xF0\x9F\x99\x82"},
+                    Text{"\xC2\x85\xC2\x9B", "\\u0085\\u009b", "\\u0085\\u009b"},
+                    Text{"\xE2\x80\xAE\xE2\x81\xA6\xEF\xBB\xBF", "\\u202e\\u2066\\ufeff",
+                         "\\u202e\\u2066\\ufeff"},
+                    Text{"\x80\xFF", "\\x80\\xff", "\\x80\\xff"}, Text{"\xC3", "\\xc3", "\\xc3"},
+                    Text{"\xC0\xAF", "\\xc0\\xaf", "\\xc0\\xaf"},
+                    Text{"\xE0\x80\xAF", "\\xe0\\x80\\xaf", "\\xe0\\x80\\xaf"},
+                    Text{"\xED\xA0\x80", "\\xed\\xa0\\x80", "\\xed\\xa0\\x80"},
+                    Text{"\xF4\x90\x80\x80", "\\xf4\\x90\\x80\\x80", "\\xf4\\x90\\x80\\x80"}));
+
+}  // namespace
