@@ -25,7 +25,7 @@ std::string absolutePath(const std::string& path) {
   char* const folder = getcwd(nullptr, 0);
   if (folder == nullptr)
     throw Failure(ExitCode::kAttention, "cannot tell the folder we are in: give a path from /");
-  const std::string result = std::string(folder) + "/" + path;
+  std::string result = std::string(folder) + "/" + path;
   free(folder);
   return result;
 }

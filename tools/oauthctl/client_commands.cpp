@@ -80,7 +80,7 @@ Made registerClient(const Invocation& invocation, const std::string& secret) {
 
 std::string callersSecret(const Invocation& invocation) {
   if (!invocation.has("--secret-from-stdin")) return {};
-  const std::string secret = readSecret("client secret");
+  std::string secret = readSecret("client secret");
   if (!checkStrLen(secret, 64, 64, false))
     throw Failure(ExitCode::kUsage,
                   "a client secret has 64 bytes, not " + std::to_string(secret.size()));

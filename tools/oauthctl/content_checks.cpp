@@ -65,10 +65,12 @@ void checkDefinitions(SqliteConnection& database, Findings& findings) {
     if (type == "table" && expected != kDefinitions.end()) {
       missing.erase(name);
       if (sql != expected->second)
-        findings.push_back({"table " + name + " is defined differently: " + sql,
-                            "find out who changed it, or restore a backup"});
+        findings.push_back(
+            {std::string("table ").append(name).append(" is defined differently: ") + sql,
+             "find out who changed it, or restore a backup"});
     } else if (name.rfind("sqlite_", 0) != 0) {
-      findings.push_back({"unknown " + type + " " + name, "find out who made it, and drop it"});
+      findings.push_back({std::string("unknown ").append(type).append(" ") + name,
+                          "find out who made it, and drop it"});
     }
   }
   for (const auto& [name, sql] : missing)

@@ -76,6 +76,11 @@ std::string conditionText(const Invocation& invocation) {
   return text;
 }
 
+[[noreturn]] void throwNone(const GrantKind& kind, const Invocation& invocation) {
+  throw Failure(ExitCode::kAttention,
+                std::string("there is no ") + kind.singular + " with" + conditionText(invocation));
+}
+
 void printGrants(const GrantKind& kind, const Json::Value& rows, const Registry& registry,
                  bool showSecrets) {
   std::vector<Column> columns = {{"ID", true}, {"USER"}, {"CLIENT"},
@@ -158,9 +163,7 @@ void listGrants(const GrantKind& kind, const Invocation& invocation) {
     printGrants(kind, rows, registry, showSecrets);
   }
   if (!rows.empty()) return;
-  if (isConditional(invocation))
-    throw Failure(ExitCode::kAttention, std::string("there is no ") + kind.singular + " with" +
-                                            conditionText(invocation));
+  if (isConditional(invocation)) throwNone(kind, invocation);
   if (!invocation.has("--json")) say(std::string("no ") + kind.plural);
 }
 
@@ -168,13 +171,11 @@ void revokeGrants(const GrantKind& kind, const Invocation& invocation) {
   Database database(Access::kWrite);
   const RowTest test = selection(database, invocation);
   const Json::Value doomed = matching(database.rows(kind.table), test);
-  const Failure none(ExitCode::kAttention, std::string("there is no ") + kind.singular + " with" +
-                                               conditionText(invocation));
-  if (doomed.empty()) throw none;
+  if (doomed.empty()) throwNone(kind, invocation);
   confirm(invocation,
           "Delete " + counted(doomed.size(), kind) + " with" + conditionText(invocation) + "?");
   const int removed = removeMatching(database, kind, test);
-  if (removed == 0) throw none;
+  if (removed == 0) throwNone(kind, invocation);
   say("deleted " + counted(removed, kind));
 }
 

@@ -45,7 +45,7 @@ std::string freeName() {
     std::strftime(stamp, sizeof stamp, "%Y%m%d-%H%M%S", &parts);
   const std::string name = fixed_paths::database() + ".before-restore-" + stamp;
   for (int n = 1;; ++n) {
-    const std::string candidate = n == 1 ? name : name + "-" + std::to_string(n);
+    std::string candidate = n == 1 ? name : name + "-" + std::to_string(n);
     if (access(candidate.c_str(), F_OK) != 0) return candidate;
   }
 }
@@ -64,7 +64,8 @@ void copyBytes(int from, const std::string& path) {
 
 // A file that no SQLite can open any more, and its journal, which must not reach the new one.
 std::string moveAside() {
-  const std::string kept = freeName(), path = fixed_paths::database();
+  const std::string path = fixed_paths::database();
+  std::string kept = freeName();
   if (rename(path.c_str(), kept.c_str()) != 0) cannotKeep(kept);
   chmod(kept.c_str(), S_IRUSR | S_IWUSR);
   rename((path + "-journal").c_str(), (kept + "-journal").c_str());
@@ -123,7 +124,7 @@ std::string replaceLiveDatabase(DatabaseImage& image) {
                     std::string("cannot restore, nothing changed: ") + error.what());
   }
   // Too damaged to be written into, hence of no use to any program either.
-  const std::string kept = moveAside();
+  std::string kept = moveAside();
   makeNew(image);
   return kept;
 }

@@ -58,8 +58,7 @@ void showLog(const Invocation& invocation) {
   wantedLines(invocation, 1);  // a mistake in it comes before all else
   const Json::Value all = matchingLines(invocation.value("--match"));
   Json::Value lines(Json::arrayValue);
-  const Json::ArrayIndex wanted =
-      static_cast<Json::ArrayIndex>(wantedLines(invocation, all.size()));
+  const auto wanted = static_cast<Json::ArrayIndex>(wantedLines(invocation, all.size()));
   for (Json::ArrayIndex i = all.size() - wanted; i < all.size(); ++i) lines.append(all[i]);
   if (invocation.has("--json")) {
     printJson(lines);

@@ -30,7 +30,7 @@ void removeUnfinished(int signal) {
 
 void removeOnSignals(const std::string& path) {
   if (path.size() >= sizeof unfinished) return;
-  std::strcpy(unfinished, path.c_str());
+  unfinished[path.copy(unfinished, path.size())] = '\0';
   for (const int signal : {SIGINT, SIGTERM, SIGHUP}) std::signal(signal, removeUnfinished);
 }
 

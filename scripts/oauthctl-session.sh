@@ -1,0 +1,107 @@
+#!/usr/bin/env bash
+# Runs the session that docs/oauthctl.md shows, and writes its true output into the page.
+#
+#   scripts/oauthctl-session.sh                               renews the page
+#   scripts/oauthctl-session.sh --check [FOLDER [EMULATOR...]]  only tells whether it is current
+#
+# Lines with "$ " in the page's console blocks are run, what follows them is replaced; comments that
+# begin with "session:" are run unseen. FOLDER holds the test programs and is built if none is
+# given. The clock stands still, and random values are replaced by others that stay the same.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+check=
+if [ "${1-}" = --check ]; then
+  check=yes
+  shift
+fi
+if [ $# -eq 0 ]; then
+  scripts/packages.sh build test
+  set -- "$(scripts/build.sh dev dev -- oauthctl_in_folder oauthctl_issue | tail -n 1)/tests/oauthctl"
+fi
+programs=$1
+emulator=("${@:2}")
+page=$PWD/docs/oauthctl.md
+
+folder=$(mktemp -d)
+trap 'rm -rf "$folder"' EXIT
+mkdir -m 700 "$folder/etc" "$folder/home"
+export OAUTHCTL_FOLDER=$folder/etc TZ=UTC
+OAUTHCTL_NOW=$(date -u -d '2026-11-21 09:30' +%s)
+export OAUTHCTL_NOW
+
+# shellcheck disable=SC2317 # called by what the page says
+oauthctl() { "${emulator[@]}" "$programs/oauthctl_in_folder" "$@"; }
+# shellcheck disable=SC2317
+issue() { "${emulator[@]}" "$programs/oauthctl_issue" "$@"; }
+
+declare -A stable=()
+# Paths as they are on a real machine; each random value as the digest of its place in line, also
+# where only the beginning of the secret is shown.
+steady() {
+  local text value
+  text=$(sed "s|$folder/etc|/var/packages/Keyloft/target/etc|g" "$folder/output")
+  while read -r value; do
+    [ -n "${stable[$value]-}" ] ||
+      stable[$value]=$(printf 'value %d' "${#stable[@]}" | sha256sum | cut -c 1-64)
+  done < <(grep -oE '\b[0-9a-f]{64}\b' <<<"$text")
+  for value in "${!stable[@]}"; do
+    text=${text//$value/${stable[$value]}}
+    text=${text//client_secret ${value:0:4}.../client_secret ${stable[$value]:0:4}...}
+  done
+  [ -z "$text" ] || printf '%s\n' "$text"
+}
+
+status=0
+run() { # COMMAND: runs it where the operator is, its output to $folder/output
+  local before=$status
+  set +e
+  (
+    cd "$folder/home" || exit
+    umask 077
+    (exit "$before")
+    eval "$1"
+  ) </dev/null >"$folder/output" 2>&1
+  status=$?
+  set -e
+}
+
+block=
+while IFS= read -r line; do
+  case $block$line in
+    '```console') block=console ;;
+    'console```') block= ;;
+    'console$ '*)
+      printf '%s\n' "$line"
+      command=${line#??}
+      while [[ $line == *\\ ]] && IFS= read -r line; do
+        printf '%s\n' "$line"
+        command+=$'\n'$line
+      done
+      run "$command"
+      steady
+      continue
+      ;;
+    console*) continue ;; # what the last run said
+    '<!-- session: '*)
+      command=${line#'<!-- session: '}
+      run "${command%' -->'}"
+      if [ "$status" -ne 0 ]; then
+        echo "oauthctl-session: failed: $command: $(<"$folder/output")" >&2
+        exit 1
+      fi
+      ;;
+  esac
+  printf '%s\n' "$line"
+done <"$page" >"$folder/page"
+
+if cmp --silent "$page" "$folder/page"; then
+  echo "oauthctl-session: docs/oauthctl.md is current"
+elif [ -n "$check" ]; then
+  diff -u "$page" "$folder/page" >&2 || true
+  echo "oauthctl-session: docs/oauthctl.md is not current, run scripts/oauthctl-session.sh" >&2
+  exit 1
+else
+  cp "$folder/page" "$page"
+  echo "oauthctl-session: docs/oauthctl.md is renewed"
+fi
