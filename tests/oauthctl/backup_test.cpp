@@ -53,6 +53,15 @@ TEST_F(BackupTest, CopiesEveryRow) {
   EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
 }
 
+TEST_F(BackupTest, CarriesNoDeletedRowAlong) {
+  addClient('c');
+  addToken('7');
+  execute("PRAGMA secure_delete = OFF; DELETE FROM oauth_token");
+  ASSERT_THAT(databaseBytes(), HasSubstr(times(64, '7')));
+  EXPECT_EQ(0, run({"backup", copy_}).code);
+  EXPECT_THAT(bytesOf(copy_), Not(HasSubstr(times(8, '7'))));
+}
+
 TEST_F(BackupTest, LeavesTheSourceAlone) {
   addClient('c');
   const std::string before = databaseBytes();
@@ -234,6 +243,17 @@ TEST_F(RestoreTest, ReplacesNothingUnasked) {
   const std::string before = databaseBytes();
   EXPECT_EQ(2, run({"restore", copy_}).code);
   EXPECT_EQ(before, databaseBytes());
+}
+
+// What somebody did to the backup must not change how the server's journal works.
+TEST_F(RestoreTest, KeepsTheJournalMode) {
+  sqlite3* db = nullptr;
+  sqlite3_open_v2(copy_.c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
+  sqlite3_exec(db, "PRAGMA journal_mode = wal", nullptr, nullptr, nullptr);
+  sqlite3_close_v2(db);
+  ASSERT_THAT(queryIn(copy_, "PRAGMA journal_mode"), ElementsAre("wal"));
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+  EXPECT_THAT(queryIn(files_.database(), "PRAGMA journal_mode"), ElementsAre("delete"));
 }
 
 TEST_F(RestoreTest, RefusesADamagedFile) {

@@ -99,7 +99,7 @@ TEST_F(CheckTest, FindsAMissingTable) {
 TEST_F(CheckTest, FindsEachDifferentDefinition) {
   for (const std::string table :
        {"oauth_meta", "oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"}) {
-    const std::string where = " WHERE name = '" + table + "'";
+    const std::string where = std::string(" WHERE name = '").append(table).append("'");
     changeSchema("UPDATE sqlite_master SET sql = replace(sql, '(', '( ')" + where);
     EXPECT_THAT(findings(), ElementsAre(StartsWith("table " + table + " is defined differently")));
     changeSchema("UPDATE sqlite_master SET sql = replace(sql, '( ', '(')" + where);
@@ -112,6 +112,11 @@ TEST_F(CheckTest, FindsWhatIsNotOurs) {
   execute("CREATE INDEX fast ON oauth_token(username)");
   EXPECT_THAT(findings(),
               ElementsAre("unknown trigger spy", "unknown table extra", "unknown index fast"));
+}
+
+TEST_F(CheckTest, FindsAnotherJournalMode) {
+  execute("PRAGMA journal_mode = wal");
+  EXPECT_EQ("journal mode is wal, not delete", json({"check"})[0U]["problem"].asString());
 }
 
 TEST_F(CheckTest, FindsAMissingVersion) {

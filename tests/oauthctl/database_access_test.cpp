@@ -9,7 +9,6 @@
 
 #include "oauthctl_test.h"
 
-using testing::AnyOf;
 using testing::HasSubstr;
 using testing::StartsWith;
 

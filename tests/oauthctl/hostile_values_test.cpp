@@ -10,9 +10,13 @@ using testing::Not;
 
 namespace {
 
+// Characters that turn the direction of text, spelt so that they cannot turn this file's.
+const std::string kOverride = {'\xE2', '\x80', '\xAE'}, kIsolate = {'\xE2', '\x81', '\xA6'};
+
 const std::string kHostile =
     "\"\\ \n\r\t\x01\x1b[31m\x7f \xC2\x9B"
-    "31m \xE2\x80\xAE \xFF\xFE \xC3 \xED\xA0\x80 \xF4\x90\x80\x80 '\xC3\xA9 \xF0\x9F\x99\x82";
+    "31m " +
+    kOverride + " \xFF\xFE \xC3 \xED\xA0\x80 \xF4\x90\x80\x80 '\xC3\xA9 \xF0\x9F\x99\x82";
 
 class HostileValuesTest : public OauthctlTest {
  protected:
@@ -50,7 +54,7 @@ TEST_F(HostileValuesTest, AreSpeltOutInTables) {
       EXPECT_THAT(outcome.out, HasSubstr("\\u009b"));
       EXPECT_THAT(outcome.out, HasSubstr("\\xff\\xfe"));
       for (const char* const bytes : {"\x1b", "\x01", "\x7f", "\r", "\t", "\xC2\x9B", "\xFF",
-                                      "\xED\xA0", "\xF4\x90", "\xE2\x80\xAE"})
+                                      "\xED\xA0", "\xF4\x90", kOverride.c_str()})
         EXPECT_THAT(outcome.out, Not(HasSubstr(bytes)));
     }
 }
@@ -65,7 +69,7 @@ TEST_F(HostileValuesTest, StayValidJson) {
 
 TEST_F(HostileValuesTest, AreSpeltOutInComplaints) {
   EXPECT_EQ("1 there is no token with --user \\x1b[2J\\n\\u202e",
-            complaint(run({"token", "list", "--user", "\x1b[2J\n\xE2\x80\xAE"})));
+            complaint(run({"token", "list", "--user", "\x1b[2J\n" + kOverride})));
 }
 
 TEST_F(HostileValuesTest, AreSpeltOutInQuestions) {
@@ -84,6 +88,7 @@ TEST_F(HostileValuesTest, AreMaskedAsSecrets) {
 struct Text {
   std::string given, ascii, utf8;
 };
+void PrintTo(const Text& text, std::ostream* out) { *out << testing::PrintToString(text.ascii); }
 
 class EscapingTest : public testing::TestWithParam<Text> {
  protected:
@@ -105,7 +110,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Text{"\xC3\xA9", "\\u00e9", "\xC3\xA9"},
                     Text{"\xF0\x9F\x99\x82", "\\U0001f642", "\xF0\x9F\x99\x82"},
                     Text{"\xC2\x85\xC2\x9B", "\\u0085\\u009b", "\\u0085\\u009b"},
-                    Text{"\xE2\x80\xAE\xE2\x81\xA6\xEF\xBB\xBF", "\\u202e\\u2066\\ufeff",
+                    Text{kOverride + kIsolate + "\xEF\xBB\xBF", "\\u202e\\u2066\\ufeff",
                          "\\u202e\\u2066\\ufeff"},
                     Text{"\x80\xFF", "\\x80\\xff", "\\x80\\xff"}, Text{"\xC3", "\\xc3", "\\xc3"},
                     Text{"\xC0\xAF", "\\xc0\\xaf", "\\xc0\\xaf"},

@@ -15,6 +15,7 @@ struct Moment {
   std::int64_t moment;
   const char* text;
 };
+void PrintTo(const Moment& moment, std::ostream* out) { *out << moment.text; }
 
 class RelativeTimeTest : public testing::TestWithParam<Moment> {};
 
@@ -28,7 +29,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Moment{kNow + 60, "in 1 min"}, Moment{kNow + 599, "in 9 min"},
                     Moment{kNow + 3600, "in 1 h"}, Moment{kNow - 7199, "119 min ago"},
                     Moment{kNow - 7200, "2 h ago"}, Moment{kNow - 86400, "1 day ago"},
-                    Moment{kNow - 3 * 86400, "3 days ago"},
+                    Moment{kNow - 3 * 86400LL, "3 days ago"},
                     Moment{kNow + 800 * 86400LL, "in 2 years"},
                     Moment{kLast, "in 292471208623 years"},
                     Moment{kFirst, "292471208677 years ago"}));
@@ -37,6 +38,7 @@ struct Length {
   const char* text;
   std::int64_t seconds;  // -1: none
 };
+void PrintTo(const Length& length, std::ostream* out) { *out << '"' << length.text << '"'; }
 
 class DurationTest : public testing::TestWithParam<Length> {};
 

@@ -1,8 +1,6 @@
 #include "oauth_log.h"
 #include "oauthctl_test.h"
 
-using testing::ElementsAre;
-
 namespace {
 
 class LogTest : public OauthctlTest {

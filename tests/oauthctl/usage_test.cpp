@@ -73,6 +73,9 @@ struct Mistake {
   Words words;
   std::string complaint;
 };
+void PrintTo(const Mistake& mistake, std::ostream* out) {
+  *out << testing::PrintToString(mistake.words);
+}
 
 class MistakeTest : public UsageTest, public testing::WithParamInterface<Mistake> {};
 

@@ -85,6 +85,7 @@ DatabaseImage readBackup(const std::string& path) try {
   const CipherCount ciphers = image.countCiphers();
   if (ciphers.values > 0 && ciphers.unreadable == ciphers.values)
     refuse(path, "it was encrypted on another machine, or this one has lost its key");
+  image.compact();
   return image;
 } catch (const SqliteError& error) {
   if (error.isBusy())
@@ -105,6 +106,7 @@ void backUp(const Invocation& invocation) {
     if (const Findings problems = image.problems(); !problems.empty())
       throw Failure(ExitCode::kAttention, "the database is not sound, no backup was made: " +
                                               firstOf(problems) + "; see 'oauthctl check'");
+    image.compact();
     if (invocation.has("--without-tokens")) image.dropGrants();
     summary = image.summary();
     image.writeTo(file.path());

@@ -34,6 +34,7 @@ void checkContents(Findings& findings) {
   SqliteConnection database(fixed_paths::database(), SQLITE_OPEN_READONLY);
   CipherCount count;
   collect(findings, [&] { return checkStructure(database); });
+  collect(findings, [&] { return checkJournalMode(database); });
   collect(findings, [&] { return checkCiphers(database, count); });
   collect(findings, [&] { return checkExpiries(database); });
 }

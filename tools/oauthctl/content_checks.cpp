@@ -127,6 +127,14 @@ Findings checkStructure(SqliteConnection& database) {
   return findings;
 }
 
+Findings checkJournalMode(SqliteConnection& database) {
+  const std::string mode = database.value("PRAGMA journal_mode");
+  if (mode == "delete") return {};
+  return {
+      {"journal mode is " + mode + ", not delete",
+       "find out who changed it: 'PRAGMA journal_mode = delete' in sqlite3 while nothing runs"}};
+}
+
 Findings checkCiphers(SqliteConnection& database, CipherCount& count) {
   Findings findings;
   for (const auto& [table, column] : kCipherColumns) {

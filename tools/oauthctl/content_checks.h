@@ -10,6 +10,9 @@ namespace oauthctl {
 // Pages, table definitions, schema versions: what a file must have to be our database at all.
 Findings checkStructure(SqliteConnection& database);
 
+// The journal is the library's own kind.
+Findings checkJournalMode(SqliteConnection& database);
+
 struct CipherCount {
   int values = 0, unreadable = 0;
 };

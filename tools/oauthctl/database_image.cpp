@@ -40,8 +40,11 @@ DatabaseImage::DatabaseImage(const std::string& path)
 }
 
 void DatabaseImage::dropGrants() {
-  memory_.run("DELETE FROM oauth_grantCode; DELETE FROM oauth_token; VACUUM;");
+  memory_.run("DELETE FROM oauth_grantCode; DELETE FROM oauth_token;");
+  compact();
 }
+
+void DatabaseImage::compact() { memory_.run("PRAGMA temp_store = MEMORY; VACUUM;"); }
 
 CipherCount DatabaseImage::countCiphers() {
   CipherCount count;

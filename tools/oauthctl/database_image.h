@@ -17,6 +17,8 @@ class DatabaseImage {
 
   // No code or token is left in any of its pages.
   void dropGrants();
+  // Nor any row that had been deleted in the file, and no other journal mode than the usual one.
+  void compact();
 
   // What makes it no database of ours; empty if it is one.
   Findings problems() { return checkStructure(memory_); }
