@@ -13,7 +13,7 @@ mapfile -t sources < <(find include src platform examples tools tests -name '*.c
 clang-format --dry-run -Werror "${sources[@]}" bench/*.{c,cpp,h}
 echo "check: sources are formatted"
 
-shellcheck .ci/run scripts/*.sh tests/*.sh
+shellcheck .ci/run scripts/*.sh tests/*.sh tools/oauthctl/oauthctl.bash
 echo "check: shell scripts are sound"
 
 folder=$(scripts/build.sh dev dev | tail -n 1)

@@ -101,7 +101,8 @@ TEST_F(CheckTest, FindsEachDifferentDefinition) {
        {"oauth_meta", "oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"}) {
     const std::string where = std::string(" WHERE name = '").append(table).append("'");
     changeSchema("UPDATE sqlite_master SET sql = replace(sql, '(', '( ')" + where);
-    EXPECT_THAT(findings(), ElementsAre(StartsWith("table " + table + " is defined differently")));
+    EXPECT_THAT(findings(), ElementsAre(StartsWith(std::string("table ").append(table).append(
+                                " is defined differently"))));
     changeSchema("UPDATE sqlite_master SET sql = replace(sql, '( ', '(')" + where);
   }
 }
@@ -140,13 +141,13 @@ TEST_F(CheckTest, FindsAVersionOfNoTable) {
 }
 
 TEST_F(CheckTest, FindsEachValueThatDoesNotDecrypt) {
-  for (const char* const place : {"client_id in oauth_clientInfo",
-                                  "client_secret in "
-                                  "oauth_clientInfo",
-                                  "client_id in oauth_grantCode", "client_id in oauth_token"}) {
+  for (const char* const place :
+       {"client_id in oauth_clientInfo", "client_secret in oauth_clientInfo",
+        "client_id in oauth_grantCode", "client_id in oauth_token"}) {
     const std::string text = place, column = text.substr(0, text.find(' ')),
                       table = text.substr(text.rfind(' ') + 1);
-    const std::string before = query("SELECT " + column + " FROM " + table).front();
+    const std::string before =
+        query(std::string("SELECT ").append(column).append(" FROM ") + table).front();
     plant(table, column, "not sealed");
     EXPECT_THAT(findings(), ElementsAre(text + " does not decrypt: row 1"));
     plant(table, column, before);
