@@ -116,56 +116,89 @@ TEST_F(BackupTest, LeavesNoTokenBytesWhenToldSo) {
   EXPECT_EQ("ok", queryIn(copy_, "PRAGMA integrity_check").front());
 }
 
-TEST_F(BackupTest, IsOneMomentWhileFourProcessesIssueTokens) {
-  writeSettings(R"({"token_max": 10000})");
-  addClient('c');
-  addToken('a');
-  files_.waitForLocks();
-  std::vector<pid_t> issuers;
-  for (int n = 0; n < 4; ++n) {
-    const pid_t child = fork();
-    if (child != 0) {
-      issuers.push_back(child);
-      continue;
+// Four processes that issue tokens, each noted once the library has said that it is there.
+class IssuingTest : public BackupTest {
+ protected:
+  IssuingTest() {
+    writeSettings(R"({"token_max": 10000})");
+    addClient('c');
+    EXPECT_EQ(0, run({"backup", copy_}).code);
+    files_.waitForLocks();
+    for (int n = 0; n < kIssuers; ++n) {
+      const pid_t child = fork();
+      if (child == 0) issue(notes(n));
+      issuers_.push_back(child);
     }
-    // Each token is noted once the library has said that it is there.
-    const int notes =
-        open(path("notes-" + std::to_string(n)).c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
+    while (acknowledged().size() < 20) usleep(1000);
+  }
+  ~IssuingTest() override { stop(); }
+
+  void stop() {
+    for (const pid_t issuer : issuers_) kill(issuer, SIGKILL);
+    for (const pid_t issuer : issuers_) waitpid(issuer, nullptr, 0);
+    issuers_.clear();
+  }
+  Lines acknowledged() const {
+    Lines tokens;
+    for (int n = 0; n < kIssuers; ++n) {
+      std::istringstream noted(bytesOf(notes(n)));
+      for (std::string line; std::getline(noted, line) && line.size() == 64;)
+        tokens.push_back(line);
+    }
+    return tokens;
+  }
+  static void expectAll(const Lines& tokens, const Lines& found) {
+    for (const std::string& token : tokens)
+      EXPECT_EQ(1, std::count(found.begin(), found.end(), token)) << token;
+  }
+  static Lines tokensIn(const std::string& file) {
+    return queryIn(file, "SELECT access_token FROM oauth_token");
+  }
+
+ private:
+  static constexpr int kIssuers = 4;
+
+  std::string notes(int n) const { return path("notes-" + std::to_string(n)); }
+  [[noreturn]] static void issue(const std::string& file) {
+    const int noted = open(file.c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
     for (int i = 0; i < 2000; ++i) {
       OAUTHDBToken tokens("oauth_token");
       Json::Value issued;
       if (tokens.Add("alice", times(64, 'c'), "read", "code", "xyz", "", issued) == 0) _exit(1);
-      const std::string note = issued["access_token"].asString() + "\n";
-      if (write(notes, note.data(), note.size()) < 0) _exit(1);
+      const std::string line = issued["access_token"].asString() + "\n";
+      if (write(noted, line.data(), line.size()) < 0) _exit(1);
     }
     _exit(0);
   }
-  const auto acknowledged = [&] {
-    Lines tokens;
-    for (int n = 0; n < 4; ++n) {
-      std::istringstream notes(bytesOf(path("notes-" + std::to_string(n))));
-      for (std::string line; std::getline(notes, line) && line.size() == 64;)
-        tokens.push_back(line);
-    }
-    return tokens;
-  };
-  while (acknowledged().size() < 20) usleep(1000);
 
+  std::vector<pid_t> issuers_;
+};
+
+TEST_F(IssuingTest, BackupsAreOneMoment) {
   for (const char* const name : {"1.db", "2.db", "3.db"}) {
     const Lines before = acknowledged();
     const Outcome outcome = run({"backup", path(name)});
     EXPECT_EQ(0, outcome.code) << outcome.err;
     EXPECT_THAT(queryIn(path(name), "PRAGMA integrity_check"), ElementsAre("ok"));
-    const Lines copied = queryIn(path(name), "SELECT access_token FROM oauth_token");
-    for (const std::string& token : before)
-      EXPECT_EQ(1, std::count(copied.begin(), copied.end(), token)) << token;
+    expectAll(before, tokensIn(path(name)));
   }
-  for (const pid_t issuer : issuers) kill(issuer, SIGKILL);
-  for (const pid_t issuer : issuers) waitpid(issuer, nullptr, 0);
-
+  stop();
   const Lines copied = rowsIn(path("2.db"));
   EXPECT_EQ(0, run({"restore", path("2.db"), "--yes"}).code);
   EXPECT_EQ(copied, rowsIn(files_.database()));
+}
+
+// What is issued while a restore runs is in what was kept, or in the database that came.
+TEST_F(IssuingTest, RestoresLoseNothing) {
+  Lines found;
+  for (int n = 0; n < 10; ++n) EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+  stop();
+  for (const std::string& name : fileNames()) {
+    if (name.rfind("oauth.db", 0) != 0) continue;
+    const Lines tokens = tokensIn(path(name));
+    found.insert(found.end(), tokens.begin(), tokens.end());
+  }
+  expectAll(acknowledged(), found);
 }
 
 // Ctrl-C while it waits for the database.

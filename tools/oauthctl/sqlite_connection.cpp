@@ -1,9 +1,19 @@
 #include "sqlite_connection.h"
 
+#include <chrono>
+#include <thread>
+
 namespace oauthctl {
 namespace {
 
-constexpr int kBusyTimeout = 5000;  // milliseconds
+// SQLite's own waiting sleeps up to a tenth of a second at a time, in which programs that write all
+// the time pass the lock to one another. One operator may ask more often.
+constexpr int kPause = 2, kLongest = 5000;  // milliseconds
+int waitForLock(void* /*context*/, int times) {
+  if (times >= kLongest / kPause) return 0;
+  std::this_thread::sleep_for(std::chrono::milliseconds(kPause));
+  return 1;
+}
 
 struct Finalize {
   void operator()(sqlite3_stmt* statement) const { sqlite3_finalize(statement); }
@@ -16,7 +26,7 @@ SqliteConnection::SqliteConnection(const std::string& path, int flags) {
   const int code = sqlite3_open_v2(path.c_str(), &handle, flags, nullptr);
   handle_.reset(handle);
   if (code != SQLITE_OK) fail(code);
-  sqlite3_busy_timeout(handle, kBusyTimeout);
+  sqlite3_busy_handler(handle, waitForLock, nullptr);
 }
 
 void SqliteConnection::fail(int code) const {

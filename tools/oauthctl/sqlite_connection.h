@@ -26,7 +26,7 @@ class SqliteError : public std::runtime_error {
 
 class SqliteConnection {
  public:
-  // Waits for other programs as long as the library does. flags as for sqlite3_open_v2().
+  // Waits for other programs about as long as the library does. flags as for sqlite3_open_v2().
   SqliteConnection(const std::string& path, int flags);
 
   sqlite3* handle() const { return handle_.get(); }
