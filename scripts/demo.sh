@@ -12,6 +12,7 @@ if ! mkdir -p "$data" 2>/dev/null || [ ! -w "$data" ]; then
   exit 1
 fi
 scripts/packages.sh build
-folder=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF | tail -n 1)
+folder=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=OFF |
+  tail -n 1)
 umask 077 # the database holds tokens in plain text
 "$folder/examples/lifecycle"

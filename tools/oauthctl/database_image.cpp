@@ -5,7 +5,7 @@
 namespace oauthctl {
 
 DatabaseCopy::DatabaseCopy(SqliteConnection& from, SqliteConnection& to)
-    : to_(to), backup_(sqlite3_backup_init(to.handle(), "main", from.handle(), "main")) {
+    : backup_(sqlite3_backup_init(to.handle(), "main", from.handle(), "main")) {
   if (backup_ == nullptr) to.fail(sqlite3_errcode(to.handle()));
 }
 

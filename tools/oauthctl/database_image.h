@@ -51,7 +51,6 @@ class DatabaseCopy {
  private:
   bool step(int pages);
 
-  SqliteConnection& to_;
   sqlite3_backup* backup_;
 };
 
