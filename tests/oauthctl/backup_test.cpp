@@ -208,7 +208,8 @@ TEST_F(BackupTest, LeavesNothingWhenItIsInterrupted) {
   sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
   sqlite3_exec(db, "BEGIN EXCLUSIVE", nullptr, nullptr, nullptr);
   beforeTyping_ = [this] {
-    while (fileNames().size() < 2) usleep(1000);
+    while (fileNames().size() < 2) {
+    }  // Without a pause: the first moment is the dangerous one.
   };
   const Outcome outcome = runOnTerminal({"backup", copy_}, "\x03");
   sqlite3_close_v2(db);

@@ -34,6 +34,23 @@ void removeOnSignals(const std::string& path) {
   for (const int signal : {SIGINT, SIGTERM, SIGHUP}) std::signal(signal, removeUnfinished);
 }
 
+// Makes a file like mkostemp. No signal finds it made and not yet known to the handler.
+bool makeRemovable(std::string& path) {
+  sigset_t held, before;
+  sigemptyset(&held);
+  for (const int signal : {SIGINT, SIGTERM, SIGHUP}) sigaddset(&held, signal);
+  sigprocmask(SIG_BLOCK, &held, &before);
+  const int descriptor = mkostemp(path.data(), O_CLOEXEC);
+  if (descriptor >= 0) {
+    close(descriptor);
+    removeOnSignals(path);
+  }
+  const int error = errno;
+  sigprocmask(SIG_SETMASK, &before, nullptr);
+  errno = error;
+  return descriptor >= 0;
+}
+
 void restoreSignals() {
   for (const int signal : {SIGINT, SIGTERM, SIGHUP}) std::signal(signal, SIG_DFL);
 }
@@ -61,10 +78,7 @@ void requireFreeName(const std::string& path) {
 
 NewFile::NewFile(const std::string& target) : target_(target), path_(target + ".XXXXXX") {
   requireFreeName(target);
-  const int descriptor = mkostemp(path_.data(), O_CLOEXEC);
-  if (descriptor < 0) cannot("make a file beside " + target);
-  close(descriptor);
-  removeOnSignals(path_);
+  if (!makeRemovable(path_)) cannot("make a file beside " + target);
 }
 
 NewFile::~NewFile() {
