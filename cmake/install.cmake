@@ -1,0 +1,46 @@
+# What cmake --install puts where. The stand-ins for the host's libraries are for development
+# machines only: cmake --install BUILD --component standins
+
+include(CMakePackageConfigHelpers)
+include(GNUInstallDirs)
+
+set(header_folder ${CMAKE_INSTALL_INCLUDEDIR}/zevooauth)
+set(config_folder ${CMAKE_INSTALL_LIBDIR}/cmake/ZevoOAuth)
+set(pkgconfig_folder ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
+
+install(TARGETS zevooauth EXPORT ZevoOAuthTargets
+  LIBRARY COMPONENT runtime NAMELINK_COMPONENT development
+  INCLUDES DESTINATION ${header_folder})
+install(DIRECTORY include/ DESTINATION ${header_folder} COMPONENT development
+  FILES_MATCHING PATTERN *.h)
+
+configure_package_config_file(cmake/ZevoOAuthConfig.cmake.in ZevoOAuthConfig.cmake
+  INSTALL_DESTINATION ${config_folder} NO_SET_AND_CHECK_MACRO)
+write_basic_package_version_file(ZevoOAuthConfigVersion.cmake COMPATIBILITY SameMajorVersion)
+install(EXPORT ZevoOAuthTargets
+  NAMESPACE ZevoOAuth:: DESTINATION ${config_folder} COMPONENT development)
+install(FILES
+  ${PROJECT_BINARY_DIR}/ZevoOAuthConfig.cmake ${PROJECT_BINARY_DIR}/ZevoOAuthConfigVersion.cmake
+  DESTINATION ${config_folder} COMPONENT development)
+
+# Relative to the file itself, so that the tree may be put anywhere, also by --prefix.
+file(RELATIVE_PATH prefix_from_pkgconfig /${pkgconfig_folder} /)
+string(REGEX REPLACE "/$" "" prefix_from_pkgconfig ${prefix_from_pkgconfig})
+configure_file(cmake/zevooauth.pc.in zevooauth.pc @ONLY)
+install(FILES ${PROJECT_BINARY_DIR}/zevooauth.pc
+  DESTINATION ${pkgconfig_folder} COMPONENT development)
+
+install(DIRECTORY docs examples DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documentation
+  FILES_MATCHING PATTERN *.md PATTERN *.svg PATTERN *.png PATTERN lifecycle.cpp)
+install(FILES CHANGELOG.md DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documentation)
+
+if(ZEVOOAUTH_BUILD_TOOLS)
+  install(TARGETS oauthctl RUNTIME COMPONENT oauthctl)
+  install(FILES tools/oauthctl/oauthctl.1
+    DESTINATION ${CMAKE_INSTALL_MANDIR}/man1 COMPONENT oauthctl)
+  install(FILES tools/oauthctl/oauthctl.bash RENAME oauthctl
+    DESTINATION ${CMAKE_INSTALL_DATADIR}/bash-completion/completions COMPONENT oauthctl)
+endif()
+
+install(TARGETS zevocore zevocgi
+  LIBRARY NAMELINK_SKIP COMPONENT standins EXCLUDE_FROM_ALL)

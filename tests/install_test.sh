@@ -1,0 +1,67 @@
+#!/usr/bin/env bash
+# Installs a build into a folder of its own, compiles a program against it twice, as CMake and as
+# pkg-config tell, and runs both.
+#
+#   install_test.sh BUILD COMPILER [FLAG...]
+set -euo pipefail
+
+build=$1 compiler=$2 flags="${*:3}"
+source=$(cd "$(dirname "$0")" && pwd)/install
+folder=$(mktemp --directory --tmpdir zevooauth-install-XXXXXX)
+trap 'rm -rf "$folder"' EXIT
+cd "$folder"
+
+cmake --install "$build" --prefix "$folder/tree" >install.log
+
+(cd tree && find . ! -type d ! -path './share/doc/*' | sort) |
+  sed 's/Targets-[a-z]*/Targets-BUILD_TYPE/' >installed
+diff -u - installed <<'END'
+./bin/oauthctl
+./include/zevooauth/oauth_clientInfo.h
+./include/zevooauth/oauth_db_basic.h
+./include/zevooauth/oauth_grantCode.h
+./include/zevooauth/oauth_log.h
+./include/zevooauth/oauth_token.h
+./include/zevooauth/oauth_utils.h
+./lib/cmake/ZevoOAuth/ZevoOAuthConfig.cmake
+./lib/cmake/ZevoOAuth/ZevoOAuthConfigVersion.cmake
+./lib/cmake/ZevoOAuth/ZevoOAuthTargets-BUILD_TYPE.cmake
+./lib/cmake/ZevoOAuth/ZevoOAuthTargets.cmake
+./lib/libzevooauth.so
+./lib/libzevooauth.so.1
+./lib/libzevooauth.so.1.0.0
+./lib/pkgconfig/zevooauth.pc
+./share/bash-completion/completions/oauthctl
+./share/man/man1/oauthctl.1
+END
+test -s tree/share/doc/zevooauth/docs/operations.md
+test -s tree/share/doc/zevooauth/CHANGELOG.md
+for program in bin/oauthctl lib/libzevooauth.so; do
+  if readelf --dynamic "tree/$program" | grep -E 'RPATH|RUNPATH'; then
+    echo "install: $program looks for libraries where it was built" >&2
+    exit 1
+  fi
+done
+
+cmake --install "$build" --prefix "$folder/host" --component standins >>install.log
+(cd host && find . ! -type d | sort) >installed
+diff -u - installed <<'END'
+./lib/libzevocgi.so.6
+./lib/libzevocore.so.6
+END
+
+mv tree moved # nothing in it says where it was
+export LD_LIBRARY_PATH=$folder/moved/lib:$folder/host/lib
+expected=" WHERE username='alice' 64"
+
+CXXFLAGS=$flags cmake -G Ninja -S "$source" -B by-cmake -DCMAKE_CXX_COMPILER="$compiler" \
+  -DCMAKE_PREFIX_PATH="$folder/moved" >cmake.log
+cmake --build by-cmake >>cmake.log
+test "$(by-cmake/consumer)" = "$expected"
+
+export PKG_CONFIG_PATH=$folder/moved/lib/pkgconfig
+test "$(pkg-config --modversion zevooauth)" = 1.0.0
+read -ra options <<<"$flags $(pkg-config --cflags --libs zevooauth)"
+"$compiler" -std=c++17 "$source/consumer.cpp" "${options[@]}" -o by-pkg-config
+test "$(./by-pkg-config)" = "$expected"
+echo "install: a program compiles against the installed library by CMake and by pkg-config"
