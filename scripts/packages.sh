@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Installs what the named groups need from Debian's packages, as far as it is missing.
 #
-#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench
+#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare
 set -euo pipefail
 
 declare -A groups=(
@@ -11,6 +11,8 @@ declare -A groups=(
   [check]="clang-format clang-tidy gcovr shellcheck"
   [fuzz]="clang libclang-rt-dev"
   [bench]="libbenchmark-dev valgrind gnuplot-nox"
+  [package]="build-essential debhelper lintian"
+  [bare]="debootstrap"
 )
 
 missing=()

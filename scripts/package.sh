@@ -1,0 +1,34 @@
+#!/usr/bin/env bash
+# Builds the Debian packages and lets lintian look at them.
+# Installs what is missing (scripts/packages.sh, groups build and package). The same commit gives the
+# same packages, byte for byte.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+scripts/packages.sh build package
+folder=$(scripts/build-folder.sh packages)
+rm -rf "$folder"
+mkdir -p "$folder"
+
+# Elsewhere, since the packages are put beside the tree, and the path may hold no blank.
+work=$(mktemp --directory --tmpdir zevooauth-package-XXXXXX)
+trap 'rm -rf "$work"' EXIT
+mkdir "$work/zevooauth"
+tar --create --exclude=./build --exclude=./.git . | tar --extract --directory "$work/zevooauth"
+jobs=$(nproc)
+export DEB_BUILD_OPTIONS="noautodbgsym parallel=$jobs"
+if ! (cd "$work/zevooauth" &&
+  dpkg-buildpackage --build=binary --unsigned-source --unsigned-changes) >"$work/build.log" 2>&1; then
+  tail -n 40 "$work/build.log"
+  echo "package: could not build the packages" >&2
+  exit 1
+fi
+
+cp "$work"/zevooauth_* "$work"/*.deb "$folder"
+cd "$folder"
+if ! lintian --allow-root --fail-on error,warning --info ./*.changes; then
+  echo "package: lintian finds fault with the packages" >&2
+  exit 1
+fi
+ls -l --human-readable ./*.deb
+echo "package: four packages in $folder, and lintian has no error and no warning"

@@ -1,0 +1,94 @@
+#!/usr/bin/env bash
+# In bare Debian 12 systems, made in the build folder: the packages are built twice and must be
+# the same byte for byte; they are installed, used, upgraded and removed.
+# Runs as root. Installs what is missing (scripts/packages.sh, group bare); everything else goes into
+# those systems, whose downloads are kept for the next time.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+if [ "$(id -u)" -ne 0 ]; then
+  echo "test-package: as root, please: it makes systems of their own" >&2
+  exit 1
+fi
+scripts/packages.sh bare
+folder=$(scripts/build-folder.sh test-package)
+mkdir -p "$folder"
+
+within() { # ROOT COMMAND...: nothing of this machine's environment or processes
+  local root=$folder/$1
+  shift
+  unshare --mount --pid --fork --mount-proc --root="$root" env --ignore-environment \
+    HOME=/root PATH=/usr/sbin:/usr/bin:/sbin:/bin LC_ALL=C.UTF-8 DEBIAN_FRONTEND=noninteractive "$@"
+}
+
+quietly() { # COMMAND...: says what it said only if it fails
+  "$@" >"$folder/log" 2>&1 || {
+    local code=$?
+    cat "$folder/log"
+    return "$code"
+  }
+}
+
+fresh() { # ROOT: a bare system of this name
+  rm -rf "${folder:?}/$1"
+  cp -a "$folder/bare" "$folder/$1"
+  cp /etc/resolv.conf "$folder/$1/etc/"
+}
+
+keep_downloads() { # ROOT
+  cp -u "$folder/$1"/var/cache/apt/archives/*.deb "$folder/bare/var/cache/apt/archives/"
+}
+
+if [ ! -e "$folder/bare.done" ]; then
+  rm -rf "$folder/bare"
+  # shellcheck disable=SC2016 # apt-get expands this itself
+  mirror=$(apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' 'Codename: bookworm' |
+    sort -u | head -n 1)
+  debootstrap --variant=minbase bookworm "$folder/bare" "$mirror" >"$folder/debootstrap.log"
+  cp /etc/resolv.conf "$folder/bare/etc/"
+  echo 'Dpkg::Use-Pty "0";' >"$folder/bare/etc/apt/apt.conf.d/no-terminal"
+  within bare apt-get -qq update
+  touch "$folder/bare.done"
+fi
+echo "test-package: a bare Debian 12 is there"
+
+# Twice the same commit, in other places, under other habits.
+fresh build
+mkdir -p "$folder/build/first" "$folder/build/srv/second one"
+tar --create --exclude=./build --exclude=./.git . | tee >(tar --extract --directory "$folder/build/first") |
+  tar --extract --directory "$folder/build/srv/second one"
+quietly within build /first/scripts/package.sh
+tail -n 5 "$folder/log"
+keep_downloads build
+(
+  umask 077
+  quietly within build env TZ=Asia/Tokyo LC_ALL=C HOME=/tmp "/srv/second one/scripts/package.sh"
+)
+packages=(libzevooauth1 libzevooauth-dev oauthctl zevooauth-standins)
+for package in "${packages[@]}"; do
+  (cd "$folder/build" && cmp {first,srv/second\ one}/build/packages/"${package}"_1.0.0_*.deb)
+done
+echo "test-package: two builds of one commit are the same, byte for byte"
+
+later=$(date --rfc-email --date "$(sed -n 's/^ -- .*>  //p' debian/changelog | head -n 1) + 1 minute")
+cat - debian/changelog >"$folder/build/first/debian/changelog" <<END
+zevooauth (1.0.0+next) bookworm; urgency=medium
+
+  * To upgrade to.
+
+ -- zevooauth maintainers <maintainers@zevooauth.invalid>  $later
+
+END
+mv "$folder/build/first/build/packages" "$folder/build/packages"
+quietly within build /first/scripts/package.sh
+mv "$folder"/build/first/build/packages/*.deb "$folder/build/packages"
+
+fresh use
+mkdir -p "$folder/use/packages/new"
+cp "$folder"/build/packages/*.deb "$folder/use/packages"
+mv "$folder"/use/packages/*+next_* "$folder/use/packages/new"
+cp -r tests/install README.md tests/packages_in_use.sh "$folder/use/packages"
+within use /packages/packages_in_use.sh
+keep_downloads use
+rm -rf "$folder/build" "$folder/use"
+echo "test-package: passed: built twice alike, installed, used, upgraded and removed"
