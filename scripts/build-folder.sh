@@ -1,10 +1,8 @@
 #!/usr/bin/env bash
-# Tells where what is built under this name lies.
+# Makes the folder of that name below build/ and prints its path; where the checkout belongs to
+# somebody else it lies in the user's own cache folder instead, or in /tmp if there is none.
 #
 #   scripts/build-folder.sh NAME
-#
-# That is below build/; where the checkout belongs to somebody else, in the user's own cache folder
-# instead, or in /tmp if there is none.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -17,8 +15,9 @@ if ! mkdir -p "$root" 2>/dev/null || [ ! -w "$root" ] ||
     [ -d "$root" ] || mkdir -m 700 "$root"
   fi
   if [ ! -O "$root" ]; then
-    echo "build-folder: $root belongs to somebody else" >&2
+    echo "build: $root belongs to somebody else" >&2
     exit 1
   fi
 fi
+mkdir -p "$root/$1"
 echo "$root/$1"

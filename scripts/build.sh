@@ -3,7 +3,7 @@
 #
 #   scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]
 #
-# FOLDER is a name for scripts/build-folder.sh; the last line tells where it lies.
+# FOLDER is a name below build/ (but see scripts/build-folder.sh). The last line tells where it is.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
