@@ -1,4 +1,5 @@
-// Store of registered client applications: one row of "oauth_clientInfo" each.
+/// \file
+/// Store of registered client applications: one row of "oauth_clientInfo" each.
 
 #pragma once
 
@@ -7,47 +8,53 @@
 #pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
-// Columns of a row: "enable" ("1" or "0"), "client_id", "client_secret", "redirect_uri", "scope",
-// "display_name", "id". Identifier and secret are encrypted in the file and plain in results.
-//
-// Lengths in bytes: client_id and client_secret 64; redirect_uri 3 to 2048; scope 1 to 2048;
-// display_name 1 to 64. Anything else is kErrBadParameters.
+/// Store of registered client applications.
+///
+/// Columns of a row: "enable" ("1" or "0"), "client_id", "client_secret", "redirect_uri", "scope",
+/// "display_name", "id". Identifier and secret are encrypted in the file and plain in results.
+///
+/// Lengths in bytes: client_id and client_secret 64; redirect_uri 3 to 2048; scope 1 to 2048;
+/// display_name 1 to 64. Anything else is kErrBadParameters.
 class OAUTHDBClientInfo : public OAUTHDBBasic {
  public:
-  // tabName: "oauth_clientInfo"
+  /// Opens the database; tabName is "oauth_clientInfo".
   explicit OAUTHDBClientInfo(const std::string& tabName);
 
-  // Registers a client and, on success, writes a line to the audit log.
-  //
-  // A leading "https://" or "http://" is removed from redirect_uri before it is checked and
-  // stored. enable is "1" or "0". result gets {"client_id": string, "client_secret": string},
-  // also when the insert then fails. A full table is kErrTableFull, before any argument is
-  // looked at.
+  /// Registers a client and, on success, writes a line to the audit log.
+  ///
+  /// A leading "https://" or "http://" is removed from redirect_uri before it is checked and
+  /// stored. enable is "1" or "0". result gets {"client_id": string, "client_secret": string},
+  /// also when the insert then fails. A full table is kErrTableFull, before any argument is
+  /// looked at.
   int Add(const std::string& client_id, const std::string& client_secret,
           const std::string& redirect_uri, const std::string& scope,
           const std::string& display_name, const std::string& enable, Json::Value& result);
-  // The same for an enabled client, identifier and secret generated.
+  /// The same for an enabled client, identifier and secret generated.
   int Add(const std::string& redirect_uri, const std::string& scope,
           const std::string& display_name, Json::Value& result);
-  // The same with the caller's secret; only the identifier is generated.
+  /// The same with the caller's secret; only the identifier is generated.
   int Add(const std::string& client_secret, const std::string& redirect_uri,
           const std::string& scope, const std::string& display_name, Json::Value& result);
 
-  // Rewrites three columns. Unlike Add it stores redirect_uri whole, scheme included.
+  /// Rewrites three columns. Unlike Add() it stores redirect_uri whole, scheme included.
   int Edit(long long id, const std::string& redirect_uri, const std::string& scope,
            const std::string& display_name);
+  /// Sets "enable" to "1".
   int Enable(long long id);
+  /// Sets "enable" to "0".
   int Disable(long long id);
 
-  // Deletes the client; its codes and tokens stay.
+  /// Deletes the client; its codes and tokens stay.
   int Del(long long id);
 
-  // Reads rows into *out: by identifier, by row id, or all.
+  /// Reads the row of the identifier into *out.
   int Get(const std::string& client_id, Json::Value* out);
+  /// Reads the row of the row id.
   int Get(long long id, Json::Value* out);
+  /// Reads every row.
   int Get(Json::Value* out);
 
-  // Row id of the client, its low 32 bits; 0 for an unknown client or a failed look-up.
+  /// Row id of the client, its low 32 bits; 0 for an unknown client or a failed look-up.
   int GetIndex(const std::string& client_id);
 };
 

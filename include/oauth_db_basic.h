@@ -1,5 +1,6 @@
-// Base of every store: one SQLite connection to the database file, the schema, and the generic
-// record operations that the stores build on.
+/// \file
+/// Base of every store: one SQLite connection to the database file, the schema, and the generic
+/// record operations that the stores build on.
 
 #pragma once
 
@@ -10,132 +11,187 @@
 struct sqlite3;
 
 #pragma GCC visibility push(default)
+/// Everything the library has to offer.
 namespace ZEVOOAUTHSERVER {
 
-// Values of GetErrCode(). Any positive value other than kErrNone is an SQLite result code, with
-// SQLite's own text in GetErrMsg(), or "Open DB failed!!" when the file could not be opened.
-inline constexpr int kErrNone = 255;          // "": nothing recorded since construction
-inline constexpr int kErrCreateTable = -1;    // "Create table failed"
-inline constexpr int kErrBadParameters = -2;  // "Bad parameters"
-inline constexpr int kErrTokenExpired = -3;   // "Access Token Expired", in a result document only
-inline constexpr int kErrCrypt = -4;          // "Data Encrypt failed" or "Data Decrypt failed"
-inline constexpr int kErrTableFull = -5;      // "<table> Table is full", in the store's words
+/// \name Error codes
+/// Values of GetErrCode(). Any positive value other than kErrNone is an SQLite result code, with
+/// SQLite's own text in GetErrMsg(), or "Open DB failed!!" when the file could not be opened.
+/// \{
+inline constexpr int kErrNone = 255;          ///< "": nothing recorded since construction
+inline constexpr int kErrCreateTable = -1;    ///< "Create table failed"
+inline constexpr int kErrBadParameters = -2;  ///< "Bad parameters"
+inline constexpr int kErrTokenExpired = -3;   ///< "Access Token Expired", in a result document only
+inline constexpr int kErrCrypt = -4;          ///< "Data Encrypt failed" or "Data Decrypt failed"
+inline constexpr int kErrTableFull = -5;      ///< "... Table is full", with the store's name
+/// \}
 
-// A store opens the database on construction, makes sure that all five tables exist, and closes
-// the database on destruction, so keep an object only for the work at hand. Use it from one
-// thread at a time.
-//
-// Opening and closing raise the effective user and group id of the whole process to root for the
-// length of that one call: no other thread may depend on the ids meanwhile.
-//
-// Many processes may use the file at once: each statement waits up to 5 seconds for the others
-// and then fails with SQLite's code 5, "database is locked".
-//
-// Operations return true, or non-zero, on success. A failure leaves its reason in GetErrCode()
-// and GetErrMsg(), unless its comment says "log only"; a success leaves the previous error there.
-// Log only, for every operation: no row to change or delete, and a store that is not ready, whose
-// error still tells why it is not.
-//
-// Two document shapes come back throughout:
-//   rows     [ {"<column>": string, ...}, ... ]   numbers as decimal text; "client_id" and
-//            "client_secret" decrypted
-//   request  {"condition": {"<column>": string or integer, ...},   all must be equal
-//             "condition_like": string,    ready-made SQL condition, wins over "condition"
-//             "option": string,            ready-made SQL after the condition
-//             "modified": {"<column>": string, ...}}               columns to write
-// "condition_like" and "option" enter the statement as they are: never pass on a user's text.
-// A value ends at its first NUL byte.
+/// The base of the four stores, and what all of them have in common.
+///
+/// A store opens the database on construction, makes sure that all five tables exist, and closes
+/// the database on destruction, so keep an object only for the work at hand. Use it from one
+/// thread at a time.
+///
+/// Opening and closing raise the effective user and group id of the whole process to root for the
+/// length of that one call: no other thread may depend on the ids meanwhile.
+///
+/// Many processes may use the file at once: each statement waits up to 5 seconds for the others
+/// and then fails with SQLite's code 5, "database is locked".
+///
+/// Operations return true, or non-zero, on success. A failure leaves its reason in GetErrCode()
+/// and GetErrMsg(), unless its comment says "log only"; a success leaves the previous error there.
+/// Log only, for every operation: no row to change or delete, and a store that is not ready, whose
+/// error still tells why it is not.
+///
+/// Two document shapes come back throughout. Rows, numbers as decimal text, "client_id" and
+/// "client_secret" decrypted:
+///
+///     [ {"<column>": string, ...}, ... ]
+///
+/// Requests:
+///
+///     {"condition": {"<column>": string or integer, ...},   all must be equal
+///      "condition_like": string,    ready-made SQL condition, wins over "condition"
+///      "option": string,            ready-made SQL after the condition
+///      "modified": {"<column>": string, ...}}               columns to write
+///
+/// "condition_like" and "option" enter the statement as they are: never pass on a user's text.
+/// A value ends at its first NUL byte.
 class OAUTHDBBasic {
  public:
-  // Row callback, as sqlite3_exec() calls it; context is the result document.
+  /// Row callback, as sqlite3_exec() calls it; context is the result document.
   using RowCallback = int (*)(void* context, int columns, char** values, char** columnNames);
 
-  // Opens and initialises. Never throws for a database failure: the error is recorded, and every
-  // later operation on records fails with the log line "DB is not ready!!".
+  /// Opens and initialises. Never throws for a database failure: the error is recorded, and every
+  /// later operation on records fails with the log line "DB is not ready!!".
   OAUTHDBBasic();
+  /// Closes the database.
   ~OAUTHDBBasic();
+  /// A store owns its connection and cannot be copied.
   OAUTHDBBasic(const OAUTHDBBasic&) = delete;
-  OAUTHDBBasic& operator=(const OAUTHDBBasic&) = delete;
+  OAUTHDBBasic& operator=(const OAUTHDBBasic&) = delete;  ///< Nor assigned.
 
+  /// Code of the last failure: kErrNone, another of the codes in this header, or SQLite's.
   int GetErrCode() const;
+  /// Replaces the code, for example to tell the next failure from an earlier one.
   void SetErrCode(int code);
+  /// Text of the last failure.
   std::string GetErrMsg() const;
+  /// Replaces the text.
   void SetErrMsg(const std::string& msg);
 
-  // The one table this store serves.
+  /// The one table this store serves.
   std::string GetTabName() const;
+  /// Makes the store serve another table.
   void SetTabName(const std::string& name);
 
-  // Schema. These run before the store is ready.
+  /// \name Schema
+  /// These run before the store is ready.
+  /// \{
 
-  // Creates the tables that are missing; the meta table and the schema-version rows in it come
-  // together or not at all. True once all five exist.
+  /// Creates the tables that are missing; the meta table and the schema-version rows in it come
+  /// together or not at all. True once all five exist.
   bool DBInit();
-  // Runs one CREATE statement; kErrCreateTable on failure.
+  /// Runs one CREATE statement; kErrCreateTable on failure.
   bool CreateDBTab(const std::string& sql);
-  // False also when the look-up itself failed; the error state then tells.
+  /// Whether there is a table of that name. False also when the look-up itself failed; the error
+  /// state then tells.
   bool IsDBTabExist(const std::string& name);
-  // Writes the schema-version rows; a row that cannot be written is logged and passed over.
+  /// Writes the schema-version rows; a row that cannot be written is logged and passed over.
   void AddMetaData();
-  // Drops this store's table; the store stays ready.
+  /// Drops this store's table; the store stays ready.
   bool DBDrop();
 
-  // Statements.
+  /// \}
+  /// \name Statements
+  /// \{
 
-  // Runs SQL; callback and result may be null. On failure the error state holds SQLite's code and
-  // text, and result the rows delivered before it.
+  /// Runs SQL; callback and result may be null. On failure the error state holds SQLite's code and
+  /// text, and result the rows delivered before it.
   bool DBCmdRun(const std::string& sql, RowCallback callback, Json::Value* result);
-  // The same on a store that is ready; refuses otherwise (log only).
+  /// The same on a store that is ready; refuses otherwise (log only).
   bool DBCmd(const std::string& sql, RowCallback callback, Json::Value* result);
 
-  // Row callbacks; context is a Json::Value* and may be null. They return 0, or non-zero to fail
-  // the statement when the row cannot be delivered; no exception leaves them.
-  // Sets {"exist": true} for any row.
+  /// \}
+  /// \name Row callbacks
+  /// context is a Json::Value* and may be null. They return 0, or non-zero to fail the statement
+  /// when the row cannot be delivered; no exception leaves them.
+  /// \{
+
+  /// Sets {"exist": true} for any row.
   static int IsTabExistCallback(void* context, int columns, char** values, char** columnNames);
-  // Appends the first column as a string.
+  /// Appends the first column as a string.
   static int TabCountCallback(void* context, int columns, char** values, char** columnNames);
-  // Appends the row as an object of strings, decrypted; an SQL NULL reads as "". A value that
-  // cannot be decrypted is delivered as it is stored (log only).
+  /// Appends the row as an object of strings, decrypted; an SQL NULL reads as "". A value that
+  /// cannot be decrypted is delivered as it is stored (log only).
   static int TabGetCallback(void* context, int columns, char** values, char** columnNames);
 
-  // Counts the rows of the table: result becomes [ string ], the count as decimal text.
-  // kErrBadParameters if result is null.
+  /// \}
+  /// \name Row count
+  /// \{
+
+  /// Counts the rows of the table: result becomes [ string ], the count as decimal text.
+  /// kErrBadParameters if result is null.
   bool DBGetRowCount(Json::Value* result);
-  // Whether the table holds fewer than max rows. False also when it cannot be counted.
+  /// Whether the table holds fewer than max rows. False also when it cannot be counted.
   bool DBCheckRowMax(unsigned long max);
 
-  // Fragments of SQL made from requests. Members come in ascending byte order of their names;
-  // single quotes in values are doubled, names are inserted as they are.
+  /// \}
+  /// \name Fragments of SQL made from requests
+  /// Members come in ascending byte order of their names; single quotes in values are doubled,
+  /// names are inserted as they are.
+  /// \{
 
-  // {"a": "1", "id": null} -> " (a, id) VALUES('1', NULL)"; a null "timestamp" is the database's
-  // current time.
+  /// The columns and values of an INSERT. A null "timestamp" is the database's current time.
+  ///
+  ///     {"a": "1", "id": null} -> " (a, id) VALUES('1', NULL)"
   static std::string GetInsertParam(const Json::Value& record);
-  // {"a": "1", "b": "2"} -> "a='1'<separator>b='2'"
+  /// The members as assignments or comparisons.
+  ///
+  ///     {"a": "1", "b": "2"} -> "a='1'<separator>b='2'"
   static std::string ConcateParam(const Json::Value& values, const std::string& separator);
-  // {"a": "1", "b": "2"} -> " WHERE a='1' and b='2'"; nothing -> ""
+  /// The WHERE of a condition.
+  ///
+  ///     {"a": "1", "b": "2"} -> " WHERE a='1' and b='2'"
+  ///     nothing -> ""
   static std::string GetConditionParam(const Json::Value& condition);
-  // request -> " SET <modified> WHERE <condition>"
+  /// The SET and WHERE of a request.
+  ///
+  ///     request -> " SET <modified> WHERE <condition>"
   static std::string GetUpdateParam(const Json::Value& request);
 
-  // Record operations. They change the document passed in: sensitive values are encrypted in
-  // place, absent "condition" and "modified" are added as null. A value that cannot be encrypted
-  // leaves kErrCrypt and the database untouched.
+  /// \}
+  /// \name Record operations
+  /// They change the document passed in: sensitive values are encrypted in place, absent
+  /// "condition" and "modified" are added as null. A value that cannot be encrypted leaves
+  /// kErrCrypt and the database untouched.
+  /// \{
 
-  // Inserts the record {"<column>": string or null, ...}.
+  /// Inserts a record.
+  ///
+  ///     {"<column>": string or null, ...}
   bool DBAdd(Json::Value& record);
-  // Deletes the rows that match "condition", or every row without one. Fails when there was no
-  // row to delete.
+  /// Deletes the rows that match "condition", or every row without one. Fails when there was no
+  /// row to delete.
   bool DBDel(Json::Value& request);
-  // Reads the rows that match "condition_like" or else "condition" into *rows; no row is a
-  // success. kErrBadParameters if rows is null.
+  /// Reads the rows that match "condition_like" or else "condition" into *rows; no row is a
+  /// success. kErrBadParameters if rows is null.
   bool DBGet(Json::Value& request, Json::Value* rows);
-  // Writes "modified" into the rows that match "condition". Fails when no row matched.
+  /// Writes "modified" into the rows that match "condition". Fails when no row matched.
   bool DBEdit(Json::Value& request);
 
-  // Replace the members "client_id" and "client_secret" of a document by their encrypted or plain
-  // forms. The first failure stops and leaves the rest as it was (log only).
+  /// \}
+  /// \name Sensitive values
+  /// The members "client_id" and "client_secret" of a document. The first failure stops and leaves
+  /// the rest as it was (log only).
+  /// \{
+
+  /// Replaces them by their encrypted forms.
   static bool ParamEncrypt(Json::Value& doc);
+  /// Replaces them by their plain forms.
   static bool ParamDecrypt(Json::Value& doc);
+
+  /// \}
 
  private:
   friend class Transaction;

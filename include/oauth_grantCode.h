@@ -1,4 +1,5 @@
-// Store of authorization codes (RFC 6749, section 4.1): one row of "oauth_grantCode" each.
+/// \file
+/// Store of authorization codes (RFC 6749, section 4.1): one row of "oauth_grantCode" each.
 
 #pragma once
 
@@ -7,53 +8,57 @@
 #pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
-// Columns of a row: "username", "client_id" (encrypted in the file, plain in results), "scope",
-// "code", "expired_time" (Unix seconds, decimal text), "state", "ip", "id".
-//
-// Lengths in bytes: username 1 to 256; client_id and code 64; scope and state 1 to 2048;
-// expired_time 1 to 128. ip is empty or an IPv4 or IPv6 address. A code is expired once the
-// current time is greater than its expired_time.
+/// Store of authorization codes.
+///
+/// Columns of a row: "username", "client_id" (encrypted in the file, plain in results), "scope",
+/// "code", "expired_time" (Unix seconds, decimal text), "state", "ip", "id".
+///
+/// Lengths in bytes: username 1 to 256; client_id and code 64; scope and state 1 to 2048;
+/// expired_time 1 to 128. ip is empty or an IPv4 or IPv6 address. A code is expired once the
+/// current time is greater than its expired_time.
 class OAUTHDBGrantCode : public OAUTHDBBasic {
  public:
-  // tabName: "oauth_grantCode"
+  /// Opens the database; tabName is "oauth_grantCode".
   explicit OAUTHDBGrantCode(const std::string& tabName);
 
-  // Issues a new code that lives for the setting "grantcode_expired" in seconds.
-  //
-  // result gets {"code": string}, also when the insert then fails. A full table is kErrTableFull,
-  // before any argument is looked at; a bad address or length is log only.
+  /// Issues a new code that lives for the setting "grantcode_expired" in seconds.
+  ///
+  /// result gets {"code": string}, also when the insert then fails. A full table is kErrTableFull,
+  /// before any argument is looked at; a bad address or length is log only.
   int Add(const std::string& username, const std::string& client_id, const std::string& scope,
           const std::string& state, const std::string& ip, Json::Value& result);
-  // The same with the caller's code and expiry.
+  /// The same with the caller's code and expiry.
   int Add(const std::string& username, const std::string& client_id, const std::string& scope,
           const std::string& code, const std::string& expired_time, const std::string& state,
           const std::string& ip, Json::Value& result);
 
-  // Rewrites the columns named; a bad length is log only. The two forms store a single quote
-  // differently: doubled by the one with expired_time, as it is by the other.
+  /// Rewrites the columns named; a bad length is log only. A single quote is stored as it is.
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& state);
+  /// The same with the expiry. A single quote is stored doubled, as Add() does.
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& expired_time, const std::string& state);
 
-  // Spends the code: of several processes that try, one succeeds.
+  /// Spends the code: of several processes that try, one succeeds.
   int Del(long long id);
 
-  // Reads rows into *out: by code (64 bytes, else kErrBadParameters), by row id, or all. An
-  // expired code is found like any other.
+  /// Reads the row of the code (64 bytes, else kErrBadParameters) into *out. An expired code is
+  /// found like any other.
   int Get(const std::string& code, Json::Value* out);
+  /// Reads the row of the row id.
   int Get(long long id, Json::Value* out);
+  /// Reads every row.
   int Get(Json::Value* out);
 
-  // Row id of the code, its low 32 bits; 0 for an unknown code or a failed look-up.
+  /// Row id of the code, its low 32 bits; 0 for an unknown code or a failed look-up.
   int GetIndex(const std::string& code);
 
-  // Sets the expiry to now; the code counts as expired from the next second on. This claims
-  // nothing: of several processes that try, all succeed.
+  /// Sets the expiry to now; the code counts as expired from the next second on. This claims
+  /// nothing: of several processes that try, all succeed.
   int Revoke(long long id);
 
-  // Deletes every expired code. 0 only if a row could not be deleted: a failed read deletes
-  // nothing and is a success, though it leaves its error.
+  /// Deletes every expired code. 0 only if a row could not be deleted: a failed read deletes
+  /// nothing and is a success, though it leaves its error.
   int Purge();
 };
 

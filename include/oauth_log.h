@@ -1,4 +1,5 @@
-// Audit log: one row of "oauth_log" per message, the oldest dropped beyond a ceiling.
+/// \file
+/// Audit log: one row of "oauth_log" per message, the oldest dropped beyond a ceiling.
 
 #pragma once
 
@@ -7,27 +8,29 @@
 #pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
-// Columns of a row: "timestamp" (Unix seconds of the database's clock at insert), "msg" (single
-// quotes doubled), "id".
+/// The audit log.
+///
+/// Columns of a row: "timestamp" (Unix seconds of the database's clock at insert), "msg" (single
+/// quotes doubled), "id".
 class OAUTHDBLog : public OAUTHDBBasic {
  public:
-  // tabName: "oauth_log"
+  /// Opens the database; tabName is "oauth_log".
   explicit OAUTHDBLog(const std::string& tabName);
 
-  // Writes a message of any length, then trims the table to the setting "log_max". The result is
-  // that of the insert; a trim that failed leaves its error all the same.
-  //
-  // The trim goes by time and not by row: every message that shares the second of the first one
-  // beyond the ceiling goes with it, so that fewer rows than the ceiling may be left.
+  /// Writes a message of any length, then trims the table to the setting "log_max". The result is
+  /// that of the insert; a trim that failed leaves its error all the same.
+  ///
+  /// The trim goes by time and not by row: every message that shares the second of the first one
+  /// beyond the ceiling goes with it, so that fewer rows than the ceiling may be left.
   int Add(const std::string& msg);
 
-  // Reads into *out the rows whose message contains keyword (every row if it is empty), with
-  // option as SQL text for order and paging, for example "ORDER BY id DESC LIMIT 10". In keyword %
-  // and _ are wildcards, case of ASCII letters does not matter, and a single quote must be given
-  // doubled, as it is stored. An option may hold no text in quotes.
+  /// Reads into *out the rows whose message contains keyword (every row if it is empty), with
+  /// option as SQL text for order and paging, for example "ORDER BY id DESC LIMIT 10". In keyword %
+  /// and _ are wildcards, case of ASCII letters does not matter, and a single quote must be given
+  /// doubled, as it is stored. An option may hold no text in quotes.
   int Get(const std::string& keyword, const std::string& option, Json::Value* out);
 
-  // Deletes every row; fails when there was none.
+  /// Deletes every row; fails when there was none.
   int Del();
 };
 

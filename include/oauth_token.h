@@ -1,5 +1,6 @@
-// Store of issued tokens (RFC 6749): one row of "oauth_token" per grant, with its access token
-// and its refresh token.
+/// \file
+/// Store of issued tokens (RFC 6749): one row of "oauth_token" per grant, with its access token
+/// and its refresh token.
 
 #pragma once
 
@@ -8,68 +9,75 @@
 #pragma GCC visibility push(default)
 namespace ZEVOOAUTHSERVER {
 
-// Columns of a row: "username", "client_id" (encrypted in the file, plain in results), "scope",
-// "refresh_token", "access_token", "expired_time" (Unix seconds, decimal text), "flow_type",
-// "state", "ip", "id".
-//
-// Lengths in bytes: username 1 to 256; client_id, refresh_token and access_token 64; scope and
-// state 1 to 2048; expired_time 1 to 128; flow_type 1 to 32. Anything else is kErrBadParameters.
-// ip is empty or an IPv4 or IPv6 address.
-//
-// expired_time concerns the access token: it is expired once the current time is greater. The
-// refresh token has no expiry of its own and goes with the row.
+/// Store of issued access tokens and their refresh tokens.
+///
+/// Columns of a row: "username", "client_id" (encrypted in the file, plain in results), "scope",
+/// "refresh_token", "access_token", "expired_time" (Unix seconds, decimal text), "flow_type",
+/// "state", "ip", "id".
+///
+/// Lengths in bytes: username 1 to 256; client_id, refresh_token and access_token 64; scope and
+/// state 1 to 2048; expired_time 1 to 128; flow_type 1 to 32. Anything else is kErrBadParameters.
+/// ip is empty or an IPv4 or IPv6 address.
+///
+/// expired_time concerns the access token: it is expired once the current time is greater. The
+/// refresh token has no expiry of its own and goes with the row.
 class OAUTHDBToken : public OAUTHDBBasic {
  public:
-  // tabName: "oauth_token"
+  /// Opens the database; tabName is "oauth_token".
   explicit OAUTHDBToken(const std::string& tabName);
 
-  // Stores a grant with the caller's tokens and expiry.
-  //
-  // result gets {"access_token": string, "refresh_token": string}, also when the insert then
-  // fails. Failures in this order: a full table is kErrTableFull, a bad address is log only, a
-  // bad length is kErrBadParameters.
+  /// Stores a grant with the caller's tokens and expiry.
+  ///
+  /// result gets {"access_token": string, "refresh_token": string}, also when the insert then
+  /// fails. Failures in this order: a full table is kErrTableFull, a bad address is log only, a
+  /// bad length is kErrBadParameters.
   int Add(const std::string& username, const std::string& client_id, const std::string& scope,
           const std::string& refresh_token, const std::string& access_token,
           const std::string& expired_time, const std::string& flow_type, const std::string& state,
           const std::string& ip, Json::Value& result);
-  // Issues: the same with new tokens that live for the setting "token_expired" in seconds.
+  /// Issues: the same with new tokens that live for the setting "token_expired" in seconds.
   int Add(const std::string& username, const std::string& client_id, const std::string& scope,
           const std::string& flow_type, const std::string& state, const std::string& ip,
           Json::Value& result);
 
-  // Rewrites the columns named; tokens and ip never change. The two forms store a single quote
-  // differently: doubled by the one with expired_time, as it is by the other.
+  /// Rewrites the columns named; tokens and ip never change. A single quote is stored as it is.
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& flow_type, const std::string& state);
+  /// The same with the expiry. A single quote is stored doubled, as Add() does.
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& expired_time, const std::string& flow_type,
            const std::string& state);
 
-  // Both delete the row, access token and refresh token together. Of several processes that try,
-  // one succeeds: it may issue the new tokens of a refresh.
+  /// Deletes the row, access token and refresh token together. Of several processes that try, one
+  /// succeeds: it may issue the new tokens of a refresh.
   int Del(long long id);
+  /// The same as Del().
   int Revoke(long long id);
 
-  // Reads rows into *out: by token, by row id, or all. Expired rows are found like any other.
+  /// Reads the row of the access token into *out. An expired one is found like any other.
   int GetWithAccessToken(const std::string& access_token, Json::Value* out);
+  /// Reads the rows of the refresh token, whatever became of the access token.
   int GetWithRefreshToken(const std::string& refresh_token, Json::Value* out);
+  /// Reads the row of the row id.
   int Get(long long id, Json::Value* out);
+  /// Reads every row.
   int Get(Json::Value* out);
 
-  // Row id of the access token, its low 32 bits; 0 for an unknown token or a failed look-up.
+  /// Row id of the access token, its low 32 bits; 0 for an unknown token or a failed look-up.
   int GetIndex(const std::string& access_token);
 
-  // Deletes every row whose access token has expired, refresh token included. 0 only if a row
-  // could not be deleted: a failed read deletes nothing and is a success, though it leaves
-  // its error.
+  /// Deletes every row whose access token has expired, refresh token included. 0 only if a row
+  /// could not be deleted: a failed read deletes nothing and is a success, though it leaves
+  /// its error.
   int Purge();
 
-  // Checks a presented access token against the clock.
-  //
-  // Valid:   1, result gets {"username": string, "scope": string, "state": string}
-  // Else:    0, result gets {"err_code": int, "err_msg": string}; an unknown token reads as
-  //          expired (kErrTokenExpired). The store's own error is set only if the look-up failed.
-  // A token is still valid during the very second that expired_time names.
+  /// Checks a presented access token against the clock.
+  ///
+  /// - Valid: 1, result gets {"username": string, "scope": string, "state": string}.
+  /// - Else: 0, result gets {"err_code": int, "err_msg": string}; an unknown token reads as
+  ///   expired (kErrTokenExpired). The store's own error is set only if the look-up failed.
+  ///
+  /// A token is still valid during the very second that expired_time names.
   int Verify(const std::string& access_token, Json::Value& result);
 };
 
