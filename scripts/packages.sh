@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Installs what the named groups need from Debian's packages, as far as it is missing.
 #
-#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare
+#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare docs
 set -euo pipefail
 
 declare -A groups=(
@@ -13,6 +13,7 @@ declare -A groups=(
   [bench]="libbenchmark-dev valgrind gnuplot-nox"
   [package]="build-essential debhelper lintian"
   [bare]="debootstrap"
+  [docs]="doxygen"
 )
 
 missing=()

@@ -12,7 +12,6 @@ if [ "$(id -u)" -ne 0 ]; then
 fi
 scripts/packages.sh bare
 folder=$(scripts/build-folder.sh test-package)
-mkdir -p "$folder"
 
 within() { # ROOT COMMAND...: nothing of this machine's environment or processes
   local root=$folder/$1

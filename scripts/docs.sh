@@ -1,0 +1,25 @@
+#!/usr/bin/env bash
+# Builds the API reference: the public headers, docs/reference and the operator's pages as HTML.
+# An undocumented member, a broken reference and a link that leads nowhere are errors.
+# Installs what is missing (scripts/packages.sh, group docs). The last line tells where it is.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+scripts/packages.sh docs
+folder=$(scripts/build-folder.sh reference)
+rm -rf "${folder:?}"/*
+{
+  cat docs/reference/Doxyfile
+  echo "OUTPUT_DIRECTORY = \"$folder\""
+} | doxygen - || { echo "docs: failed, see above" >&2 && exit 1; }
+
+dead=$(cd "$folder" && grep -oE '<a [^>]*href="[^"#:]+["#]' ./*.html |
+  sed -E 's/^([^:]*):.*href="(.*)["#]$/\1 \2/' | sort -u |
+  while read -r page target; do
+    [ -e "$target" ] || echo "docs: $page links to $target, which is not there"
+  done)
+if [ -n "$dead" ]; then
+  echo "$dead" >&2
+  exit 1
+fi
+echo "docs: $folder/index.html"
