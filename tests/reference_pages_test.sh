@@ -1,0 +1,48 @@
+#!/usr/bin/env bash
+# A page of docs/reference has all that the sources have of its kind, and nothing else.
+#
+#   reference_pages_test.sh messages|database-format
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+# The sources as one line, without comments; literals that stand side by side are one.
+code() { sed 's|^ *//.*||' "$@" | tr '\n' ' ' | sed -E 's/" +"//g; s/\( +/(/g'; }
+
+# "<heading>: <text>" for each log line, error text and line of the audit log. What takes its text
+# from elsewhere than a literal stays as it is, and is in no catalogue.
+messages_in_sources() {
+  { code src/*/*.{h,cpp} && grep '^#define OAUTH_ENTER' src/oauth_syslog.h; } |
+    grep -oE '(OAUTH_(FAIL|DIAG|LOG)\(|[^_]syslog\(|SetErrMsg\(|kErrMsg\] = |auditLog\.Add\()[^";]*("[^"]*"|;)' |
+    sed -E '
+      s/^OAUTH_FAIL\("(.*)"$/Failures: \1/
+      s/^OAUTH_LOG\(LOG_AUTH \| LOG_ERR, "(.*)"$/Refused privileges: \1/
+      s/^OAUTH_LOG\(LOG_AUTH \| LOG_INFO, "(.*)"$/Raised privileges: \1/
+      s/^OAUTH_DIAG\(kResult, "(.*)"$/Results, bit 1: \1/
+      s/^OAUTH_DIAG\(kRow, "(.*)"$/Rows, bit 2: \1/
+      s/^OAUTH_DIAG\(kArgument, "(.*)"$/Arguments, bit 4: \1/
+      s/^OAUTH_DIAG\(kEntry, "(.*)"$/Entry traces, bit 8: \1/
+      s/^(SetErrMsg\(|kErrMsg\] = )"(.*)"$/Error texts: \2/
+      s/^auditLog\.Add\("(.*)"$/Audit log: \1/' |
+    # The definition, SQLite's own text, and the text of the store.
+    grep -vxF -e 'SetErrMsg(const std::string& msg) { errMsg_ = msg;' -e 'SetErrMsg(text);' \
+      -e 'kErrMsg] = GetErrMsg();' | LC_ALL=C sort -u
+}
+
+# A heading holds until the next; a row's text is what it quotes first.
+messages_in_page() {
+  awk -F '`' '/^#/ { sub(/^#+ /, ""); heading = $0 } /^\| `/ { print heading ": " $2 }' \
+    docs/reference/messages.md | LC_ALL=C sort
+}
+
+# As SQLite keeps them.
+database-format_in_sources() {
+  code src/oauth_names.h | grep -oE 'CREATE TABLE IF NOT EXISTS [^;]*' | sed 's/IF NOT EXISTS //' |
+    LC_ALL=C sort
+}
+database-format_in_page() { grep '^CREATE TABLE' docs/reference/database-format.md | LC_ALL=C sort; }
+
+if ! diff --label src --label "docs/reference/$1.md" -U 0 <("$1_in_sources") <("$1_in_page") >&2; then
+  echo "reference pages: docs/reference/$1.md and src differ" >&2
+  exit 1
+fi
+echo "reference pages: docs/reference/$1.md has all $("$1_in_page" | wc -l) of src"
