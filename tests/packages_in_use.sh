@@ -63,7 +63,7 @@ token=$(oauthctl token show 1 --show-secrets | sed -n 's/^access_token *//p')
 expect 0 'deleted 1 token' oauthctl token revoke --user alice --yes
 expect 1 '' oauthctl token verify <<<"$token"
 grep -qx 'oauthctl: not valid: no such access token' said || fail "it said: $(<said)"
-expect 0 '1 client disabled' oauthctl client disable 1
+expect 0 'client 1 is disabled' oauthctl client disable 1
 oauthctl status >/dev/null
 oauthctl check
 oauthctl backup before-upgrade.db
