@@ -39,7 +39,8 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& expired_time, const std::string& state);
 
-  /// Spends the code: of several processes that try, one succeeds.
+  /// Spends the code: of several processes that try, one succeeds. The id may then be given to a
+  /// new row, so find and delete in one transaction, as docs/operations.md shows.
   int Del(long long id);
 
   /// Reads the row of the code (64 bytes, else kErrBadParameters) into *out. An expired code is

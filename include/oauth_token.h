@@ -49,7 +49,8 @@ class OAUTHDBToken : public OAUTHDBBasic {
            const std::string& state);
 
   /// Deletes the row, access token and refresh token together. Of several processes that try, one
-  /// succeeds: it may issue the new tokens of a refresh.
+  /// succeeds: it may issue the new tokens of a refresh. The id may then be given to a new row, so
+  /// find and delete in one transaction, as docs/operations.md shows.
   int Del(long long id);
   /// The same as Del().
   int Revoke(long long id);

@@ -14,9 +14,19 @@ namespace {
 class OperationsExampleTest : public StoreTest {
  protected:
   OperationsExampleTest() {
-    Json::Value result;
-    OAUTHDBGrantCode("oauth_grantCode").Add("alice", times(64, 'c'), "read", "xyz", "", result);
-    OAUTHDBToken("oauth_token").Add("alice", times(64, 'c'), "read", "code", "xyz", "", result);
+    code_ = issueCode("alice");
+    Json::Value issued;
+    OAUTHDBToken("oauth_token").Add("alice", times(64, 'c'), "read", "code", "xyz", "", issued);
+    refreshToken_ = issued["refresh_token"].asString();
+  }
+  static std::string issueCode(const std::string& user) {
+    Json::Value issued;
+    OAUTHDBGrantCode("oauth_grantCode").Add(user, times(64, 'c'), "read", "xyz", "", issued);
+    return issued["code"].asString();
+  }
+  void expectBoth(Claim claim) {
+    EXPECT_EQ(claim, spendCode(code_, row_));
+    EXPECT_EQ(claim, rotateRefreshToken(refreshToken_, row_));
   }
   // What another process's lock makes of a claim.
   template <class Body>
@@ -28,32 +38,47 @@ class OperationsExampleTest : public StoreTest {
     body();
     sqlite3_close_v2(other);
   }
+
+  std::string code_, refreshToken_;
+  Json::Value row_;
 };
 
 TEST_F(OperationsExampleTest, ClaimsOnce) {
-  EXPECT_EQ(Claim::kMine, spendCode(1));
-  EXPECT_EQ(Claim::kTaken, spendCode(1));
-  EXPECT_EQ(Claim::kMine, rotateRefreshToken(1));
-  EXPECT_EQ(Claim::kTaken, rotateRefreshToken(1));
+  EXPECT_EQ(Claim::kMine, spendCode(code_, row_));
+  EXPECT_EQ(code_, row_["code"].asString());
+  EXPECT_EQ(Claim::kMine, rotateRefreshToken(refreshToken_, row_));
+  EXPECT_EQ(refreshToken_, row_["refresh_token"].asString());
+  row_ = Json::Value();
+  expectBoth(Claim::kTaken);
+  EXPECT_EQ(Json::Value(), row_);
+}
+
+TEST_F(OperationsExampleTest, TakesWhatCannotBeForTaken) {
+  EXPECT_EQ(Claim::kTaken, spendCode("short", row_));
+  EXPECT_EQ(Claim::kTaken, rotateRefreshToken("short", row_));
+  expectBoth(Claim::kMine);
+}
+
+// Two look it up at once; before the slower one deletes it, its id has gone to a new code.
+TEST_F(OperationsExampleTest, ClaimsNobodyElsesByAnIdGivenAgain) {
+  ASSERT_EQ(Claim::kMine, spendCode(code_, row_));
+  const std::string next = issueCode("bob");
+  Json::Value rows;
+  OAUTHDBGrantCode("oauth_grantCode").Get(next, &rows);
+  ASSERT_EQ(row_["id"], rows[0U]["id"]);
+  EXPECT_EQ(Claim::kTaken, spendCode(code_, row_));
+  EXPECT_EQ(Claim::kMine, spendCode(next, row_));
 }
 
 TEST_F(OperationsExampleTest, RetriesWhileAnotherProcessWrites) {
-  whileLocked("BEGIN IMMEDIATE", [] {
-    EXPECT_EQ(Claim::kRetry, spendCode(1));
-    EXPECT_EQ(Claim::kRetry, rotateRefreshToken(1));
-  });
-  EXPECT_EQ(Claim::kMine, spendCode(1));
-  EXPECT_EQ(Claim::kMine, rotateRefreshToken(1));
+  whileLocked("BEGIN IMMEDIATE", [this] { expectBoth(Claim::kRetry); });
+  expectBoth(Claim::kMine);
 }
 
 TEST_F(OperationsExampleTest, RetriesWhereTheDatabaseCannotBeRead) {
-  whileLocked("BEGIN EXCLUSIVE", [] {
-    EXPECT_EQ(Claim::kRetry, spendCode(1));
-    EXPECT_EQ(Claim::kRetry, rotateRefreshToken(1));
-  });
+  whileLocked("BEGIN EXCLUSIVE", [this] { expectBoth(Claim::kRetry); });
   files_.removeDirectory();
-  EXPECT_EQ(Claim::kRetry, spendCode(1));
-  EXPECT_EQ(Claim::kRetry, rotateRefreshToken(1));
+  expectBoth(Claim::kRetry);
 }
 
 }  // namespace
