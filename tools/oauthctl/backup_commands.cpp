@@ -1,9 +1,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <cstdlib>
-
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 
 #include "commands.h"

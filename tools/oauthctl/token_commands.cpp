@@ -29,9 +29,7 @@ Json::Value rowOf(OAUTHDBToken& tokens, const std::string& token) {
 bool isValid(OAUTHDBToken& tokens, const std::string& token) {
   if (token.size() != kTokenLength) return false;
   Json::Value answer;
-  const bool valid =
-      attempt(tokens, "verify the token", [&] { return tokens.Verify(token, answer) != 0; });
-  return valid;
+  return attempt(tokens, "verify the token", [&] { return tokens.Verify(token, answer) != 0; });
 }
 
 std::vector<std::pair<std::string, std::string>> pairsOf(const Json::Value& document,
