@@ -1,19 +1,20 @@
 #!/usr/bin/env bash
 # Installs what the named groups need from Debian's packages, as far as it is missing.
 #
-#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare docs
+#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare docs abi
 set -euo pipefail
 
 declare -A groups=(
   [build]="g++ cmake ninja-build pkg-config libsqlite3-dev libjsoncpp-dev libboost-dev nettle-dev libcli11-dev libsmartcols-dev"
   [test]="binutils libgtest-dev libgmock-dev"
-  [powerpc]="g++-powerpc-linux-gnu qemu-user dpkg-dev make m4 tcl"
+  [powerpc]="g++-powerpc-linux-gnu qemu-user qemu-user-static dpkg-dev make m4 tcl"
   [check]="clang-format clang-tidy gcovr shellcheck"
   [fuzz]="clang libclang-rt-dev"
   [bench]="libbenchmark-dev valgrind gnuplot-nox"
   [package]="build-essential debhelper lintian"
   [bare]="debootstrap"
   [docs]="doxygen"
+  [abi]="abigail-tools"
 )
 
 missing=()

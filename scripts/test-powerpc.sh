@@ -8,7 +8,7 @@ cd "$(dirname "$0")/.."
 
 scripts/packages.sh build test powerpc
 native=$(scripts/build.sh dev dev | tail -n 1)
-libraries=$(dirname "$native")/powerpc-libraries
+libraries=$(scripts/build-folder.sh powerpc-libraries)
 scripts/powerpc-libraries.sh "$libraries"
 folder=$(scripts/build.sh powerpc powerpc -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
 

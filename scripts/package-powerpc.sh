@@ -1,0 +1,186 @@
+#!/usr/bin/env bash
+# Makes the archive for the appliance, zevooauth-<version>-powerpc.tar.gz in the build folder:
+# library, headers, oauthctl, documents, without the stand-ins for the host's libraries. Compares
+# what its programs need with platform/powerpc/NEEDS.txt, and uses it under emulation in a root
+# folder of its own, where there is nothing but those libraries.
+# Installs what is missing (scripts/packages.sh, groups build and powerpc) and keeps what it builds
+# for the target (scripts/powerpc-libraries.sh). The same commit gives the same archive anywhere.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+source=$PWD
+list=platform/powerpc/NEEDS.txt
+sysroot=/usr/powerpc-linux-gnu/lib
+
+fail() {
+  echo "package-powerpc: $1" >&2
+  exit 1
+}
+
+scripts/packages.sh build powerpc
+libraries=$(scripts/build-folder.sh powerpc-libraries)
+scripts/powerpc-libraries.sh "$libraries"
+build=$(scripts/build.sh powerpc-release powerpc-release -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
+
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+chmod 755 "$work" # it is the root folder of a system
+umask 022
+
+version=$(sed -n 's/^CMAKE_PROJECT_VERSION:STATIC=//p' "$build/CMakeCache.txt")
+read -r mark newest date < <(grep -m 1 '^## ' CHANGELOG.md)
+[ "$mark $newest" = "## $version" ] || fail "CHANGELOG.md begins with $newest, this is $version"
+SOURCE_DATE_EPOCH=$(date --utc --date "${date//[()]/}" +%s)
+name=zevooauth-$version-powerpc
+archive=$name.tar.gz
+
+cmake --install "$build" --strip --prefix "$work/$name" >/dev/null
+cp "$list" "$work/$name/NEEDS.txt"
+
+# The archive is what its list says, and does not tell where it was made.
+cd "$work/$name"
+mapfile -t objects < <(LC_ALL=C grep -rlaP '^\x7fELF' . | sort)
+[ "${objects[*]}" = "./bin/oauthctl ./lib/libzevooauth.so.$version" ] ||
+  fail "programs in the archive: ${objects[*]}"
+places=(-e "$source" -e "$(dirname "$build")" -e "$work")
+if grep -rlaF "${places[@]}" .; then
+  fail "these files name a folder of this machine"
+fi
+
+# FILE: the libraries that it asks for.
+asks_for() {
+  readelf --dynamic --wide "$1" | sed -n 's/.*(NEEDED).*\[\(.*\)\]/\1/p'
+}
+
+# SONAME: where the library lies that stands for the appliance's own.
+find_library() {
+  local folder
+  for folder in "$libraries/lib" "$sysroot"; do
+    [ ! -e "$folder/$1" ] || { echo "$folder/$1" && return; }
+  done
+  fail "there is no $1"
+}
+
+# NAME: the version that pkg-config knows among the target's libraries.
+built_against() {
+  echo "built against $(PKG_CONFIG_LIBDIR=$libraries/lib/pkgconfig pkg-config --modversion "$1")"
+}
+
+# SONAME: where the appliance has it from, as far as there is something to say.
+origin() {
+  case $1 in
+    libzevo*) echo 'brought by the appliance' ;;
+    libjsoncpp.*) built_against jsoncpp ;;
+    libsmartcols.*) built_against smartcols ;;
+    libsqlite3.*)
+      sed -n 's/^#define SQLITE_VERSION  *"\(.*\)"/built against \1/p' "$libraries/include/sqlite3.h"
+      ;;
+  esac
+}
+
+# The lines of the list, from the programs themselves.
+needs() {
+  local headers direct indirect library versions
+  headers=$(readelf --file-header "${objects[@]}")
+  echo "programs $(sed -n 's/^ *\(Class\|Data\|Machine\): *\(.*complement, \)*//p' <<<"$headers" |
+    awk '!seen[$0]++' | paste -sd, | sed 's/,/, /g')"
+  echo "kernel $(readelf --notes "${objects[@]}" | sed -n 's/.*OS: \(.*\), ABI: /\1 /p' | sort -u)"
+
+  direct=$(for object in "${objects[@]}"; do asks_for "$object"; done | sort -u |
+    grep -v '^libzevooauth\.')
+  readelf --version-info --wide "${objects[@]}" | awk '
+    / File: / { match($0, / File: [^ ]+/); file = substr($0, RSTART + 7, RLENGTH - 7) }
+    / Name: .* Version: / { match($0, / Name: [^ ]+/); print file, substr($0, RSTART + 7, RLENGTH - 7) }
+  ' | sort --version-sort -u >"$work/versions"
+  for library in $direct; do
+    # The last of each family, such as GLIBCXX: the newest.
+    versions=$(awk -v library="$library" '
+      $1 == library { family = $2; sub(/_[0-9.]*$/, "", family); newest[family] = $2 }
+      END { for (family in newest) print newest[family] }' "$work/versions" | sort | paste -sd ' ')
+    echo "$library ${versions:--} $(origin "$library")"
+  done
+  # Their own needs, except those of the host's libraries, which are the host's affair.
+  indirect=$(for library in $direct; do
+    [[ $library == libzevo* ]] || asks_for "$(find_library "$library")"
+  done | sort -u | grep -vxF "$direct" || true)
+  for library in $indirect; do
+    echo "$library - for others of these libraries"
+  done
+}
+
+needs | sed 's/ $//' >"$work/needs"
+if ! diff --unified=0 --label "$list" --label built \
+  <(sed '1,/^$/d; s/  */ /g' "$work/$name/NEEDS.txt") "$work/needs" >&2; then
+  fail "what was built does not need what $list says"
+fi
+echo "package-powerpc: the programs need what $list says"
+
+tar --create --sort=name --mtime="@$SOURCE_DATE_EPOCH" --owner=0 --group=0 --numeric-owner \
+  --mode=u=rwX,go=rX --format=gnu --directory "$work" "$name" | gzip -n9 >"$work/$archive"
+
+# An appliance: the archive, the libraries of the list, the host's own with what these need.
+root=$work/root
+data=/var/packages/Keyloft/target/etc
+mkdir -p "$root/usr" "$root/lib" "$root$data"
+tar --extract --file "$work/$archive" --directory "$root/usr" --strip-components=1 --no-same-owner
+while read -r library; do
+  [[ $library == libzevo* ]] || cp "$(find_library "$library")" "$root/lib/"
+done < <(sed -n 's/^\([^ ]*\.so[^ ]*\) .*/\1/p' "$root/usr/NEEDS.txt")
+cmake --install "$build" --prefix "$root" --component standins >/dev/null
+cp "$(find_library libnettle.so.8)" "$root/lib/"
+
+# A program of somebody else's.
+export PKG_CONFIG_LIBDIR=$root/usr/lib/pkgconfig:$libraries/lib/pkgconfig
+read -ra options < <(pkg-config --cflags --libs zevooauth)
+powerpc-linux-gnu-g++ -std=c++17 "$source/tests/install/consumer.cpp" "${options[@]}" \
+  "-Wl,-rpath-link,$root/lib" -o "$root/consumer"
+
+cp "$(command -v qemu-ppc-static)" "$root/qemu"
+mkdir "$root/dev"
+if [ "$(id -u)" -eq 0 ]; then
+  mknod "$root/dev/urandom" c 1 9
+  enter=(chroot "$root")
+else
+  touch "$root/dev/urandom"
+  # shellcheck disable=SC2016 # for the inner shell
+  enter=(unshare --user --map-root-user --mount
+    sh -c 'mount --bind /dev/urandom "$0/dev/urandom" && exec chroot "$0" "$@"' "$root")
+fi
+
+# STATUS TEXT PROGRAM ARGUMENT...: what the program says is TEXT, a regular expression, no more.
+expect() {
+  local status=0 said
+  said=$(env --ignore-environment PATH="$PATH" TZ=UTC "${enter[@]}" /qemu "${@:3}" 2>&1) || status=$?
+  if [ "$status" -ne "$1" ] || ! [[ $said =~ ^($2)$ ]]; then
+    fail "under emulation, ${*:3} ended with $status and said: $said"
+  fi
+}
+
+secret='[0-9a-f]{64}'
+# The operator's first day. Beside the answers, what was written must be in the root's own folder.
+oauthctl=/usr/bin/oauthctl
+expect 0 "oauthctl $version" $oauthctl --version
+expect 0 "id +1
+client_id +$secret
+client_secret +$secret" $oauthctl client add --name 'Photo album' \
+  --redirect-uri https://album.example/callback --scope 'read write'
+expect 0 'ID NAME        ENABLED REDIRECT URI           SCOPE
+ 1 Photo album yes     album.example/callback read write' $oauthctl client list
+expect 0 'TABLE   ROWS CEILING USED EXPIRED SOONEST EXPIRY LATEST EXPIRY
+clients    1    1000  0 %       - -              -
+codes      0    1000  0 %       0 -              -
+tokens     0    1000  0 %       0 -              -
+log        1    1000  0 %       - -              -
+.*schema versions oauth_clientInfo 2, oauth_grantCode 2, oauth_token 2' $oauthctl status
+expect 0 "sound: $data/oauth.db" $oauthctl check
+expect 1 'oauthctl: not valid: no such access token' $oauthctl token verify < <(printf '0%.0s' {1..64})
+expect 0 'wrote /backup.db: 1 client, 0 codes, 0 tokens, 1 log line' $oauthctl backup /backup.db
+for file in "$root$data/oauth.db" "$root/backup.db"; do
+  [ "$(head --bytes 15 "$file")" = 'SQLite format 3' ] || fail "$file is no database"
+done
+expect 0 " WHERE username='alice' 64" /consumer
+
+cd "$(dirname "$build")"
+cp "$work/$archive" .
+echo "package-powerpc: $PWD/$archive, $(stat --format %s "$archive") bytes," \
+  "sha256 $(sha256sum "$archive" | cut -d ' ' -f 1)"
