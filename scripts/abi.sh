@@ -1,0 +1,83 @@
+#!/usr/bin/env bash
+# Compares the library's binary interface with the baselines in abi/, for this machine and for
+# PowerPC. A function that was added passes with a note. Anything else fails: programs compiled
+# earlier might not work any more.
+#
+#   scripts/abi.sh            compares
+#   scripts/abi.sh --record   makes the baselines from what is built now
+#
+# Installs what is missing (scripts/packages.sh, groups build, powerpc and abi) and keeps what it
+# builds for the target (scripts/powerpc-libraries.sh).
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+case ${1-} in
+  '' | --record) mode=${1-} ;;
+  *)
+    echo "usage: scripts/abi.sh [--record]" >&2
+    exit 2
+    ;;
+esac
+
+scripts/packages.sh build powerpc abi
+libraries=$(scripts/build.sh --where powerpc-libraries)
+scripts/powerpc-libraries.sh "$libraries"
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+
+# FILE ARCHITECTURE PRESET [OPTION...]: the interface of a release, as its debug information tells.
+# Types that include/ does not define are known by their names only, so that an update of theirs
+# changes nothing here; abidw would keep those of /usr/include, hence the other name.
+describe() {
+  local folder
+  folder=$(scripts/build.sh "$3" "abi-$2" "${@:4}" -DZEVOOAUTH_BUILD_TESTS=OFF \
+    -DZEVOOAUTH_BUILD_TOOLS=OFF \
+    "-DCMAKE_CXX_FLAGS_RELWITHDEBINFO=-O2 -g -DNDEBUG -fdebug-prefix-map=/usr/include=foreign" \
+    -- zevooauth | tail -n 1)
+  abidw --headers-dir include --drop-private-types --exported-interfaces-only --no-corpus-path \
+    --no-comp-dir-path --no-show-locs --no-parameter-names --no-elf-needed --type-id-style hash \
+    --out-file "$1" "$folder/libzevooauth.so"
+  if grep -nF -e "$PWD" -e "$libraries" -e /usr "$1" >&2; then
+    echo "abi: the description names a folder of this machine" >&2
+    exit 1
+  fi
+}
+
+# BASELINE FILE: fails, with a report, unless programs made for the one work with the other.
+compare() {
+  local added=0
+  # First without what was added: any difference left is one too many.
+  if ! abidiff --no-added-syms "$1" "$2" >"$work/report"; then
+    cat "$work/report"
+    return 1
+  fi
+  abidiff "$1" "$2" >"$work/report" || added=$?
+  case $added in
+    0) echo "abi: as in $1" ;;
+    4)
+      cat "$work/report"
+      echo "abi: compatible with $1, but more; make it the baseline: scripts/abi.sh --record"
+      ;;
+    *) return 1 ;;
+  esac
+}
+
+failed=
+for architecture in "$(uname -m)" powerpc; do
+  baseline=abi/libzevooauth.$architecture.abi
+  options=(release)
+  [ "$architecture" != powerpc ] || options=(powerpc-release -DPOWERPC_LIBRARIES="$libraries")
+  describe "$work/now" "$architecture" "${options[@]}"
+  if [ -n "$mode" ]; then
+    mkdir -p abi
+    cp "$work/now" "$baseline"
+    echo "abi: recorded $baseline"
+  else
+    compare "$baseline" "$work/now" || failed+=" $architecture"
+  fi
+done
+if [ -n "$failed" ]; then
+  echo "abi: INCOMPATIBLE on$failed: see CONTRIBUTING.md on changing the interface" >&2
+  exit 1
+fi
+[ -n "$mode" ] || echo "abi: programs compiled earlier go on working"
