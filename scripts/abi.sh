@@ -20,7 +20,7 @@ case ${1-} in
 esac
 
 scripts/packages.sh build powerpc abi
-libraries=$(scripts/build.sh --where powerpc-libraries)
+libraries=$(scripts/build-folder.sh powerpc-libraries)
 scripts/powerpc-libraries.sh "$libraries"
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
@@ -41,11 +41,19 @@ describe() {
     echo "abi: the description names a folder of this machine" >&2
     exit 1
   fi
+  if ! grep -q "<class-decl name='OAUTHDBBasic' size-in-bits='[1-9]" "$1"; then
+    echo "abi: the description knows nothing of the classes" >&2
+    exit 1
+  fi
 }
 
 # BASELINE FILE: fails, with a report, unless programs made for the one work with the other.
 compare() {
   local added=0
+  if [ ! -e "$1" ]; then
+    echo "abi: there is no $1, scripts/abi.sh --record makes it" >&2
+    return 1
+  fi
   # First without what was added: any difference left is one too many.
   if ! abidiff --no-added-syms "$1" "$2" >"$work/report"; then
     cat "$work/report"
@@ -58,7 +66,10 @@ compare() {
       cat "$work/report"
       echo "abi: compatible with $1, but more; make it the baseline: scripts/abi.sh --record"
       ;;
-    *) return 1 ;;
+    *)
+      cat "$work/report"
+      return 1
+      ;;
   esac
 }
 
