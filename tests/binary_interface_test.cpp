@@ -41,6 +41,16 @@ TEST(BinaryInterfaceTest, GivesEveryClassTheSameSize) {
   EXPECT_TRUE(isBaseAlone<OAUTHDBLog>);
 }
 
+// No symbol stands for them: a changed value would not reach programs compiled earlier.
+TEST(BinaryInterfaceTest, KeepsTheErrorCodesThatProgramsWereCompiledWith) {
+  EXPECT_EQ(255, kErrNone);
+  EXPECT_EQ(-1, kErrCreateTable);
+  EXPECT_EQ(-2, kErrBadParameters);
+  EXPECT_EQ(-3, kErrTokenExpired);
+  EXPECT_EQ(-4, kErrCrypt);
+  EXPECT_EQ(-5, kErrTableFull);
+}
+
 class BinaryInterfaceMembersTest : public StoreTest {
  protected:
   static const Layout& layoutOf(const OAUTHDBBasic& store) {
