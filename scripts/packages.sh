@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
 # Installs what the named groups need from Debian's packages, as far as it is missing.
 #
-#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare docs abi
+#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare docs
+#                                          abi authserver
 set -euo pipefail
 
 declare -A groups=(
@@ -15,6 +16,7 @@ declare -A groups=(
   [bare]="debootstrap"
   [docs]="doxygen"
   [abi]="abigail-tools"
+  [authserver]="libcgicc-dev libctemplate-dev libsodium-dev lighttpd"
 )
 
 missing=()

@@ -1,0 +1,123 @@
+// authserver_setup: makes the folder of a server, adds its users and registers its clients.
+
+#include <sodium.h>
+#include <sys/stat.h>
+
+#include <CLI/CLI.hpp>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iostream>
+
+#include "configuration.h"
+#include "json/writer.h"
+#include "oauth_clientInfo.h"
+#include "redirect_uri.h"
+#include "scope.h"
+#include "users.h"
+
+namespace authserver {
+namespace {
+
+// A new file takes the old one's place at once: no program ever reads half of one.
+void writeFile(const std::string& path, const std::string& content) {
+  const std::string unfinished = path + ".new";
+  std::ofstream file(unfinished, std::ios::binary | std::ios::trunc);
+  file << content;
+  file.close();
+  if (!file) throw std::runtime_error("cannot write " + unfinished);
+  std::filesystem::rename(unfinished, path);
+}
+
+void writeJsonFile(const std::string& path, const Json::Value& document) {
+  writeFile(path, document.toStyledString());
+}
+
+std::string randomBytes(std::size_t count) {
+  std::string bytes(count, '\0');
+  randombytes_buf(bytes.data(), bytes.size());
+  return bytes;
+}
+
+void init(const std::string& folder, std::string issuer) {
+  if (issuer.rfind("https://", 0) != 0 && issuer.rfind("http://", 0) != 0)
+    throw std::runtime_error("the issuer must be an https URL, or http for a trial");
+  if (issuer.back() == '/') issuer.pop_back();
+  std::filesystem::create_directories(folder);
+  if (std::filesystem::exists(configurationPath("config.json")))
+    throw std::runtime_error(folder + " is set up already");
+  Json::Value users;
+  users["decoy"] = passwordHash(randomBytes(32));
+  users["users"] = Json::Value(Json::objectValue);
+  writeJsonFile(configurationPath("users.json"), users);
+  writeFile(configurationPath("session.key"), randomBytes(32));
+  Json::Value configuration;
+  configuration["issuer"] = issuer;
+  writeJsonFile(configurationPath("config.json"), configuration);
+}
+
+void addUser(const std::string& name, const std::string& displayName) {
+  std::string password;
+  std::getline(std::cin, password);
+  if (password.size() < 8) throw std::runtime_error("a password has at least 8 characters");
+  Json::Value document = readJsonFile(configurationPath("users.json"));
+  if (document["users"].isMember(name)) throw std::runtime_error("there is a user of that name");
+  Json::Value& user = document["users"][name];
+  user["display_name"] = displayName;
+  user["password"] = passwordHash(password);
+  writeJsonFile(configurationPath("users.json"), document);
+}
+
+// Tells identifier and secret, this once.
+void addClient(const std::string& redirectUri, const std::string& scope, const std::string& name) {
+  if (!isRegistrable(redirectUri))
+    throw std::runtime_error(
+        "the redirect URI must be https, http on this machine, or an app's (com.example.app:/...)");
+  scopesOf(scope);
+  ZEVOOAUTHSERVER::OAUTHDBClientInfo clients("oauth_clientInfo");
+  Json::Value registered;
+  if (!clients.Add(redirectUri, scope, name, registered))
+    throw std::runtime_error("cannot register: " + clients.GetErrMsg());
+  std::cout << registered.toStyledString();
+}
+
+int run(int argc, char** argv) {
+  umask(S_IRWXG | S_IRWXO);
+  std::string folder, issuer, user, redirectUri, scope, name;
+  const auto useFolder = [&] { setenv("AUTHSERVER_FOLDER", folder.c_str(), 1); };
+  CLI::App program("Sets up the example authorization server.");
+  program.require_subcommand(1);
+
+  CLI::App* const makeFolder = program.add_subcommand("init", "Make the server's folder.");
+  makeFolder->add_option("FOLDER", folder)->required();
+  makeFolder->add_option("--issuer", issuer, "The server's URL")->required();
+  makeFolder->callback([&] { useFolder(), init(folder, issuer); });
+
+  CLI::App* const addPerson =
+      program.add_subcommand("add-user", "Add a user; the password comes on standard input.");
+  addPerson->add_option("FOLDER", folder)->required();
+  addPerson->add_option("NAME", user)->required();
+  addPerson->add_option("--display-name", name)->required();
+  addPerson->callback([&] { useFolder(), addUser(user, name); });
+
+  CLI::App* const addApplication =
+      program.add_subcommand("add-client", "Register a client; its secret is told once.");
+  addApplication->add_option("--redirect-uri", redirectUri)->required();
+  addApplication->add_option("--scope", scope)->required();
+  addApplication->add_option("--name", name)->required();
+  addApplication->callback([&] { addClient(redirectUri, scope, name); });
+
+  CLI11_PARSE(program, argc, argv);
+  return 0;
+}
+
+}  // namespace
+}  // namespace authserver
+
+int main(int argc, char** argv) try {
+  if (sodium_init() < 0) throw std::runtime_error("no randomness");
+  return authserver::run(argc, argv);
+} catch (const std::exception& error) {
+  std::cerr << "authserver_setup: " << error.what() << '\n';
+  return 1;
+}

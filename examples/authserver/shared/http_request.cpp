@@ -1,0 +1,102 @@
+#include "http_request.h"
+
+#include <cgicc/Cgicc.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <set>
+
+#include "refusal.h"
+
+namespace authserver {
+namespace {
+
+constexpr std::size_t kLongestName = 64, kLongestValue = 4096;  // bytes
+constexpr std::size_t kLargestBody = 65536, kMostParameters = 100;
+constexpr char kForm[] = "application/x-www-form-urlencoded";
+
+std::string variable(const char* name) {
+  const char* const value = std::getenv(name);
+  return value == nullptr ? "" : value;
+}
+
+bool hasControlCharacters(const std::string& text) {
+  return std::any_of(text.begin(), text.end(), [](unsigned char c) { return c < ' ' || c == 127; });
+}
+
+std::string joined(const std::vector<std::string>& words) {
+  std::string result;
+  for (const std::string& word : words) result += (result.empty() ? "" : ", ") + word;
+  return result;
+}
+
+// Before anything is read: what is no form of ours is not parsed at all.
+void checkBody() {
+  std::string type = variable("CONTENT_TYPE");
+  type = type.substr(0, type.find_first_of("; "));
+  std::transform(type.begin(), type.end(), type.begin(),
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  if (type != kForm) throw invalidRequest(std::string("The body must be of type ") + kForm + ".");
+  if (std::strtoul(variable("CONTENT_LENGTH").c_str(), nullptr, 10) > kLargestBody)
+    throw Refusal(413, "invalid_request", "The body is too large.");
+  // Parameters of a query would mix with those of the form, and queries end up in log files.
+  if (!variable("QUERY_STRING").empty())
+    throw invalidRequest("Parameters must be in the body, not in the query.");
+}
+
+}  // namespace
+
+Request::Request(const std::vector<std::string>& methods) {
+  const std::string method = variable("REQUEST_METHOD");
+  if (std::find(methods.begin(), methods.end(), method == "HEAD" ? "GET" : method) == methods.end())
+    throw Refusal(405, "invalid_request", "This method is not allowed here.",
+                  {{"Allow", joined(methods)}});
+  post_ = method == "POST";
+  if (post_) checkBody();
+  read();
+}
+
+void Request::read() try {
+  const cgicc::Cgicc cgi;
+  if (cgi.getElements().size() > kMostParameters) throw invalidRequest("Too many parameters.");
+  std::set<std::string> unsound;
+  for (const cgicc::FormEntry& entry : cgi.getElements()) {
+    const std::string name = entry.getName(), value = entry.getValue();
+    if (name.size() > kLongestName || value.size() > kLongestValue)
+      problem_ = "A parameter is too long.";
+    else if (hasControlCharacters(name + value))
+      problem_ = "A parameter holds control characters.";
+    else if (parameters_.emplace(name, value).second)
+      continue;
+    else
+      problem_ = "A parameter was sent more than once.";
+    unsound.insert(name);
+  }
+  for (const std::string& name : unsound) parameters_.erase(name);
+  for (const cgicc::HTTPCookie& cookie : cgi.getEnvironment().getCookieList())
+    cookies_.emplace_back(cookie.getName(), cookie.getValue());
+} catch (const Refusal&) {
+  throw;
+} catch (const std::exception&) {  // whatever the parser stumbled over came from outside
+  throw invalidRequest("The request cannot be read.");
+}
+
+std::string Request::get(const std::string& name) const {
+  const auto found = parameters_.find(name);
+  return found == parameters_.end() ? "" : found->second;
+}
+
+void Request::requireSoundParameters() const {
+  if (!problem_.empty()) throw invalidRequest(problem_);
+}
+
+std::vector<std::string> Request::cookies(const std::string& name) const {
+  std::vector<std::string> values;
+  for (const auto& [cookieName, value] : cookies_)
+    if (cookieName == name) values.push_back(value);
+  return values;
+}
+
+std::string Request::authorization() { return variable("HTTP_AUTHORIZATION"); }
+
+}  // namespace authserver

@@ -1,0 +1,65 @@
+#include "http_response.h"
+
+#include <json/writer.h>
+
+#include <algorithm>
+#include <iostream>
+
+namespace authserver {
+namespace {
+
+const Headers kAlways = {
+    {"Cache-Control", "no-store"},
+    {"Pragma", "no-cache"},
+    {"X-Content-Type-Options", "nosniff"},
+    {"Referrer-Policy", "no-referrer"},
+    {"Content-Security-Policy", "default-src 'none'; base-uri 'none'; frame-ancestors 'none'"},
+};
+
+bool has(const Headers& headers, const std::string& name) {
+  return std::any_of(headers.begin(), headers.end(),
+                     [&](const auto& header) { return header.first == name; });
+}
+
+void write(std::ostream& out, const Headers& headers) {
+  for (const auto& [name, value] : headers) out << name << ": " << value << "\r\n";
+}
+
+// A line break in a value would begin a header of somebody else's making.
+void check(const Headers& headers) {
+  for (const auto& [name, value] : headers)
+    for (const unsigned char c : value)
+      if (c < ' ' || c == 127) throw std::logic_error("control character in header " + name);
+}
+
+}  // namespace
+
+Response jsonResponse(int status, const Json::Value& document, Headers headers) {
+  Json::StreamWriterBuilder writer;
+  writer["indentation"] = "";
+  headers.emplace_back("Content-Type", "application/json");
+  return {status, std::move(headers), Json::writeString(writer, document) + '\n'};
+}
+
+Response redirection(int status, const std::string& target, Headers headers) {
+  headers.emplace_back("Location", target);
+  return {status, std::move(headers), ""};
+}
+
+Response jsonRefusal(const Refusal& refusal) {
+  Json::Value document;
+  document["error"] = refusal.error;
+  document["error_description"] = refusal.what();
+  return jsonResponse(refusal.status, document, refusal.headers);
+}
+
+void send(const Response& response) {
+  check(response.headers);
+  std::cout << "Status: " << response.status << "\r\n";
+  write(std::cout, response.headers);
+  for (const auto& header : kAlways)
+    if (!has(response.headers, header.first)) write(std::cout, {header});
+  std::cout << "\r\n" << response.body << std::flush;
+}
+
+}  // namespace authserver

@@ -1,0 +1,75 @@
+#include "scope.h"
+
+#include <algorithm>
+#include <sstream>
+
+#include "refusal.h"
+
+namespace authserver {
+namespace {
+
+constexpr std::size_t kLongestList = 1024;  // bytes; must fit into columns beside other things
+
+bool isScopeCharacter(char c) { return c == '!' || (c >= '#' && c <= '~' && c != '\\'); }
+
+std::string listOf(const std::vector<std::string>& scopes) {
+  std::string list;
+  for (const std::string& scope : scopes) list += (list.empty() ? "" : " ") + scope;
+  return list;
+}
+
+}  // namespace
+
+const std::vector<ScopeMeaning>& knownScopes() {
+  static const std::vector<ScopeMeaning> scopes = {
+      {"read", "See your photos and albums"},
+      {"write", "Add, change and delete your photos and albums"},
+      {kProfileScope, "Know your name"},
+  };
+  return scopes;
+}
+
+std::string meaningOf(const std::string& scope) {
+  for (const ScopeMeaning& known : knownScopes())
+    if (known.name == scope) return known.words;
+  return scope;
+}
+
+std::vector<std::string> scopesOf(const std::string& list) {
+  std::vector<std::string> scopes;
+  std::istringstream words(list);
+  for (std::string scope; std::getline(words, scope, ' ');) {
+    if (!std::all_of(scope.begin(), scope.end(), isScopeCharacter))
+      throw invalidScope("The scope holds characters that no scope has.");
+    if (!scope.empty() && std::find(scopes.begin(), scopes.end(), scope) == scopes.end())
+      scopes.push_back(scope);
+  }
+  return scopes;
+}
+
+bool contains(const std::string& list, const std::string& scope) {
+  const std::vector<std::string> scopes = scopesOf(list);
+  return std::find(scopes.begin(), scopes.end(), scope) != scopes.end();
+}
+
+std::string grantable(const std::string& asked, const std::string& registered) {
+  std::vector<std::string> scopes = scopesOf(asked.empty() ? registered : asked);
+  scopes.erase(std::remove_if(scopes.begin(), scopes.end(),
+                              [&](const std::string& scope) {
+                                return scope == kIntrospectScope || !contains(registered, scope);
+                              }),
+               scopes.end());
+  if (scopes.empty()) throw invalidScope("The client is registered for none of these scopes.");
+  const std::string list = listOf(scopes);
+  if (list.size() > kLongestList) throw invalidScope("The list of scopes is too long.");
+  return list;
+}
+
+std::string narrowed(const std::string& asked, const std::string& granted) {
+  const std::vector<std::string> scopes = scopesOf(asked);
+  for (const std::string& scope : scopes)
+    if (!contains(granted, scope)) throw invalidScope("A scope was not granted.");
+  return scopes.empty() ? granted : listOf(scopes);
+}
+
+}  // namespace authserver

@@ -1,0 +1,39 @@
+#include "store_errors.h"
+
+#include <iostream>
+#include <stdexcept>
+
+#include "refusal.h"
+
+namespace authserver {
+namespace {
+
+// SQLite's codes for a database that others are using.
+constexpr int kBusy = 5, kLocked = 6;
+
+}  // namespace
+
+void requireOpen(const ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
+  if (store.GetErrCode() == ZEVOOAUTHSERVER::kErrNone) return;
+  std::cerr << "authserver: the database did not open [" << store.GetErrCode() << "] "
+            << store.GetErrMsg() << '\n';
+  throw temporarilyUnavailable();
+}
+
+bool isJustMissing(const ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
+  switch (store.GetErrCode()) {
+    case ZEVOOAUTHSERVER::kErrNone:
+    case ZEVOOAUTHSERVER::kErrBadParameters:  // of a length that no row can have
+      return true;
+    case ZEVOOAUTHSERVER::kErrTableFull:
+      throw TableFull();
+    case kBusy:
+    case kLocked:
+      throw temporarilyUnavailable();
+    default:
+      throw std::runtime_error("database [" + std::to_string(store.GetErrCode()) + "] " +
+                               store.GetErrMsg());
+  }
+}
+
+}  // namespace authserver

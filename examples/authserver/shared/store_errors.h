@@ -1,0 +1,30 @@
+// What the result of a store's operation means for the request: done, not there, or "try again".
+
+#pragma once
+
+#include <exception>
+
+#include "oauth_db_basic.h"
+
+namespace authserver {
+
+// A table has no room, or could not be counted, which the stores report alike.
+struct TableFull : std::exception {};
+
+// Refuses the request, with "try again", if the store did not open. Without this look everything
+// it is asked later would read as "not there".
+void requireOpen(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
+
+// Whether an operation's failure only means that there is no such row. Throws otherwise: the
+// refusal "try again" for a busy database, TableFull, or the store's own words.
+bool isJustMissing(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
+
+// Runs one operation: true if it succeeded, false if there is no such row.
+template <class Operation>
+bool attempt(ZEVOOAUTHSERVER::OAUTHDBBasic& store, Operation operation) {
+  // A success leaves an earlier error in place, and a missing row records none.
+  store.SetErrCode(ZEVOOAUTHSERVER::kErrNone);
+  return operation() || !isJustMissing(store);
+}
+
+}  // namespace authserver

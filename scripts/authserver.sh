@@ -1,0 +1,86 @@
+#!/usr/bin/env bash
+# Starts the example authorization server on this machine, with a user and a client to try it with.
+#
+#   scripts/authserver.sh [--port N]     8080 unless another port is given
+#
+# Installs what is missing (scripts/packages.sh, groups build and authserver). All it makes lies in
+# a private /var (scripts/authserver-namespace.sh): Ctrl-C ends it and removes everything.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+port=8080
+if [ $# -eq 2 ] && [ "$1" = --port ] && [[ $2 =~ ^[0-9]+$ ]]; then
+  port=$2
+elif [ $# -ne 0 ]; then
+  echo "authserver: usage: scripts/authserver.sh [--port N]" >&2
+  exit 2
+fi
+
+serve() {
+  local password verifier challenge client id secret server
+  local callback=$AUTHSERVER_ISSUER/album.html
+  password=$(head -c 9 /dev/urandom | basenc --base64url)
+  verifier=$(head -c 32 /dev/urandom | basenc --base64url | tr -d '=')
+  challenge=$(printf %s "$verifier" | sha256sum | cut -c 1-64 | tr a-f A-F |
+    basenc --base16 --decode | basenc --base64url | tr -d '=')
+
+  "$AUTHSERVER_SETUP" init "$AUTHSERVER_FOLDER" --issuer "$AUTHSERVER_ISSUER"
+  "$AUTHSERVER_SETUP" add-user "$AUTHSERVER_FOLDER" alice --display-name 'Alice Miller' \
+    <<<"$password"
+  client=$("$AUTHSERVER_SETUP" add-client --redirect-uri "$callback" --scope 'read profile' \
+    --name 'Photo album')
+  id=$(grep -oP '"client_id" : "\K\w+' <<<"$client")
+  secret=$(grep -oP '"client_secret" : "\K\w+' <<<"$client")
+
+  lighttpd -D -f "$AUTHSERVER_SOURCE/lighttpd.conf" &
+  server=$!
+  trap 'kill "$server" 2>/dev/null' INT TERM
+  until (: <"/dev/tcp/127.0.0.1/$AUTHSERVER_PORT") 2>/dev/null; do
+    if ! kill -0 "$server" 2>/dev/null; then
+      echo "authserver: the web server did not start on port $AUTHSERVER_PORT" >&2
+      exit 1
+    fi
+    sleep 0.1
+  done
+
+  cat <<TEXT
+
+Open in a browser, and log in as alice with the password $password :
+
+  $AUTHSERVER_ISSUER/authorize?response_type=code&client_id=$id&redirect_uri=${callback//\//%2F}&state=anything&code_challenge=$challenge&code_challenge_method=S256
+
+Take the code out of the address that you end up at, and trade it for tokens:
+
+  curl -u $id:$secret -d grant_type=authorization_code \\
+    -d redirect_uri=$callback -d code_verifier=$verifier \\
+    -d code=CODE $AUTHSERVER_ISSUER/token
+
+Then look at what the access token opens, and get the next one:
+
+  curl -H 'Authorization: Bearer ACCESS_TOKEN' $AUTHSERVER_ISSUER/userinfo
+  curl -u $id:$secret -d token=ACCESS_TOKEN $AUTHSERVER_ISSUER/introspect
+  curl -u $id:$secret -d grant_type=refresh_token \\
+    -d refresh_token=REFRESH_TOKEN $AUTHSERVER_ISSUER/token
+
+authserver: running on $AUTHSERVER_ISSUER until Ctrl-C
+TEXT
+  while kill -0 "$server" 2>/dev/null; do wait "$server" || true; done # a signal ends the first wait
+  echo "authserver: ended, nothing is left of it"
+}
+
+if [ "${AUTHSERVER_FOLDER-}" = /var/authserver ]; then # inside, see below
+  serve
+  exit
+fi
+
+scripts/packages.sh build authserver
+build=$(scripts/build.sh release authserver -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
+  -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=OFF | tail -n 1)
+PATH=$PATH:/usr/sbin \
+  AUTHSERVER_PORT=$port \
+  AUTHSERVER_ISSUER=http://127.0.0.1:$port \
+  AUTHSERVER_SOURCE=$PWD/examples/authserver \
+  AUTHSERVER_PROGRAMS=$build/examples/authserver/cgi \
+  AUTHSERVER_SETUP=$build/examples/authserver/authserver_setup \
+  AUTHSERVER_FOLDER=/var/authserver \
+  exec scripts/authserver-namespace.sh scripts/authserver.sh
