@@ -1,13 +1,13 @@
 #!/usr/bin/env bash
 # What a machine can say about the code: formatting, shell scripts, clang-tidy, tests in any order
 # and for an ordinary user, branch coverage of src/.
-# Installs what is missing (scripts/packages.sh, groups build, test and check).
+# Installs what is missing (scripts/packages.sh, groups build, test, check and authserver).
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
 required_branches=95 # percent
 
-scripts/packages.sh build test check
+scripts/packages.sh build test check authserver
 
 mapfile -t sources < <(find include src platform examples tools tests -name '*.cpp' -o -name '*.h' | sort)
 clang-format --dry-run -Werror "${sources[@]}" bench/*.{c,cpp,h}
@@ -16,7 +16,7 @@ echo "check: sources are formatted"
 shellcheck .ci/run scripts/*.sh tests/*.sh tools/oauthctl/oauthctl.bash
 echo "check: shell scripts are sound"
 
-folder=$(scripts/build.sh dev dev | tail -n 1)
+folder=$(scripts/build.sh dev dev -DZEVOOAUTH_BUILD_AUTHSERVER=ON | tail -n 1)
 # The fuzz targets are another compiler's build: there are no commands for them in this one.
 printf '%s\n' "${sources[@]}" | grep '\.cpp$' | grep -v '^tests/fuzz/' |
   xargs --max-procs="$(nproc)" --max-args=1 clang-tidy --quiet -p "$folder" --warnings-as-errors='*' \

@@ -48,7 +48,7 @@ Response logIn(const Request& http, const AuthorizationRequest& request, const S
 
 Response allow(const AuthorizationRequest& request, const User& user) {
   const std::string code = issueCode(user.name, request.client().id, request.scope(),
-                                     codeBinding(request.redirectUri(), request.challenge()));
+                                     request.redirectUri(), request.challenge());
   audit(quotedForLog(user.name) + " allowed " + quotedForLog(request.client().name) + " " +
         quotedForLog(request.scope()));
   return redirection(303, request.answer({{"code", code}}));

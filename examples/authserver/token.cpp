@@ -9,6 +9,7 @@
 #include "digest.h"
 #include "endpoint.h"
 #include "scope.h"
+#include "store_errors.h"
 #include "tokens.h"
 #include "transaction.h"
 
@@ -28,42 +29,34 @@ void endGrantOf(TokenStore& tokens, const std::string& code, const Client& clien
 }
 
 // What is refused without harm to the code.
-void checkCode(const Code& code, const Client& client, const std::string& redirectUri,
-               const std::string& verifier) {
-  if (code.clientId != client.id) {
-    audit("code of another client presented by " + quotedForLog(client.name));
-    throw invalidGrant("The code is not valid.");
-  }
+void checkCode(const Code& code, const std::string& redirectUri, const std::string& verifier) {
   if (static_cast<std::int64_t>(std::time(nullptr)) > code.expires)
     throw invalidGrant("The code has expired.");
-  const bool withChallenge = code.binding != codeBinding(redirectUri, "");
-  if (verifier.empty() == withChallenge)
-    throw invalidGrant("The redirect_uri or the code_verifier does not fit the code.");
+  if (code.redirectDigest != sha256(redirectUri))
+    throw invalidGrant("The redirect_uri is not the one that the code was asked for with.");
+  if (code.challenge.empty() != verifier.empty())
+    throw invalidGrant("A code_verifier belongs to a code_challenge, and the other way round.");
 }
 
-// Whether the code fits what it was asked for with. Whoever gets as far as this has spent it: a
-// verifier must not be guessed at.
-bool fits(const Code& code, const std::string& redirectUri, const std::string& verifier) {
-  const std::string challenge = verifier.empty() ? "" : sha256(verifier);
-  return equalSecrets(code.binding, codeBinding(redirectUri, challenge));
-}
-
-// The code, which nobody else can spend any more.
+// The code, which nobody else can spend any more. A wrong verifier spends it too: it must not be
+// guessed at.
 Code spentCode(CodeStore& codes, TokenStore& tokens, const Client& client, const Request& http) {
-  const std::string presented = required(http, "code"),
-                    redirectUri = required(http, "redirect_uri");
-  const std::string verifier = http.get("code_verifier");
+  const std::string presented = required(http, "code"), verifier = http.get("code_verifier");
+  const std::string redirectUri = required(http, "redirect_uri");
   Transaction transaction(codes);
   const std::optional<Code> code = findCode(codes, presented);
-  if (!code) {
-    transaction.rollBack();
-    endGrantOf(tokens, presented, client);
+  if (!code || code->clientId != client.id) {
+    transaction.rollBack();  // which other stores, the log among them, would wait for in vain
+    if (code)
+      audit("code of another client presented by " + quotedForLog(client.name));
+    else
+      endGrantOf(tokens, presented, client);
     throw invalidGrant("The code is not valid.");
   }
-  checkCode(*code, client, redirectUri, verifier);
+  checkCode(*code, redirectUri, verifier);
   attempt(codes, [&] { return codes.Del(code->id); });
   transaction.commit();
-  if (fits(*code, redirectUri, verifier)) return *code;
+  if (code->challenge.empty() || equalSecrets(code->challenge, sha256(verifier))) return *code;
   audit("wrong code_verifier from " + quotedForLog(client.name));
   throw invalidGrant("The code_verifier does not fit the code.");
 }
@@ -74,7 +67,8 @@ Json::Value tradeCode(const Request& http, const Client& client) {
   const Code code = spentCode(codes, tokens, client, http);
   const Grant grant{code.user, client.id, code.scope, code.scope, sha256(code.code)};
   try {
-    return withRoom(tokens, [&] { return issueTokens(tokens, grant, "authorization_code"); });
+    return withRoom([&] { return issueTokens(tokens, grant, "authorization_code"); },
+                    [&] { purgeLongExpired(tokens); });
   } catch (const std::exception&) {
     giveBack(codes, code);
     throw;
@@ -102,7 +96,8 @@ Response token(const Request& http) {
   if (type != "refresh_token")
     throw Refusal(400, "unsupported_grant_type", "The grant_type is not known here.");
   TokenStore tokens;
-  return jsonResponse(200, withRoom(tokens, [&] { return rotate(tokens, http, client); }));
+  return jsonResponse(200, withRoom([&] { return rotate(tokens, http, client); },
+                                    [&] { purgeLongExpired(tokens); }));
 }
 
 }  // namespace

@@ -9,34 +9,30 @@
 #include "stored_text.h"
 
 namespace authserver {
+namespace {
+
+// The column "state" is ours to use: "<digest of the redirect URI>.<challenge>", of a fixed length
+// and without quotes, whatever the client sent.
+std::string stateOf(const std::string& redirectDigest, const std::string& challenge) {
+  return redirectDigest + '.' + challenge;
+}
+
+}  // namespace
 
 CodeStore::CodeStore() : OAUTHDBGrantCode("oauth_grantCode") { requireOpen(*this); }
 
-// Digests have no quotes and a fixed length, whatever the client sent.
-std::string codeBinding(const std::string& redirectUri, const std::string& challenge) {
-  return sha256(redirectUri) + '.' + challenge;
-}
-
 std::string issueCode(const std::string& user, const std::string& clientId,
-                      const std::string& scope, const std::string& binding) {
+                      const std::string& scope, const std::string& redirectUri,
+                      const std::string& challenge) {
   CodeStore store;
+  const std::string state = stateOf(sha256(redirectUri), challenge);
   Json::Value issued;
   const auto add = [&] {
-    return attempt(
-        store, [&] { return store.Add(user, clientId, scope, binding, getRemoteIP(), issued); });
+    return attempt(store,
+                   [&] { return store.Add(user, clientId, scope, state, getRemoteIP(), issued); });
   };
-  bool added = false;
-  try {
-    added = add();
-  } catch (const TableFull&) {
-    attempt(store, [&] { return store.Purge(); });
-    try {
-      added = add();
-    } catch (const TableFull&) {
-      throw temporarilyUnavailable();
-    }
-  }
-  if (!added) throw std::runtime_error("the code store refused a value");
+  const auto purge = [&] { attempt(store, [&] { return store.Purge(); }); };
+  if (!withRoom(add, purge)) throw std::runtime_error("the code store refused a value");
   return issued["code"].asString();
 }
 
@@ -44,16 +40,24 @@ std::optional<Code> findCode(CodeStore& store, const std::string& code) {
   Json::Value rows;
   if (!attempt(store, [&] { return store.Get(code, &rows); }) || rows.empty()) return std::nullopt;
   const Json::Value& row = rows[0U];
-  return Code{storedNumber(row, "id"),      storedText(row, "username"),
-              storedText(row, "client_id"), storedText(row, "scope"),
-              storedText(row, "code"),      storedNumber(row, "expired_time"),
-              storedText(row, "state"),     storedText(row, "ip")};
+  const std::string state = storedText(row, "state");
+  Code found;
+  found.id = storedNumber(row, "id");
+  found.user = storedText(row, "username");
+  found.clientId = storedText(row, "client_id");
+  found.scope = storedText(row, "scope");
+  found.code = storedText(row, "code");
+  found.expires = storedNumber(row, "expired_time");
+  found.redirectDigest = state.substr(0, kDigestLength);
+  if (state.size() > kDigestLength) found.challenge = state.substr(kDigestLength + 1);
+  found.ip = storedText(row, "ip");
+  return found;
 }
 
 void giveBack(CodeStore& store, const Code& code) {
   Json::Value issued;
   store.Add(code.user, code.clientId, code.scope, code.code, std::to_string(code.expires),
-            code.binding, code.ip, issued);
+            stateOf(code.redirectDigest, code.challenge), code.ip, issued);
 }
 
 }  // namespace authserver

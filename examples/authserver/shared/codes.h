@@ -20,16 +20,16 @@ struct Code {
   long long id;
   std::string user, clientId, scope, code;
   std::int64_t expires;  // Unix seconds
-  std::string binding, ip;
+  // What the code must be presented with: its redirect URI, of which the digest is kept, and for
+  // PKCE (RFC 7636) the verifier of the challenge, which is "" if there is none.
+  std::string redirectDigest, challenge;
+  std::string ip;
 };
-
-// What the code will have to be presented with: its redirect URI and, for PKCE (RFC 7636), the
-// challenge, "" if there is none.
-std::string codeBinding(const std::string& redirectUri, const std::string& challenge);
 
 // Issues a code; if the table is full, after the expired ones are gone.
 std::string issueCode(const std::string& user, const std::string& clientId,
-                      const std::string& scope, const std::string& binding);
+                      const std::string& scope, const std::string& redirectUri,
+                      const std::string& challenge);
 
 // Expired codes are found too.
 std::optional<Code> findCode(CodeStore& store, const std::string& code);

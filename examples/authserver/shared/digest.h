@@ -6,10 +6,12 @@
 
 namespace authserver {
 
-// SHA-256 of the text, in base64url without padding: 43 characters.
+inline constexpr std::size_t kDigestLength = 43;  // of what the next two return
+
+// SHA-256 of the text, in base64url without padding.
 std::string sha256(const std::string& text);
 
-// HMAC-SHA-256 of the text by a key of 32 bytes, in base64url as above.
+// HMAC-SHA-256 of the text by a key of 32 bytes, likewise.
 std::string authenticator(const std::string& key, const std::string& text);
 
 // In a time that does not tell where the texts differ.

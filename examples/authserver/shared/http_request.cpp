@@ -3,6 +3,7 @@
 #include <cgicc/Cgicc.h>
 
 #include <algorithm>
+#include <cctype>
 #include <cstdlib>
 #include <set>
 

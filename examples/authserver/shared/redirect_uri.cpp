@@ -1,6 +1,7 @@
 #include "redirect_uri.h"
 
 #include <algorithm>
+#include <cstring>
 #include <regex>
 
 namespace authserver {
@@ -39,8 +40,8 @@ bool startsWith(const std::string& text, const std::string& start) {
 }
 
 std::string withoutScheme(const std::string& uri) {
-  for (const std::string scheme : {kHttps, kHttp})
-    if (startsWith(uri, scheme)) return uri.substr(scheme.size());
+  for (const char* const scheme : {kHttps, kHttp})
+    if (startsWith(uri, scheme)) return uri.substr(std::strlen(scheme));
   return uri;
 }
 

@@ -60,7 +60,7 @@ std::string grantable(const std::string& asked, const std::string& registered) {
                               }),
                scopes.end());
   if (scopes.empty()) throw invalidScope("The client is registered for none of these scopes.");
-  const std::string list = listOf(scopes);
+  std::string list = listOf(scopes);
   if (list.size() > kLongestList) throw invalidScope("The list of scopes is too long.");
   return list;
 }

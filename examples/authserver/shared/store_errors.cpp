@@ -3,8 +3,6 @@
 #include <iostream>
 #include <stdexcept>
 
-#include "refusal.h"
-
 namespace authserver {
 namespace {
 

@@ -5,6 +5,7 @@
 #include <exception>
 
 #include "oauth_db_basic.h"
+#include "refusal.h"
 
 namespace authserver {
 
@@ -25,6 +26,20 @@ bool attempt(ZEVOOAUTHSERVER::OAUTHDBBasic& store, Operation operation) {
   // A success leaves an earlier error in place, and a missing row records none.
   store.SetErrCode(ZEVOOAUTHSERVER::kErrNone);
   return operation() || !isJustMissing(store);
+}
+
+// Runs an operation that adds a row; if the table is full, once more after makeRoom, and then
+// refuses the request with "try again".
+template <class Operation, class MakeRoom>
+auto withRoom(Operation operation, MakeRoom makeRoom) -> decltype(operation()) try {
+  try {
+    return operation();
+  } catch (const TableFull&) {
+    makeRoom();
+    return operation();
+  }
+} catch (const TableFull&) {
+  throw temporarilyUnavailable();
 }
 
 }  // namespace authserver

@@ -3,8 +3,8 @@
 #include <ctime>
 #include <stdexcept>
 
+#include "digest.h"
 #include "oauth_utils.h"
-#include "refusal.h"
 #include "store_errors.h"
 #include "stored_text.h"
 #include "transaction.h"
@@ -13,8 +13,6 @@ namespace authserver {
 namespace {
 
 // The column "state" is ours to use: "<digest of the code> <scope of the refresh token>".
-constexpr std::size_t kDigestLength = 43;
-
 std::string stateOf(const Grant& grant) { return grant.codeDigest + ' ' + grant.refreshScope; }
 
 Token tokenOf(const Json::Value& row) {
@@ -85,17 +83,6 @@ void purgeLongExpired(TokenStore& store) {
     if (storedNumber(row, "expired_time") < oldest)
       attempt(store, [&] { return store.Del(storedNumber(row, "id")); });
   transaction.commit();
-}
-
-Json::Value withRoom(TokenStore& store, const std::function<Json::Value()>& operation) try {
-  try {
-    return operation();
-  } catch (const TableFull&) {
-    purgeLongExpired(store);
-    return operation();
-  }
-} catch (const TableFull&) {
-  throw temporarilyUnavailable();
 }
 
 }  // namespace authserver

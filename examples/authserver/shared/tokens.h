@@ -3,7 +3,6 @@
 #pragma once
 
 #include <cstdint>
-#include <functional>
 #include <optional>
 #include <string>
 
@@ -44,8 +43,5 @@ int revokeIssuedFor(TokenStore& store, const std::string& codeDigest, const std:
 // Deletes what expired so long ago that its refresh token will not be missed. Not the library's
 // Purge(), which would end every login whose access token has expired.
 void purgeLongExpired(TokenStore& store);
-
-// Runs an operation that issues tokens; if the table is full, once more after a purge.
-Json::Value withRoom(TokenStore& store, const std::function<Json::Value()>& operation);
 
 }  // namespace authserver
