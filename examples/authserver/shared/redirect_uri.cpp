@@ -18,7 +18,7 @@ bool hasPrivateScheme(const std::string& uri) {
 
 // The part between scheme and path: host and, perhaps, port.
 std::string authorityOf(const std::string& withoutScheme) {
-  return withoutScheme.substr(0, withoutScheme.find_first_of("/?#\\"));
+  return withoutScheme.substr(0, withoutScheme.find_first_of("/?"));
 }
 
 bool isHost(const std::string& authority) {
@@ -31,8 +31,10 @@ bool isThisMachine(const std::string& authority) {
   return std::regex_match(authority, pattern);
 }
 
+// Neither a fragment nor what browsers read in other ways than we do.
 bool isPlain(const std::string& uri) {
-  return std::all_of(uri.begin(), uri.end(), [](char c) { return c > ' ' && c < 127 && c != '#'; });
+  return std::all_of(uri.begin(), uri.end(),
+                     [](char c) { return c > ' ' && c < 127 && c != '#' && c != '\\'; });
 }
 
 bool startsWith(const std::string& text, const std::string& start) {
@@ -63,7 +65,7 @@ std::string destinationOf(const std::string& uri) {
 }
 
 std::string policySourceOf(const std::string& uri) {
-  const std::string scheme = uri.substr(0, uri.find(':') + 1);
+  std::string scheme = uri.substr(0, uri.find(':') + 1);
   const std::string authority = authorityOf(withoutScheme(uri));
   // The policy's grammar knows no app's hosts and no bracketed addresses.
   if (hasPrivateScheme(uri) || authority.front() == '[') return scheme;
