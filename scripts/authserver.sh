@@ -16,6 +16,8 @@ elif [ $# -ne 0 ]; then
   exit 2
 fi
 
+answers() { (: <"/dev/tcp/127.0.0.1/$AUTHSERVER_PORT") 2>/dev/null; }
+
 serve() {
   local password verifier challenge client id secret server
   local callback=$AUTHSERVER_ISSUER/album.html
@@ -32,10 +34,14 @@ serve() {
   id=$(grep -oP '"client_id" : "\K\w+' <<<"$client")
   secret=$(grep -oP '"client_secret" : "\K\w+' <<<"$client")
 
+  if answers; then
+    echo "authserver: something else uses port $AUTHSERVER_PORT" >&2
+    exit 1
+  fi
   lighttpd -D -f "$AUTHSERVER_SOURCE/lighttpd.conf" &
   server=$!
-  trap 'kill "$server" 2>/dev/null' INT TERM
-  until (: <"/dev/tcp/127.0.0.1/$AUTHSERVER_PORT") 2>/dev/null; do
+  trap 'kill "$server" 2>/dev/null || true' INT TERM
+  until answers; do
     if ! kill -0 "$server" 2>/dev/null; then
       echo "authserver: the web server did not start on port $AUTHSERVER_PORT" >&2
       exit 1

@@ -8,18 +8,24 @@
 namespace authserver {
 
 int serve(const std::vector<std::string>& methods, Response (*answer)(const Request& request),
-          Response (*explain)(const Refusal& refusal)) try {
-  umask(S_IRWXG | S_IRWXO);  // for the database, should this be its first use
-  if (sodium_init() < 0) throw std::runtime_error("no randomness");
+          Response (*explain)(const Refusal& refusal)) {
   try {
-    send(answer(Request(methods)));
-  } catch (const Refusal& refusal) {
-    send(explain(refusal));
+    umask(S_IRWXG | S_IRWXO);  // for the database, should this be its first use
+    if (sodium_init() < 0) throw std::runtime_error("no randomness");
+    try {
+      send(answer(Request(methods)));
+    } catch (const Refusal& refusal) {
+      send(explain(refusal));
+    }
+    return 0;
+  } catch (const std::exception& error) {
+    std::cerr << "authserver: " << error.what() << '\n';
   }
-  return 0;
-} catch (const std::exception& error) {
-  std::cerr << "authserver: " << error.what() << '\n';
-  send(explain({500, "server_error", "Something went wrong on the server."}));
+  try {
+    send(explain({500, "server_error", "Something went wrong on the server."}));
+  } catch (const std::exception& error) {  // the web server says so then
+    std::cerr << "authserver: and no answer: " << error.what() << '\n';
+  }
   return 1;
 }
 
