@@ -1,0 +1,77 @@
+#!/usr/bin/env bash
+# End-to-end tests of the example authorization server: client libraries that others wrote, a real
+# browser, hostile and simultaneous requests.
+#
+#   scripts/test-authserver.sh [--screenshots] [--sanitizers] [NAME...]
+#
+# --screenshots renews those in docs/, --sanitizers builds the server with the address and
+# undefined-behaviour sanitizers, NAME runs tests/authserver/NAME.test.mjs only. Installs what is
+# missing (scripts/packages.sh, groups build, authserver and e2e, and what package-lock.json names,
+# below the build folder). Everything runs in a private /var (scripts/authserver-namespace.sh) and
+# among processes of its own, which end with it.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+preset=release
+screenshots=
+while [[ ${1-} == --* ]]; do
+  case $1 in
+    --screenshots) screenshots=$PWD/docs ;;
+    --sanitizers) preset=asan ;;
+    *)
+      echo "test-authserver: usage: scripts/test-authserver.sh [--screenshots] [--sanitizers] [NAME...]" >&2
+      exit 2
+      ;;
+  esac
+  shift
+done
+
+scripts/packages.sh build authserver e2e
+build=$(scripts/build.sh "$preset" "authserver-$preset" -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
+  -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=ON | tail -n 1)
+
+# Modules are looked for beside the tests: these run where they lie, not in the source tree.
+tests=$(dirname "$build")/authserver-tests
+mkdir -p "$tests"
+if ! cmp --silent tests/authserver/package-lock.json "$tests/installed.json"; then
+  rm -f "$tests/installed.json"
+  cp tests/authserver/package.json tests/authserver/package-lock.json "$tests"
+  if ! (cd "$tests" && npm ci --ignore-scripts --no-audit --no-fund --no-update-notifier) \
+    >"$tests/npm.log" 2>&1; then
+    cat "$tests/npm.log" >&2
+    echo "test-authserver: could not install what tests/authserver/package-lock.json names" >&2
+    exit 1
+  fi
+  cp tests/authserver/package-lock.json "$tests/installed.json"
+  echo "test-authserver: installed the modules of tests/authserver/package-lock.json"
+fi
+rm -f "$tests"/*.mjs
+cp tests/authserver/*.mjs "$tests"
+
+files=("${@/%/.test.mjs}")
+[ $# -gt 0 ] || mapfile -t files < <(cd "$tests" && ls -- *.test.mjs)
+started=$SECONDS
+export PATH=$PATH:/usr/sbin
+export AUTHSERVER_BUILD=$build AUTHSERVER_SOURCE=$PWD/examples/authserver
+export AUTHSERVER_SCREENSHOTS=${screenshots:-$tests/screenshots}
+mkdir -p "$AUTHSERVER_SCREENSHOTS"
+# One file at a time: the path of the database is the same for all of them.
+# shellcheck disable=SC2016 # expanded inside
+if ! scripts/authserver-namespace.sh unshare --pid --fork --kill-child --mount-proc bash -c '
+  cd "$1" && shift && exec node --test --test-concurrency=1 --test-reporter=spec \
+    --test-reporter-destination=stdout --test-reporter=tap --test-reporter-destination=tests.tap \
+    "$@"' test-authserver "$tests" "${files[@]}"; then
+  echo "test-authserver: failed" >&2
+  exit 1
+fi
+
+if [ $# -eq 0 ]; then # every test that the page names was among those that passed
+  # shellcheck disable=SC2016 # backticks of Markdown
+  unheld=$(comm -23 <(grep -oP '^\| .* \| `\K[^`]+(?=` \|$)' docs/authserver.md | sort -u) \
+    <(sed -nE 's/^ *ok [0-9]+ - //p' "$tests/tests.tap" | sort -u))
+  if [ -n "$unheld" ]; then
+    printf 'test-authserver: docs/authserver.md names a test that did not pass: %s\n' "$unheld" >&2
+    exit 1
+  fi
+fi
+echo "test-authserver: passed in $((SECONDS - started)) s, under node $(node --version)"

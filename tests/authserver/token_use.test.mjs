@@ -1,0 +1,147 @@
+// What becomes of tokens: /userinfo (RFC 6750), /introspect (RFC 7662), /revoke (RFC 7009).
+
+import assert from 'node:assert/strict';
+import { after, afterEach, before, test } from 'node:test';
+
+import { issued, refresh } from './code_flow.mjs';
+import { basic, bearer, post, request } from './http.mjs';
+import { assertNotStored, assertRefused, leavesNoTrace } from './outcomes.mjs';
+import { alice, Server } from './server.mjs';
+
+let server, album, printer, gateway;
+before(async () => {
+  server = await Server.start();
+  album = server.addClient({
+    redirectUri: 'https://album.example/callback', scope: 'read write profile', name: 'Photo album' });
+  printer = server.addClient({ redirectUri: 'https://printer.example/done', scope: 'read', name: 'Printer' });
+  gateway = server.addClient({ redirectUri: 'https://gateway.example/', scope: 'introspect', name: 'Gateway' });
+});
+after(() => server.stop());
+afterEach(() => server.clear());
+
+const userinfo = (headers) => request(`${server.issuer}/userinfo`, { headers });
+const introspect = (client, token) => post(server, '/introspect', { token }, basic(client));
+const revoke = (client, token, changes = {}) => post(server, '/revoke', { token, ...changes }, basic(client));
+
+function assertUnauthorized(answer, status, error) {
+  assert.equal(answer.status, status, answer.text);
+  assertNotStored(answer);
+  const challenge = answer.headers['www-authenticate'];
+  if (error === undefined) assert.equal(challenge, 'Bearer realm="authserver"');
+  else assert.match(challenge, new RegExp(`^Bearer realm="authserver", error="${error}", error_description="[^"]+"`));
+}
+
+async function assertInactive(client, token) {
+  const answer = await introspect(client, token);
+  assert.equal(answer.status, 200);
+  assertNotStored(answer);
+  assert.deepEqual(answer.json, { active: false });
+}
+
+test('userinfo tells the name of the user to who has the scope profile', async () => {
+  const { access_token: token } = await issued(server, album);
+  for (const headers of [bearer(token), { authorization: `bearer ${token}` }]) {
+    const answer = await userinfo(headers);
+    assert.equal(answer.status, 200);
+    assertNotStored(answer);
+    assert.deepEqual(answer.json, { sub: 'alice', name: alice.displayName });
+  }
+});
+
+test('userinfo without a token says how to come by one', async () => {
+  assertUnauthorized(await userinfo({}), 401, undefined);
+  assertUnauthorized(await userinfo(basic(album)), 401, undefined);
+});
+
+test('userinfo takes no token from the query', async () => {
+  const { access_token: token } = await issued(server, album);
+  assertUnauthorized(await request(`${server.issuer}/userinfo?access_token=${token}`), 401, undefined);
+});
+
+test('userinfo refuses unknown and expired tokens with invalid_token', async () => {
+  const { access_token: token } = await issued(server, album);
+  const others = ['x', '0'.repeat(64), `${token}0`, token.slice(1), token.toUpperCase(), "' OR '1'='1"];
+  for (const other of others) assertUnauthorized(await userinfo(bearer(other)), 401, 'invalid_token');
+  server.sql("UPDATE oauth_token SET expired_time = strftime('%s', 'now') - 1");
+  assertUnauthorized(await userinfo(bearer(token)), 401, 'invalid_token');
+});
+
+test('userinfo refuses a token of narrower scope with insufficient_scope', async () => {
+  const { access_token: token } = await issued(server, printer);
+  assertUnauthorized(await userinfo(bearer(token)), 403, 'insufficient_scope');
+});
+
+test('the tokens of a disabled client open nothing', async () => {
+  const tokens = await issued(server, album);
+  server.oauthctl('client', 'disable', album.id);
+  assertUnauthorized(await userinfo(bearer(tokens.access_token)), 401, 'invalid_token');
+  await assertInactive(gateway, tokens.access_token);
+  await assertInactive(gateway, tokens.refresh_token);
+  server.oauthctl('client', 'enable', album.id);
+});
+
+test('introspection tells a client about its own tokens', async () => {
+  const tokens = await issued(server, album, { scope: 'read profile' });
+  const common = {
+    active: true, scope: 'read profile', client_id: album.id, username: 'alice', sub: 'alice', iss: server.issuer };
+  const access = await introspect(album, tokens.access_token);
+  assertNotStored(access);
+  const [row] = server.rows().tokens;
+  assert.deepEqual(access.json, { ...common, token_type: 'Bearer', exp: Number(row.expired_time) });
+  assert.deepEqual((await introspect(album, tokens.refresh_token)).json, common);
+});
+
+test('introspection tells other clients nothing unless they are registered for it', async () => {
+  const tokens = await issued(server, album);
+  await assertInactive(printer, tokens.access_token);
+  await assertInactive(printer, tokens.refresh_token);
+  assert.equal((await introspect(gateway, tokens.access_token)).json.active, true);
+  assert.equal((await introspect(gateway, tokens.refresh_token)).json.active, true);
+});
+
+test('introspection calls unknown, expired and spent tokens inactive', async () => {
+  const old = await issued(server, album);
+  const { json: tokens } = await refresh(server, album, old.refresh_token);
+  for (const token of ['x', '0'.repeat(64), "' OR '1'='1", old.access_token, old.refresh_token, old.code])
+    await assertInactive(album, token);
+  server.sql("UPDATE oauth_token SET expired_time = strftime('%s', 'now') - 1");
+  await assertInactive(album, tokens.access_token);
+  assert.equal((await introspect(album, tokens.refresh_token)).json.active, true);
+});
+
+test('revoking the access or the refresh token ends both', async () => {
+  for (const name of ['access_token', 'refresh_token']) {
+    for (const hint of [undefined, 'access_token', 'refresh_token', 'nonsense']) {
+      const kept = await issued(server, album);
+      const tokens = await issued(server, album);
+      const answer = await revoke(album, tokens[name], { token_type_hint: hint });
+      assert.equal(answer.status, 200);
+      assertNotStored(answer);
+      assert.deepEqual(server.rows().tokens.map((row) => row.access_token), [kept.access_token]);
+      assertUnauthorized(await userinfo(bearer(tokens.access_token)), 401, 'invalid_token');
+      assertRefused(await refresh(server, album, tokens.refresh_token), 400, 'invalid_grant');
+      server.clear();
+    }
+  }
+});
+
+test('revoking what is not there succeeds', async () => {
+  for (const token of ['x', '0'.repeat(64), "' OR '1'='1"])
+    assert.equal((await revoke(album, token)).status, 200);
+});
+
+test('nobody can revoke the tokens of another client', async () => {
+  const tokens = await issued(server, album);
+  await leavesNoTrace(server, async () => {
+    for (const client of [printer, gateway])
+      for (const name of ['access_token', 'refresh_token'])
+        assertRefused(await revoke(client, tokens[name]), 400, 'invalid_grant');
+  });
+});
+
+test('a missing or repeated token is refused', async () => {
+  for (const path of ['/revoke', '/introspect']) {
+    assertRefused(await post(server, path, {}, basic(album)), 400, 'invalid_request');
+    assertRefused(await post(server, path, [['token', 'x'], ['token', 'x']], basic(album)), 400, 'invalid_request');
+  }
+});
