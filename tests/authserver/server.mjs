@@ -45,6 +45,7 @@ async function answers(port) {
 
 export class Server {
   #process;
+  #complaints;
 
   static async start(settings = {}) {
     requirePrivateVar();
@@ -63,7 +64,7 @@ export class Server {
 
   async #run() {
     this.#process = spawn('lighttpd', ['-D', '-f', `${process.env.AUTHSERVER_SOURCE}/lighttpd.conf`], {
-      stdio: 'inherit',
+      stdio: ['ignore', 'inherit', 'pipe'],
       env: {
         PATH: process.env.PATH,
         AUTHSERVER_PORT: String(this.port),
@@ -72,8 +73,10 @@ export class Server {
         AUTHSERVER_FOLDER: folder,
       },
     });
+    this.#complaints = '';
+    this.#process.stderr.on('data', (chunk) => (this.#complaints += chunk));
     while (!(await answers(this.port))) {
-      if (this.#process.exitCode !== null) throw new Error('lighttpd did not start');
+      if (this.#process.exitCode !== null) throw new Error(`lighttpd did not start: ${this.#complaints}`);
       await sleep(20);
     }
   }
@@ -81,9 +84,10 @@ export class Server {
   // The programs must have had nothing to complain about but what is expected.
   async stop(expected) {
     this.#process.kill('SIGTERM');
-    await once(this.#process, 'exit');
+    await once(this.#process, 'close');
     const ofItsOwn = / \(server\.c\.\d+\) (server started|server stopped|\[note\])/;
-    const lines = readFileSync(`${folder}/error.log`, 'utf8').split('\n').filter((line) => line !== '');
+    const all = this.#complaints + readFileSync(`${folder}/error.log`, 'utf8');
+    const lines = all.split('\n').filter((line) => line !== '');
     assert.deepEqual(lines.filter((line) => !ofItsOwn.test(line) && !expected?.test(line)), []);
   }
 
