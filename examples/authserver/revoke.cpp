@@ -9,6 +9,9 @@
 namespace authserver {
 namespace {
 
+// RFC 7009 lets a client ignore the body, but there are those that insist on JSON.
+Response revoked() { return jsonResponse(200, Json::Value(Json::objectValue)); }
+
 Response revoke(const Request& http) {
   http.requireSoundParameters();
   const Client client = authenticatedClient(http);
@@ -19,12 +22,12 @@ Response revoke(const Request& http) {
   Transaction transaction(tokens);
   std::optional<Token> token = findAccessToken(tokens, presented);
   if (!token) token = findRefreshToken(tokens, presented);
-  if (!token) return {};  // what is not there needs no revoking
+  if (!token) return revoked();  // what is not there needs no revoking
   if (token->grant.clientId != client.id)
     throw invalidGrant("The token was issued to another client.");
   attempt(tokens, [&] { return tokens.Revoke(token->id); });
   transaction.commit();
-  return {};
+  return revoked();
 }
 
 }  // namespace
