@@ -10,7 +10,7 @@ namespace authserver {
 void audit(const std::string& event) {
   const std::string line = "authserver: " + event + " from " + getRemoteIP();
   ZEVOOAUTHSERVER::OAUTHDBLog log("oauth_log");
-  if (!log.Add(line)) std::cerr << "not in the audit log: " << line << '\n';
+  if (!log.Add(line)) std::cerr << "not in the audit log: " + line + '\n';
 }
 
 std::string quotedForLog(const std::string& text) {

@@ -19,12 +19,12 @@ int serve(const std::vector<std::string>& methods, Response (*answer)(const Requ
     }
     return 0;
   } catch (const std::exception& error) {
-    std::cerr << "authserver: " << error.what() << '\n';
+    std::cerr << std::string("authserver: ") + error.what() + '\n';
   }
   try {
     send(explain({500, "server_error", "Something went wrong on the server."}));
   } catch (const std::exception& error) {  // the web server says so then
-    std::cerr << "authserver: and no answer: " << error.what() << '\n';
+    std::cerr << std::string("authserver: and no answer: ") + error.what() + '\n';
   }
   return 1;
 }

@@ -13,8 +13,9 @@ constexpr int kBusy = 5, kLocked = 6;
 
 void requireOpen(const ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
   if (store.GetErrCode() == ZEVOOAUTHSERVER::kErrNone) return;
-  std::cerr << "authserver: the database did not open [" << store.GetErrCode() << "] "
-            << store.GetErrMsg() << '\n';
+  // In one piece: other programs write to the same log.
+  std::cerr << "authserver: the database did not open [" + std::to_string(store.GetErrCode()) +
+                   "] " + store.GetErrMsg() + '\n';
   throw temporarilyUnavailable();
 }
 
