@@ -115,7 +115,7 @@ test('revoking the access or the refresh token ends both', async () => {
       const kept = await issued(server, album);
       const tokens = await issued(server, album);
       const answer = await revoke(album, tokens[name], { token_type_hint: hint });
-      assert.equal(answer.status, 200);
+      assert.deepEqual([answer.status, answer.json], [200, {}]);
       assertNotStored(answer);
       assert.deepEqual(server.rows().tokens.map((row) => row.access_token), [kept.access_token]);
       assertUnauthorized(await userinfo(bearer(tokens.access_token)), 401, 'invalid_token');

@@ -1,0 +1,98 @@
+// A database that others keep locked: "try again", which is neither yes nor no.
+
+import assert from 'node:assert/strict';
+import { after, afterEach, before, test } from 'node:test';
+
+import { atConsent, allowed, authorizeUrl, issued, refresh, tradeCode } from './code_flow.mjs';
+import { FormBrowser } from './form_browser.mjs';
+import { basic, bearer, post, request } from './http.mjs';
+import { assertErrorPage, assertRedirected, assertRefused, assertTokens } from './outcomes.mjs';
+import { Server } from './server.mjs';
+
+let server, album;
+before(async () => {
+  server = await Server.start();
+  album = server.addClient({
+    redirectUri: 'https://album.example/callback', scope: 'read profile', name: 'Photo album' });
+});
+after(() => server.stop(/^authserver: the database did not open \[-1\] Create table failed$/));
+afterEach(() => server.clear());
+
+const userinfo = (token) => request(`${server.issuer}/userinfo`, { headers: bearer(token) });
+const introspect = (token) => post(server, '/introspect', { token }, basic(album));
+const revoke = (token) => post(server, '/revoke', { token }, basic(album));
+
+// Runs the requests at the same time, each of which waits five seconds or more.
+async function whileLocked(begin, requests) {
+  const lock = await server.lockDatabase(begin);
+  try {
+    return await Promise.all(requests.map((send) => send()));
+  } finally {
+    await lock.release();
+  }
+}
+
+function assertBusy(answers) {
+  for (const answer of answers) {
+    assertRefused(answer, 503, 'temporarily_unavailable');
+    assert.match(answer.headers['retry-after'], /^[1-9]\d*$/);
+  }
+}
+
+function assertBusyPage(answer) {
+  assertErrorPage(answer, 503);
+  assert.match(answer.headers['retry-after'], /^[1-9]\d*$/);
+}
+
+test('a locked database is 503 at every endpoint and spends nothing', async () => {
+  const { code } = await allowed(server, album);
+  const tokens = await issued(server, album);
+  const browser = await atConsent(server, album);
+  const before = server.rows();
+  const [page, form, ...answers] = await whileLocked('BEGIN EXCLUSIVE', [
+    () => new FormBrowser(server).open(authorizeUrl(album)),
+    () => browser.submit('Allow'),
+    () => tradeCode(server, album, code),
+    () => refresh(server, album, tokens.refresh_token),
+    () => introspect(tokens.access_token),
+    () => revoke(tokens.access_token),
+    () => userinfo(tokens.access_token),
+  ]);
+  assertBusyPage(page);
+  assertBusyPage(form);
+  assertBusy(answers);
+  assert.deepEqual(server.rows(), before);
+
+  assertTokens(await tradeCode(server, album, code), { scope: 'read profile' });
+  assert.equal((await userinfo(tokens.access_token)).status, 200);
+  assertTokens(await refresh(server, album, tokens.refresh_token), { scope: 'read profile' });
+});
+
+test('a database that cannot be written is 503 for what spends or issues', async () => {
+  const { code } = await allowed(server, album);
+  const tokens = await issued(server, album);
+  const browser = await atConsent(server, album);
+  const before = server.rows();
+  const [form, user, active, ...answers] = await whileLocked('BEGIN IMMEDIATE', [
+    () => browser.submit('Allow'),
+    () => userinfo(tokens.access_token),
+    () => introspect(tokens.access_token),
+    () => tradeCode(server, album, code),
+    () => refresh(server, album, tokens.refresh_token),
+    () => revoke(tokens.access_token),
+  ]);
+  assertRedirected(form, server, album, 'temporarily_unavailable', { status: 303 });
+  assert.equal(user.status, 200); // who only reads does not notice
+  assert.equal(active.json.active, true);
+  assertBusy(answers);
+  assert.deepEqual(server.rows(), before);
+  assertTokens(await tradeCode(server, album, code), { scope: 'read profile' });
+});
+
+test('a lock shorter than the wait is not noticed', async () => {
+  const { code } = await allowed(server, album);
+  const lock = await server.lockDatabase('BEGIN EXCLUSIVE');
+  const pending = tradeCode(server, album, code);
+  setTimeout(() => lock.release(), 1500);
+  assertTokens(await pending, { scope: 'read profile' });
+});

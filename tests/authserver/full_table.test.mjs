@@ -1,0 +1,84 @@
+// Tables at their ceiling: what is safe to purge goes, then it is "try again".
+
+import assert from 'node:assert/strict';
+import { after, afterEach, before, test } from 'node:test';
+
+import { allowed, atConsent, issued, refresh, tradeCode } from './code_flow.mjs';
+import { assertRedirected, assertRefused, assertTokens, leavesNoTrace } from './outcomes.mjs';
+import { Server } from './server.mjs';
+
+const scope = 'read profile';
+let server, album;
+before(async () => {
+  server = await Server.start();
+  album = server.addClient({ redirectUri: 'https://album.example/callback', scope, name: 'Photo album' });
+});
+after(() => server.stop());
+afterEach(() => {
+  server.set({});
+  server.clear();
+});
+
+const expire = (table, token, ago) =>
+  server.sql(`UPDATE oauth_${table} SET expired_time = strftime('%s', 'now', '${ago}') WHERE access_token = '${token}'`);
+
+test('a full table of codes loses the expired ones and goes on', async () => {
+  for (let i = 0; i < 3; ++i) await allowed(server, album);
+  server.set({ grantcode_max: 3 });
+  server.sql("UPDATE oauth_grantCode SET expired_time = strftime('%s', 'now') - 1 WHERE id < 3");
+  const { code } = await allowed(server, album);
+  assert.equal(server.rows().codes.length, 2);
+  assertTokens(await tradeCode(server, album, code), { scope });
+});
+
+test('a full table of codes that are good is temporarily_unavailable', async () => {
+  for (let i = 0; i < 3; ++i) await allowed(server, album);
+  server.set({ grantcode_max: 3 });
+  const browser = await atConsent(server, album);
+  const answer = await leavesNoTrace(server, () => browser.submit('Allow'));
+  assertRedirected(answer, server, album, 'temporarily_unavailable', { status: 303 });
+});
+
+test('a full table of tokens loses what expired a month ago and goes on', async () => {
+  const long = await issued(server, album);
+  const lately = await issued(server, album);
+  const good = await issued(server, album);
+  const { code } = await allowed(server, album);
+  expire('token', long.access_token, '-31 days');
+  expire('token', lately.access_token, '-29 days');
+  server.set({ token_max: 3 });
+  const answer = await tradeCode(server, album, code);
+  assertTokens(answer, { scope });
+  assert.deepEqual(server.rows().tokens.map((row) => row.access_token).sort(),
+    [lately.access_token, good.access_token, answer.json.access_token].sort());
+  assertTokens(await refresh(server, album, lately.refresh_token), { scope });
+});
+
+test('a full table of tokens that are in use is 503 and the code stays good', async () => {
+  for (let i = 0; i < 3; ++i) await issued(server, album);
+  const { code } = await allowed(server, album);
+  server.set({ token_max: 3 });
+  await leavesNoTrace(server, async () =>
+    assertRefused(await tradeCode(server, album, code), 503, 'temporarily_unavailable'));
+  server.set({});
+  assertTokens(await tradeCode(server, album, code), { scope });
+});
+
+test('a refresh at the ceiling succeeds because it takes as much room as it gives', async () => {
+  const tokens = await issued(server, album);
+  await issued(server, album);
+  server.set({ token_max: 2 });
+  assertTokens(await refresh(server, album, tokens.refresh_token), { scope });
+  assert.equal(server.rows().tokens.length, 2);
+});
+
+test('a refresh above the ceiling is 503 and the refresh token stays good', async () => {
+  const tokens = await issued(server, album);
+  await issued(server, album);
+  await issued(server, album);
+  server.set({ token_max: 1 });
+  await leavesNoTrace(server, async () =>
+    assertRefused(await refresh(server, album, tokens.refresh_token), 503, 'temporarily_unavailable'));
+  server.set({});
+  assertTokens(await refresh(server, album, tokens.refresh_token), { scope });
+});
