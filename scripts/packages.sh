@@ -3,6 +3,7 @@
 #
 #   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare docs
 #                                          abi authserver e2e drawings
+#                                          abi authserver e2e drawings
 #                                          abi authserver
 #   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench authserver e2e drawings
 set -euo pipefail
