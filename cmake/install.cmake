@@ -30,8 +30,9 @@ configure_file(cmake/zevooauth.pc.in zevooauth.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/zevooauth.pc
   DESTINATION ${pkgconfig_folder} COMPONENT development)
 
+# Without the example server, which is the checkout's.
 install(DIRECTORY docs examples DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documentation
-  FILES_MATCHING PATTERN *.md PATTERN *.svg PATTERN *.png PATTERN lifecycle.cpp)
+  FILES_MATCHING PATTERN *.md PATTERN *.svg PATTERN lifecycle.cpp PATTERN authserver* EXCLUDE)
 install(FILES CHANGELOG.md DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documentation)
 
 if(ZEVOOAUTH_BUILD_TOOLS)

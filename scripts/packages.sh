@@ -1,11 +1,9 @@
 #!/usr/bin/env bash
 # Installs what the named groups need from Debian's packages, as far as it is missing.
 #
-#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench package bare docs
-#                                          abi authserver e2e drawings
-#                                          abi authserver e2e drawings
-#                                          abi authserver
-#   scripts/packages.sh GROUP...     groups: build test powerpc check fuzz bench authserver e2e drawings
+#   scripts/packages.sh GROUP...
+#
+# Groups: build test powerpc check fuzz bench package bare docs abi authserver e2e drawings
 set -euo pipefail
 
 declare -A groups=(
