@@ -13,7 +13,8 @@ scripts/packages.sh drawings
 # Calls of the library in blue, on white where the reader's page is dark.
 new=$(sed -E 's/(=> store \[label = "[^"]*")/\1, linecolour = "#0b57a4", textcolour = "#0b57a4"/' \
   docs/authserver-login.msc | mscgen -T svg -i - -o - |
-  sed -E '0,/^<polygon/s//<rect width="100%" height="100%" fill="white"\/>\n<polygon/')
+  sed -E '0,/^<polygon/s//<rect width="100%" height="100%" fill="white"\/>\n<polygon/' |
+  perl -pe 's/(<text x="\d+" y=")(\d+)/$1 . ($2 - 4)/e') # clear of its arrow
 
 if [ "${1-}" = --check ]; then
   if [ "$new" != "$(<"$drawing")" ]; then
