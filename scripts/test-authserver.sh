@@ -57,11 +57,14 @@ export AUTHSERVER_SCREENSHOTS=${screenshots:-$tests/screenshots}
 mkdir -p "$AUTHSERVER_SCREENSHOTS"
 # One file at a time: the path of the database is the same for all of them.
 # shellcheck disable=SC2016 # expanded inside
-if ! scripts/authserver-namespace.sh unshare --pid --fork --kill-child --mount-proc bash -c '
+scripts/authserver-namespace.sh unshare --pid --fork --kill-child --mount-proc bash -c '
   export HOME=/var/tmp
   cd "$1" && shift && exec node --test --test-concurrency=1 --test-reporter=spec \
     --test-reporter-destination=stdout --test-reporter=tap --test-reporter-destination=tests.tap \
-    "$@"' test-authserver "$tests" "${files[@]}"; then
+    "$@"' test-authserver "$tests" "${files[@]}" &
+runner=$!
+trap 'kill -KILL "$runner" 2>/dev/null || true' EXIT # and with it all processes in there
+if ! wait "$runner"; then
   echo "test-authserver: failed" >&2
   exit 1
 fi

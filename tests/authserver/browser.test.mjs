@@ -12,7 +12,12 @@ import { assertTokens } from './outcomes.mjs';
 import { alice, Server } from './server.mjs';
 
 const axe = readFileSync(new URL('node_modules/axe-core/axe.min.js', import.meta.url), 'utf8');
-const phone = { viewport: { width: 360, height: 640 }, isMobile: true, hasTouch: true, deviceScaleFactor: 2 };
+const phone = {
+  viewport: { width: 360, height: 640 },
+  isMobile: true,
+  hasTouch: true,
+  deviceScaleFactor: 2,
+};
 const script = `"'><script>alert(1)</script><img src=x onerror=alert(1)>`;
 const mallory = { name: 'mallory', displayName: script, password: 'open sesame 8' };
 let server, application, callbacks, browser, album, remote, hostile;
@@ -23,18 +28,33 @@ before(async () => {
   application = http
     .createServer((request, answer) => {
       const framing = request.url === '/frame';
-      if (request.url.startsWith('/callback')) callbacks.push(new URL(request.url, server.issuer).searchParams);
+      if (request.url.startsWith('/callback'))
+        callbacks.push(new URL(request.url, server.issuer).searchParams);
       answer.setHeader('content-type', 'text/html');
-      answer.end(framing ? `<iframe src="${server.issuer}${authorizeUrl(album)}"></iframe>` : '<h1>Back again</h1>');
+      answer.end(
+        framing
+          ? `<iframe src="${server.issuer}${authorizeUrl(album)}"></iframe>`
+          : '<h1>Back again</h1>',
+      );
     })
     .listen(0, '127.0.0.1');
   await once(application, 'listening');
   const here = `http://127.0.0.1:${application.address().port}`;
-  album = server.addClient({ redirectUri: `${here}/callback`, scope: 'read write profile', name: 'Photo album' });
+  album = server.addClient({
+    redirectUri: `${here}/callback`,
+    scope: 'read write profile',
+    name: 'Photo album',
+  });
   remote = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read write profile', name: 'Photo album' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read write profile',
+    name: 'Photo album',
+  });
   hostile = server.addClient({
-    redirectUri: `${here}/callback?"'><script>`, scope: '<script>alert(1)</script>', name: script.slice(0, 64) });
+    redirectUri: `${here}/callback?"'><script>`,
+    scope: '<script>alert(1)</script>',
+    name: script.slice(0, 64),
+  });
   browser = await launch();
 });
 after(async () => {
@@ -59,7 +79,8 @@ async function inWindow(options, steps) {
   }
 }
 
-const open = (page, client = album, changes = {}) => page.goto(server.issuer + authorizeUrl(client, changes));
+const open = (page, client = album, changes = {}) =>
+  page.goto(server.issuer + authorizeUrl(client, changes));
 const heading = (page, name) => page.getByRole('heading', { level: 1, name }).waitFor();
 const button = (page, name) => page.getByRole('button', { name, exact: true });
 
@@ -91,8 +112,11 @@ for (const [where, options] of Object.entries(windows)) {
       await logIn(page);
       await heading(page, 'Allow Photo album?');
       await page.getByText('You are logged in as Alice Miller').waitFor();
-      assert.deepEqual(await page.getByRole('listitem').allTextContents(),
-        ['See your photos and albums', 'Add, change and delete your photos and albums', 'Know your name']);
+      assert.deepEqual(await page.getByRole('listitem').allTextContents(), [
+        'See your photos and albums',
+        'Add, change and delete your photos and albums',
+        'Know your name',
+      ]);
       await page.getByText(`you go back to ${new URL(album.redirectUri).host}`).waitFor();
       await button(page, 'Allow').click();
       await heading(page, 'Back again');
@@ -119,7 +143,10 @@ for (const [where, options] of Object.entries(windows)) {
       for (const label of ['Name', 'Password']) {
         const field = page.getByLabel(label);
         assert.equal(await field.getAttribute('aria-invalid'), 'true');
-        assert.equal(await field.getAttribute('aria-describedby'), await page.getByRole('alert').getAttribute('id'));
+        assert.equal(
+          await field.getAttribute('aria-describedby'),
+          await page.getByRole('alert').getAttribute('id'),
+        );
       }
       assert.equal(await page.getByLabel('Name').inputValue(), 'alice');
       assert.equal(await page.getByLabel('Password').inputValue(), '');
@@ -163,7 +190,10 @@ test('everything can be done with the keyboard, and the focus is seen', () =>
     assert.equal(await tab(), 'Log in');
     await page.keyboard.press('Space');
     await heading(page, 'Allow Photo album?');
-    assert.deepEqual([await tab(), await tab(), await tab()], ['Not you? Use another account', 'Allow', 'Deny']);
+    assert.deepEqual(
+      [await tab(), await tab(), await tab()],
+      ['Not you? Use another account', 'Allow', 'Deny'],
+    );
     await page.keyboard.press('Shift+Tab');
     await page.keyboard.press('Enter');
     await heading(page, 'Back again');
@@ -182,12 +212,22 @@ test('Enter in the password field logs in', () =>
 async function assertAccessible(page) {
   await page.evaluate(axe);
   const { violations, passes } = await page.evaluate(() =>
-    globalThis.axe.run({ runOnly: ['wcag2a', 'wcag2aa', 'wcag21a', 'wcag21aa', 'wcag22aa', 'best-practice'] }));
-  assert.deepEqual(violations.map(({ id, nodes }) => [id, nodes.map((node) => node.html)]), []);
+    globalThis.axe.run({
+      runOnly: ['wcag2a', 'wcag2aa', 'wcag21a', 'wcag21aa', 'wcag22aa', 'best-practice'],
+    }),
+  );
+  assert.deepEqual(
+    violations.map(({ id, nodes }) => [id, nodes.map((node) => node.html)]),
+    [],
+  );
   assert.ok(passes.some(({ id }) => id === 'color-contrast'));
 }
 
-for (const [where, options] of Object.entries({ 'on a desk': {}, 'on a phone': phone, 'in the dark': { colorScheme: 'dark' } }))
+for (const [where, options] of Object.entries({
+  'on a desk': {},
+  'on a phone': phone,
+  'in the dark': { colorScheme: 'dark' },
+}))
   test(`the pages meet WCAG 2.2 AA as far as a program can tell ${where}`, () =>
     inWindow(options, async (page) => {
       await open(page);
@@ -211,7 +251,10 @@ test('the error page meets WCAG 2.2 AA as far as a program can tell', async () =
 test('nothing is wider than a narrow phone or smaller than a finger, also with long names', () =>
   inWindow({ ...phone, viewport: { width: 320, height: 480 } }, async (page) => {
     const long = server.addClient({
-      redirectUri: `https://${'l'.repeat(60)}.${'l'.repeat(60)}.example/`, scope: 's'.repeat(200), name: 'W'.repeat(64) });
+      redirectUri: `https://${'l'.repeat(60)}.${'l'.repeat(60)}.example/`,
+      scope: 's'.repeat(200),
+      name: 'W'.repeat(64),
+    });
     await open(page, long);
     const assertFits = async () => {
       const width = await page.evaluate(() => document.documentElement.scrollWidth);
@@ -241,8 +284,13 @@ test('scripts in every field are shown as text and do not run', () =>
     await assertHarmless();
     await logIn(page, mallory);
     await heading(page, `Allow ${hostile.name}?`);
-    assert.equal(await page.getByRole('paragraph').locator('strong').first().textContent(), mallory.displayName);
-    assert.deepEqual(await page.getByRole('listitem').allTextContents(), ['<script>alert(1)</script>']);
+    assert.equal(
+      await page.getByRole('paragraph').locator('strong').first().textContent(),
+      mallory.displayName,
+    );
+    assert.deepEqual(await page.getByRole('listitem').allTextContents(), [
+      '<script>alert(1)</script>',
+    ]);
     await assertHarmless();
     await button(page, 'Allow').click();
     await heading(page, 'Back again');
@@ -256,7 +304,10 @@ test('scripts in a refused request are not even shown', async () => {
     await heading(page, 'This does not work');
     assert.doesNotMatch(await page.content(), /alert\(1\)/);
   }
-  assert.deepEqual(complaints.filter((text) => !/status of 400/.test(text)), []);
+  assert.deepEqual(
+    complaints.filter((text) => !/status of 400/.test(text)),
+    [],
+  );
   await close();
 });
 
@@ -264,7 +315,10 @@ test('the policy stops scripts, styles, images and foreign forms that got into a
   const { page, complaints, close } = await openWindow(browser);
   await open(page);
   await page.evaluate(() => {
-    document.body.insertAdjacentHTML('beforeend', '<img src="/style.css" onerror="document.title = 1"><p style="color:red">');
+    document.body.insertAdjacentHTML(
+      'beforeend',
+      '<img src="/style.css" onerror="document.title = 1"><p style="color:red">',
+    );
     const script = document.createElement('script');
     script.textContent = 'document.title = "taken over"';
     document.body.append(script);
@@ -277,7 +331,9 @@ test('the policy stops scripts, styles, images and foreign forms that got into a
   await button(page, 'Log in').click({ noWaitAfter: true }); // it leads nowhere
   await page.waitForTimeout(500);
   assert.equal(page.url(), before);
-  const blocked = complaints.map((text) => /"?(script-src|style-src|img-src|default-src|form-action)/.exec(text)?.[1]);
+  const blocked = complaints.map(
+    (text) => /"?(script-src|style-src|img-src|default-src|form-action)/.exec(text)?.[1],
+  );
   for (const directive of ['style-src', 'form-action', 'default-src'])
     assert.ok(blocked.includes(directive), `${directive}: ${complaints.join('\n')}`);
   assert.deepEqual(server.rows(), { codes: [], tokens: [] });
@@ -289,7 +345,10 @@ test('no other site can show the pages in a frame', async () => {
   await page.goto(new URL('/frame', album.redirectUri).href);
   await page.waitForTimeout(500);
   assert.equal(await page.frameLocator('iframe').getByLabel('Password').count(), 0);
-  assert.ok(complaints.some((text) => text.includes('frame-ancestors')), complaints.join('\n'));
+  assert.ok(
+    complaints.some((text) => text.includes('frame-ancestors')),
+    complaints.join('\n'),
+  );
   await close();
 });
 
@@ -304,7 +363,10 @@ test('no script can read the session', () =>
   }));
 
 test('screenshots of both pages stay small', async () => {
-  for (const [suffix, options] of [['', { viewport: { width: 720, height: 520 } }], ['-phone', { ...phone, deviceScaleFactor: 1 }]])
+  for (const [suffix, options] of [
+    ['', { viewport: { width: 720, height: 520 } }],
+    ['-phone', { ...phone, deviceScaleFactor: 1 }],
+  ])
     await inWindow(options, async (page) => {
       const shoot = async (name) => {
         const path = `${process.env.AUTHSERVER_SCREENSHOTS}/authserver-${name}${suffix}.png`;

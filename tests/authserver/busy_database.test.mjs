@@ -13,7 +13,10 @@ let server, album;
 before(async () => {
   server = await Server.start();
   album = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read profile', name: 'Photo album' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read profile',
+    name: 'Photo album',
+  });
 });
 after(() => server.stop(/^authserver: the database did not open \[-1\] Create table failed$/));
 afterEach(() => server.clear());

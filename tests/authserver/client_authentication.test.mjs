@@ -12,8 +12,15 @@ let server, album, printer;
 before(async () => {
   server = await Server.start();
   album = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read write profile', name: 'Photo album' });
-  printer = server.addClient({ redirectUri: 'https://printer.example/done', scope: 'read', name: 'Printer' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read write profile',
+    name: 'Photo album',
+  });
+  printer = server.addClient({
+    redirectUri: 'https://printer.example/done',
+    scope: 'read',
+    name: 'Printer',
+  });
 });
 after(() => server.stop());
 afterEach(() => server.clear());
@@ -34,7 +41,11 @@ async function refusedEverywhere(parameters, headers, status, error) {
 }
 
 test('clients authenticate by header or by form', async () => {
-  for (const [changes, headers] of [[{}, basic(album)], [inForm(album), {}], [{ client_id: album.id }, basic(album)]]) {
+  for (const [changes, headers] of [
+    [{}, basic(album)],
+    [inForm(album), {}],
+    [{ client_id: album.id }, basic(album)],
+  ]) {
     const { code } = await allowed(server, album);
     assertTokens(await tradeCode(server, album, code, changes, headers), { scope });
   }
@@ -74,14 +85,23 @@ const fill = (text) =>
     .replace('OTHER', printer.secret);
 for (const [what, [parameters, text]] of Object.entries(wrong)) {
   test(`wrong credentials are refused with invalid_client: ${what}`, async () => {
-    const filled = Object.fromEntries(Object.entries(parameters).map(([name, value]) => [name, fill(value)]));
+    const filled = Object.fromEntries(
+      Object.entries(parameters).map(([name, value]) => [name, fill(value)]),
+    );
     const headers = typeof text === 'string' ? header(fill(text)) : {};
     await refusedEverywhere(filled, headers, 401, 'invalid_client');
   });
 }
 
 test('headers that are no basic authentication are refused with invalid_client', async () => {
-  for (const authorization of ['Basic', 'Basic ', 'Basic ???', 'Bearer x', 'Negotiate x', basic(album).authorization.slice(6)])
+  for (const authorization of [
+    'Basic',
+    'Basic ',
+    'Basic ???',
+    'Bearer x',
+    'Negotiate x',
+    basic(album).authorization.slice(6),
+  ])
     await refusedEverywhere({}, { authorization }, 401, 'invalid_client');
 });
 
@@ -93,9 +113,18 @@ test('both ways at once are refused with invalid_request', async () => {
 test('a repeated secret is refused with invalid_request', async () => {
   const { code } = await allowed(server, album);
   const parameters = Object.entries({
-    grant_type: 'authorization_code', code, redirect_uri: album.redirectUri, ...inForm(album) });
+    grant_type: 'authorization_code',
+    code,
+    redirect_uri: album.redirectUri,
+    ...inForm(album),
+  });
   await leavesNoTrace(server, async () =>
-    assertRefused(await post(server, '/token', [...parameters, ['client_secret', 'x']]), 400, 'invalid_request'));
+    assertRefused(
+      await post(server, '/token', [...parameters, ['client_secret', 'x']]),
+      400,
+      'invalid_request',
+    ),
+  );
 });
 
 test('a disabled client is refused with all that it holds', async () => {
@@ -106,7 +135,11 @@ test('a disabled client is refused with all that it holds', async () => {
     assertRefused(await tradeCode(server, printer, code), 401, 'invalid_client');
     assertRefused(await refresh(server, printer, tokens.refresh_token), 401, 'invalid_client');
     for (const path of ['/revoke', '/introspect'])
-      assertRefused(await post(server, path, { token: tokens.access_token }, basic(printer)), 401, 'invalid_client');
+      assertRefused(
+        await post(server, path, { token: tokens.access_token }, basic(printer)),
+        401,
+        'invalid_client',
+      );
   });
   server.oauthctl('client', 'enable', printer.id);
   assertTokens(await tradeCode(server, printer, code), { scope: 'read' });

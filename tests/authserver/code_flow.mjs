@@ -47,12 +47,22 @@ export async function allowed(server, client, changes = {}, user = alice) {
 }
 
 export function tradeCode(server, client, code, changes = {}, headers = basic(client)) {
-  const parameters = { grant_type: 'authorization_code', code, redirect_uri: client.redirectUri, ...changes };
+  const parameters = {
+    grant_type: 'authorization_code',
+    code,
+    redirect_uri: client.redirectUri,
+    ...changes,
+  };
   return post(server, '/token', parameters, headers);
 }
 
 export function refresh(server, client, token, changes = {}, headers = basic(client)) {
-  return post(server, '/token', { grant_type: 'refresh_token', refresh_token: token, ...changes }, headers);
+  return post(
+    server,
+    '/token',
+    { grant_type: 'refresh_token', refresh_token: token, ...changes },
+    headers,
+  );
 }
 
 // Tokens as the client gets them.

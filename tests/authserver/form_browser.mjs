@@ -28,7 +28,10 @@ export class FormBrowser {
   async open(target, options = {}) {
     const url = new URL(target, this.origin);
     const cookie = [...this.#cookies].map(([name, value]) => `${name}=${value}`).join('; ');
-    const answer = await request(url, { ...options, headers: { ...options.headers, ...(cookie && { cookie }) } });
+    const answer = await request(url, {
+      ...options,
+      headers: { ...options.headers, ...(cookie && { cookie }) },
+    });
     for (const header of answer.headers['set-cookie'] ?? []) {
       const [, name, value] = /^([^=]+)=([^;]*)/.exec(header);
       this.#cookies.set(name, value);
@@ -43,7 +46,9 @@ export class FormBrowser {
   fields(changes = {}) {
     const form = [...elements(this.page.document)].find((element) => element.tagName === 'form');
     const inputs = [...elements(form)].filter((element) => element.tagName === 'input');
-    const own = Object.fromEntries(inputs.map((input) => [attribute(input, 'name'), attribute(input, 'value') ?? '']));
+    const own = Object.fromEntries(
+      inputs.map((input) => [attribute(input, 'name'), attribute(input, 'value') ?? '']),
+    );
     return { ...own, ...changes };
   }
 
@@ -51,7 +56,9 @@ export class FormBrowser {
   submit(label, changes = {}) {
     const all = [...elements(this.page.document)];
     const form = all.find((element) => element.tagName === 'form');
-    const button = all.find((element) => element.tagName === 'button' && textOf(element).includes(label));
+    const button = all.find(
+      (element) => element.tagName === 'button' && textOf(element).includes(label),
+    );
     if (!button) throw new Error(`no button "${label}" in: ${this.page.text}`);
     const pressed = { [attribute(button, 'name')]: attribute(button, 'value') };
     return this.post(attribute(form, 'action'), { ...this.fields(), ...pressed, ...changes });

@@ -14,8 +14,15 @@ before(async () => {
   server = await Server.start();
   server.addUser(bob);
   album = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read write profile', name: 'Photo album' });
-  printer = server.addClient({ redirectUri: 'https://printer.example/done', scope: 'read', name: 'Printer' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read write profile',
+    name: 'Photo album',
+  });
+  printer = server.addClient({
+    redirectUri: 'https://printer.example/done',
+    scope: 'read',
+    name: 'Printer',
+  });
 });
 after(() => server.stop());
 afterEach(() => server.clear());
@@ -40,8 +47,14 @@ function assertLoginFailed(browser, name) {
 test('a wrong password, an unknown user and an empty field get the same page', async () => {
   await leavesNoTrace(server, async () => {
     const attempts = [
-      ['alice', 'wrong'], ['nobody', alice.password], ['', ''], ['alice', ''], ['', alice.password],
-      ['alice', `${alice.password} `], ['Alice', alice.password], ["alice' --", alice.password],
+      ['alice', 'wrong'],
+      ['nobody', alice.password],
+      ['', ''],
+      ['alice', ''],
+      ['', alice.password],
+      ['alice', `${alice.password} `],
+      ['Alice', alice.password],
+      ["alice' --", alice.password],
     ];
     for (const [name, password] of attempts) {
       const browser = await atLogin();
@@ -67,7 +80,11 @@ test('login gives a new session', async () => {
   const browser = await atLogin();
   const [before] = browser.page.headers['set-cookie'];
   const answer = await browser.post('/authorize', {
-    ...browser.fields(), username: alice.name, password: alice.password, action: 'login' });
+    ...browser.fields(),
+    username: alice.name,
+    password: alice.password,
+    action: 'login',
+  });
   assert.match(answer.text, /Alice Miller/);
   const other = new FormBrowser(server); // with the cookie of before the login
   const page = await other.open(authorizeUrl(album), { headers: { cookie: before.split(';')[0] } });
@@ -85,8 +102,10 @@ test('allowing gives a code and nothing else', async () => {
   assert.deepEqual(tokens, []);
   assert.equal(codes.length, 1);
   const { username, client_id: client, scope, ip } = codes[0];
-  assert.deepEqual({ code: codes[0].code, username, client, scope, ip },
-    { code, username: 'alice', client: album.id, scope: 'read write profile', ip: '127.0.0.1' });
+  assert.deepEqual(
+    { code: codes[0].code, username, client, scope, ip },
+    { code, username: 'alice', client: album.id, scope: 'read write profile', ip: '127.0.0.1' },
+  );
 });
 
 test('denying sends access_denied and leaves nothing', async () => {
@@ -102,7 +121,10 @@ test('another account can be used instead', async () => {
   await logIn(browser, bob);
   assert.match(browser.page.text, /Bob O(&#39;|')Neil/);
   await browser.submit('Allow');
-  assert.deepEqual(server.rows().codes.map((row) => row.username), ['bob']);
+  assert.deepEqual(
+    server.rows().codes.map((row) => row.username),
+    ['bob'],
+  );
 });
 
 test('a form without, with a changed or with a foreign CSRF field does nothing', async () => {
@@ -111,8 +133,14 @@ test('a form without, with a changed or with a foreign CSRF field does nothing',
   const browser = await atConsent(server, album);
   const consent = browser.fields({ action: 'allow' });
   const foreign = [
-    undefined, '', 'x', consent.csrf.slice(1), `${consent.csrf}A`, consent.csrf.toUpperCase(),
-    stranger.fields().csrf, otherRequest.fields().csrf,
+    undefined,
+    '',
+    'x',
+    consent.csrf.slice(1),
+    `${consent.csrf}A`,
+    consent.csrf.toUpperCase(),
+    stranger.fields().csrf,
+    otherRequest.fields().csrf,
   ];
   await leavesNoTrace(server, async () => {
     for (const csrf of foreign)
@@ -126,7 +154,11 @@ test('a login form of another site logs nobody in', async () => {
   const attacker = await atLogin();
   const victim = await atLogin();
   const answer = await victim.post('/authorize', {
-    ...attacker.fields(), username: alice.name, password: alice.password, action: 'login' });
+    ...attacker.fields(),
+    username: alice.name,
+    password: alice.password,
+    action: 'login',
+  });
   assertErrorPage(answer, 403);
   await victim.open(authorizeUrl(album));
   assert.match(victim.page.text, /<h1>Log in<\/h1>/);
@@ -136,20 +168,28 @@ test('a form without its cookie does nothing', async () => {
   const browser = await atConsent(server, album);
   const consent = browser.fields({ action: 'allow' });
   browser.forgetCookies();
-  await leavesNoTrace(server, async () => assertErrorPage(await browser.post('/authorize', consent), 403));
+  await leavesNoTrace(server, async () =>
+    assertErrorPage(await browser.post('/authorize', consent), 403),
+  );
 });
 
 test('a changed request in the consent form does nothing', async () => {
   const browser = await atConsent(server, printer, { scope: 'read' });
   const consent = browser.fields({ action: 'allow' });
   const changes = [
-    { client_id: album.id, redirect_uri: album.redirectUri }, { scope: 'read write' }, { state: 'mine' },
-    { code_challenge: 'x'.repeat(43), code_challenge_method: 'S256' }, { response_type: undefined },
+    { client_id: album.id, redirect_uri: album.redirectUri },
+    { scope: 'read write' },
+    { state: 'mine' },
+    { code_challenge: 'x'.repeat(43), code_challenge_method: 'S256' },
+    { response_type: undefined },
   ];
   await leavesNoTrace(server, async () => {
     for (const change of changes)
       assertErrorPage(await browser.post('/authorize', { ...consent, ...change }), 403);
-    assertErrorPage(await browser.post('/authorize', { ...consent, redirect_uri: 'https://evil.example/' }), 400);
+    assertErrorPage(
+      await browser.post('/authorize', { ...consent, redirect_uri: 'https://evil.example/' }),
+      400,
+    );
   });
 });
 
@@ -174,16 +214,26 @@ test('a session with a changed or forged cookie is none', async () => {
   const header = browser.page.headers['set-cookie']?.[0] ?? '';
   assert.equal(header, ''); // the consent page sets none
   const user = Buffer.from('alice').toString('base64url');
-  for (const cookie of [`${user}.9999999999.0.`, `${user}.9999999999.${'0'.repeat(32)}.${'A'.repeat(43)}`, '...', '.', '',
-    'x'.repeat(5000)]) {
-    const page = await new FormBrowser(server).open(authorizeUrl(album), { headers: { cookie: `authserver=${cookie}` } });
+  for (const cookie of [
+    `${user}.9999999999.0.`,
+    `${user}.9999999999.${'0'.repeat(32)}.${'A'.repeat(43)}`,
+    '...',
+    '.',
+    '',
+    'x'.repeat(5000),
+  ]) {
+    const page = await new FormBrowser(server).open(authorizeUrl(album), {
+      headers: { cookie: `authserver=${cookie}` },
+    });
     assert.equal(page.status, 200);
     assert.match(page.text, /<h1>Log in<\/h1>/);
   }
 });
 
 test('the same user can log in on many devices', async () => {
-  const codes = [await allowed(server, album), await allowed(server, album)].map((answer) => answer.code);
+  const codes = [await allowed(server, album), await allowed(server, album)].map(
+    (answer) => answer.code,
+  );
   assert.equal(new Set(codes).size, 2);
   assert.equal(server.rows().codes.length, 2);
 });

@@ -11,7 +11,11 @@ const scope = 'read profile';
 let server, album;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({ redirectUri: 'https://album.example/callback', scope, name: 'Photo album' });
+  album = server.addClient({
+    redirectUri: 'https://album.example/callback',
+    scope,
+    name: 'Photo album',
+  });
 });
 after(() => server.stop());
 afterEach(() => {
@@ -20,7 +24,9 @@ afterEach(() => {
 });
 
 const expire = (table, token, ago) =>
-  server.sql(`UPDATE oauth_${table} SET expired_time = strftime('%s', 'now', '${ago}') WHERE access_token = '${token}'`);
+  server.sql(
+    `UPDATE oauth_${table} SET expired_time = strftime('%s', 'now', '${ago}') WHERE access_token = '${token}'`,
+  );
 
 test('a full table of codes loses the expired ones and goes on', async () => {
   for (let i = 0; i < 3; ++i) await allowed(server, album);
@@ -49,8 +55,13 @@ test('a full table of tokens loses what expired a month ago and goes on', async 
   server.set({ token_max: 3 });
   const answer = await tradeCode(server, album, code);
   assertTokens(answer, { scope });
-  assert.deepEqual(server.rows().tokens.map((row) => row.access_token).sort(),
-    [lately.access_token, good.access_token, answer.json.access_token].sort());
+  assert.deepEqual(
+    server
+      .rows()
+      .tokens.map((row) => row.access_token)
+      .sort(),
+    [lately.access_token, good.access_token, answer.json.access_token].sort(),
+  );
   assertTokens(await refresh(server, album, lately.refresh_token), { scope });
 });
 
@@ -59,7 +70,8 @@ test('a full table of tokens that are in use is 503 and the code stays good', as
   const { code } = await allowed(server, album);
   server.set({ token_max: 3 });
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, album, code), 503, 'temporarily_unavailable'));
+    assertRefused(await tradeCode(server, album, code), 503, 'temporarily_unavailable'),
+  );
   server.set({});
   assertTokens(await tradeCode(server, album, code), { scope });
 });
@@ -78,7 +90,12 @@ test('a refresh above the ceiling is 503 and the refresh token stays good', asyn
   await issued(server, album);
   server.set({ token_max: 1 });
   await leavesNoTrace(server, async () =>
-    assertRefused(await refresh(server, album, tokens.refresh_token), 503, 'temporarily_unavailable'));
+    assertRefused(
+      await refresh(server, album, tokens.refresh_token),
+      503,
+      'temporarily_unavailable',
+    ),
+  );
   server.set({});
   assertTokens(await refresh(server, album, tokens.refresh_token), { scope });
 });

@@ -6,16 +6,21 @@ import net from 'node:net';
 export function request(url, { method = 'GET', headers = {}, body } = {}) {
   return new Promise((resolve, reject) => {
     const length = body === undefined ? {} : { 'content-length': Buffer.byteLength(body) };
-    const outgoing = http.request(url, { method, headers: { ...length, ...headers }, agent: false }, (answer) => {
-      const chunks = [];
-      answer.on('data', (chunk) => chunks.push(chunk));
-      answer.on('error', reject);
-      answer.on('end', () => {
-        const text = Buffer.concat(chunks).toString('utf8');
-        const json = answer.headers['content-type'] === 'application/json' ? JSON.parse(text) : undefined;
-        resolve({ status: answer.statusCode, headers: answer.headers, text, json });
-      });
-    });
+    const outgoing = http.request(
+      url,
+      { method, headers: { ...length, ...headers }, agent: false },
+      (answer) => {
+        const chunks = [];
+        answer.on('data', (chunk) => chunks.push(chunk));
+        answer.on('error', reject);
+        answer.on('end', () => {
+          const text = Buffer.concat(chunks).toString('utf8');
+          const json =
+            answer.headers['content-type'] === 'application/json' ? JSON.parse(text) : undefined;
+          resolve({ status: answer.statusCode, headers: answer.headers, text, json });
+        });
+      },
+    );
     outgoing.on('error', reject);
     outgoing.end(body);
   });
@@ -51,6 +56,8 @@ export function raw(server, bytes) {
     const socket = net.connect(server.port, '127.0.0.1', () => socket.end(bytes));
     socket.on('data', (chunk) => (text += chunk.toString('latin1')));
     socket.on('error', reject);
-    socket.on('close', () => resolve({ status: Number(/^HTTP\/1\.[01] (\d+)/.exec(text)?.[1] ?? 0), text }));
+    socket.on('close', () =>
+      resolve({ status: Number(/^HTTP\/1\.[01] (\d+)/.exec(text)?.[1] ?? 0), text }),
+    );
   });
 }

@@ -54,8 +54,18 @@ test('each endpoint refuses other methods than its own with 405', async () => {
 });
 
 test('there is nothing behind or beside the endpoints', async () => {
-  for (const path of ['/', '/token/', '/token/x', '/metadata', '/templates/login.tpl',
-    '/../lighttpd.conf', '/%2e%2e/lighttpd.conf', '/users.json', '/authserver_setup', '/token.cpp']) {
+  for (const path of [
+    '/',
+    '/token/',
+    '/token/x',
+    '/metadata',
+    '/templates/login.tpl',
+    '/../lighttpd.conf',
+    '/%2e%2e/lighttpd.conf',
+    '/users.json',
+    '/authserver_setup',
+    '/token.cpp',
+  ]) {
     const answer = await request(server.issuer + path);
     assert.equal(answer.status, path === '/' ? 403 : 404, path);
     assert.doesNotMatch(answer.text, /authserver/i, path);

@@ -39,13 +39,22 @@ export function assertErrorPage(answer, status) {
   assert.equal(answer.headers['content-type'], 'text/html; charset=utf-8');
   assert.equal(answer.headers.location, undefined);
   assert.equal(answer.headers['set-cookie'], undefined);
-  assert.match(answer.headers['content-security-policy'], /^default-src 'none'; .*form-action 'none'$/);
+  assert.match(
+    answer.headers['content-security-policy'],
+    /^default-src 'none'; .*form-action 'none'$/,
+  );
   assert.match(answer.text, /<h1>This does not work<\/h1>/);
 }
 
 // An error that the client is told by redirect (RFC 6749, section 4.1.2.1, and RFC 9207);
 // state is null if there is none to send back.
-export function assertRedirected(answer, server, client, error, { status = 302, state = 'as it was' } = {}) {
+export function assertRedirected(
+  answer,
+  server,
+  client,
+  error,
+  { status = 302, state = 'as it was' } = {},
+) {
   assert.equal(answer.status, status, answer.text);
   assert.equal(answer.headers['cache-control'], 'no-store');
   const location = new URL(answer.headers.location);

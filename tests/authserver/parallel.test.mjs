@@ -12,7 +12,10 @@ let server, album;
 before(async () => {
   server = await Server.start();
   album = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read profile', name: 'Photo album' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read profile',
+    name: 'Photo album',
+  });
 });
 after(() => server.stop());
 afterEach(() => server.clear());
@@ -46,14 +49,19 @@ test('of 8 that use one refresh token at once exactly one wins', async () => {
     const { refresh_token: token } = await issued(server, album);
     const winner = assertOneWon(await eight(() => refresh(server, album, token)));
     const { tokens } = server.rows();
-    assert.deepEqual(tokens.map((row) => row.access_token), [winner.access_token]);
+    assert.deepEqual(
+      tokens.map((row) => row.access_token),
+      [winner.access_token],
+    );
     server.clear();
   }
 });
 
 test('of 8 that use the refresh tokens of 8 logins at once all win', async () => {
   const logins = await eight(() => issued(server, album));
-  const answers = await Promise.all(logins.map((login) => refresh(server, album, login.refresh_token)));
+  const answers = await Promise.all(
+    logins.map((login) => refresh(server, album, login.refresh_token)),
+  );
   for (const answer of answers) assertTokens(answer, { scope: 'read profile' });
   assert.equal(server.rows().tokens.length, 8);
 });
@@ -68,7 +76,9 @@ test('200 full logins at 8 in parallel all succeed', async (t) => {
       const { code } = await allowed(server, album, withChallenge({ challenge }));
       const answer = await tradeCode(server, album, code, { code_verifier: verifier });
       assertTokens(answer, { scope: 'read profile' });
-      const user = await request(`${server.issuer}/userinfo`, { headers: bearer(answer.json.access_token) });
+      const user = await request(`${server.issuer}/userinfo`, {
+        headers: bearer(answer.json.access_token),
+      });
       assert.deepEqual(user.json, { sub: alice.name, name: alice.displayName });
       seen.add(answer.json.access_token).add(answer.json.refresh_token);
     }

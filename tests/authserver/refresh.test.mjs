@@ -12,8 +12,15 @@ let server, album, printer;
 before(async () => {
   server = await Server.start();
   album = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read write profile', name: 'Photo album' });
-  printer = server.addClient({ redirectUri: 'https://printer.example/done', scope: 'read', name: 'Printer' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read write profile',
+    name: 'Photo album',
+  });
+  printer = server.addClient({
+    redirectUri: 'https://printer.example/done',
+    scope: 'read',
+    name: 'Printer',
+  });
 });
 after(() => server.stop());
 afterEach(() => server.clear());
@@ -32,7 +39,8 @@ test('a refresh token is traded once for new tokens, which replace the old', asy
   assert.equal((await userinfo(old.access_token)).status, 401);
   assert.equal((await userinfo(answer.json.access_token)).status, 200);
   await leavesNoTrace(server, async () =>
-    assertRefused(await refresh(server, album, old.refresh_token), 400, 'invalid_grant'));
+    assertRefused(await refresh(server, album, old.refresh_token), 400, 'invalid_grant'),
+  );
 });
 
 test('a login can be refreshed after its access token has expired', async () => {
@@ -53,7 +61,11 @@ test('a refresh for more than was granted is refused and ends nothing', async ()
   const first = await issued(server, album, { scope: 'read' });
   await leavesNoTrace(server, async () => {
     for (const scope of ['read write', 'write', 'profile', 'admin', 'READ', 'read"'])
-      assertRefused(await refresh(server, album, first.refresh_token, { scope }), 400, 'invalid_scope');
+      assertRefused(
+        await refresh(server, album, first.refresh_token, { scope }),
+        400,
+        'invalid_scope',
+      );
   });
   assertTokens(await refresh(server, album, first.refresh_token), { scope: 'read' });
 });
@@ -61,7 +73,8 @@ test('a refresh for more than was granted is refused and ends nothing', async ()
 test('the refresh token of another client is refused and stays good for its owner', async () => {
   const { refresh_token: token } = await issued(server, album);
   await leavesNoTrace(server, async () =>
-    assertRefused(await refresh(server, printer, token), 400, 'invalid_grant'));
+    assertRefused(await refresh(server, printer, token), 400, 'invalid_grant'),
+  );
   assertTokens(await refresh(server, album, token), { scope: 'read write profile' });
 });
 
@@ -69,7 +82,9 @@ test('an access token is no refresh token and the other way round', async () => 
   const tokens = await issued(server, album);
   await leavesNoTrace(server, async () => {
     assertRefused(await refresh(server, album, tokens.access_token), 400, 'invalid_grant');
-    const answer = await request(`${server.issuer}/userinfo`, { headers: bearer(tokens.refresh_token) });
+    const answer = await request(`${server.issuer}/userinfo`, {
+      headers: bearer(tokens.refresh_token),
+    });
     assert.equal(answer.status, 401);
   });
 });

@@ -17,19 +17,45 @@ before(async () => {
   server = await Server.start();
   server.addUser(mallory);
   client = server.addClient({
-    redirectUri: 'https://album.example/callback?"\'><script>alert(1)</script>', scope: 'profile <script>alert(1)</script>', name: named });
+    redirectUri: 'https://album.example/callback?"\'><script>alert(1)</script>',
+    scope: 'profile <script>alert(1)</script>',
+    name: named,
+  });
 });
 after(() => server.stop());
 
 function assertHarmless({ document, headers, text }) {
-  const allowed = new Set(['html', 'head', 'meta', 'link', 'title', 'body', 'main', 'form', 'input', 'h1', 'h2', 'p',
-    'strong', 'button', 'ul', 'li', 'div', 'label', 'code']);
+  const allowed = new Set([
+    'html',
+    'head',
+    'meta',
+    'link',
+    'title',
+    'body',
+    'main',
+    'form',
+    'input',
+    'h1',
+    'h2',
+    'p',
+    'strong',
+    'button',
+    'ul',
+    'li',
+    'div',
+    'label',
+    'code',
+  ]);
   for (const element of elements(document)) {
     assert.ok(allowed.has(element.tagName), `<${element.tagName}> in: ${text}`);
-    for (const { name } of element.attrs) assert.doesNotMatch(name, /^on|^style$|^src$|^srcdoc$|^formaction$/);
+    for (const { name } of element.attrs)
+      assert.doesNotMatch(name, /^on|^style$|^src$|^srcdoc$|^formaction$/);
     assert.ok(!/^\s*javascript:/i.test(attribute(element, 'href') ?? ''));
   }
-  assert.match(headers['content-security-policy'], /^default-src 'none'; style-src 'self'; base-uri 'none'; frame-ancestors 'none'; form-action /);
+  assert.match(
+    headers['content-security-policy'],
+    /^default-src 'none'; style-src 'self'; base-uri 'none'; frame-ancestors 'none'; form-action /,
+  );
   assert.equal(headers['x-content-type-options'], 'nosniff');
   assert.equal(headers['referrer-policy'], 'no-referrer');
 }
@@ -52,9 +78,13 @@ test('scripts in client name, state, scope and user are text on login and consen
   assertHarmless(consent);
   assert.equal(textOf(only(consent.document, 'h1')), `Allow ${named}?`);
   assert.ok(consent.text.includes('Mallory'));
-  const wishes = [...elements(consent.document)].filter((element) => element.tagName === 'li').map(textOf);
+  const wishes = [...elements(consent.document)]
+    .filter((element) => element.tagName === 'li')
+    .map(textOf);
   assert.deepEqual(wishes, ['Know your name', '<script>alert(1)</script>']);
-  assert.ok([...elements(consent.document)].some((element) => textOf(element) === mallory.displayName));
+  assert.ok(
+    [...elements(consent.document)].some((element) => textOf(element) === mallory.displayName),
+  );
 
   const { location } = await browser.submit('Allow');
   assert.equal(location.searchParams.get('state'), script);
@@ -72,9 +102,11 @@ test('scripts in every parameter of a refused request are text on the error page
 
 test('the policy allows a form to go to this server and the client only', async () => {
   const { page } = await atConsent(server, client, {}, mallory);
-  assert.equal(page.headers['content-security-policy'],
+  assert.equal(
+    page.headers['content-security-policy'],
     "default-src 'none'; style-src 'self'; base-uri 'none'; frame-ancestors 'none'; " +
-    "form-action 'self' https://album.example");
+      "form-action 'self' https://album.example",
+  );
 });
 
 test('scripts in JSON answers stay JSON', async () => {

@@ -63,20 +63,25 @@ export class Server {
   }
 
   async #run() {
-    this.#process = spawn('lighttpd', ['-D', '-f', `${process.env.AUTHSERVER_SOURCE}/lighttpd.conf`], {
-      stdio: ['ignore', 'inherit', 'pipe'],
-      env: {
-        PATH: process.env.PATH,
-        AUTHSERVER_PORT: String(this.port),
-        AUTHSERVER_SOURCE: process.env.AUTHSERVER_SOURCE,
-        AUTHSERVER_PROGRAMS: `${build}/examples/authserver/cgi`,
-        AUTHSERVER_FOLDER: folder,
+    this.#process = spawn(
+      'lighttpd',
+      ['-D', '-f', `${process.env.AUTHSERVER_SOURCE}/lighttpd.conf`],
+      {
+        stdio: ['ignore', 'inherit', 'pipe'],
+        env: {
+          PATH: process.env.PATH,
+          AUTHSERVER_PORT: String(this.port),
+          AUTHSERVER_SOURCE: process.env.AUTHSERVER_SOURCE,
+          AUTHSERVER_PROGRAMS: `${build}/examples/authserver/cgi`,
+          AUTHSERVER_FOLDER: folder,
+        },
       },
-    });
+    );
     this.#complaints = '';
     this.#process.stderr.on('data', (chunk) => (this.#complaints += chunk));
     while (!(await answers(this.port))) {
-      if (this.#process.exitCode !== null) throw new Error(`lighttpd did not start: ${this.#complaints}`);
+      if (this.#process.exitCode !== null)
+        throw new Error(`lighttpd did not start: ${this.#complaints}`);
       await sleep(20);
     }
   }
@@ -88,7 +93,10 @@ export class Server {
     const ofItsOwn = / \(server\.c\.\d+\) (server started|server stopped|\[note\])/;
     const all = this.#complaints + readFileSync(`${folder}/error.log`, 'utf8');
     const lines = all.split('\n').filter((line) => line !== '');
-    assert.deepEqual(lines.filter((line) => !ofItsOwn.test(line) && !expected?.test(line)), []);
+    assert.deepEqual(
+      lines.filter((line) => !ofItsOwn.test(line) && !expected?.test(line)),
+      [],
+    );
   }
 
   // The library's settings file, read afresh by every program.
@@ -97,7 +105,10 @@ export class Server {
   }
 
   setup(words, input = '') {
-    return execFileSync(`${build}/examples/authserver/authserver_setup`, words, { input, stdio: 'pipe' });
+    return execFileSync(`${build}/examples/authserver/authserver_setup`, words, {
+      input,
+      stdio: 'pipe',
+    });
   }
 
   addUser({ name, displayName, password }) {
@@ -139,7 +150,9 @@ export class Server {
   // Keeps everybody else from the database: BEGIN EXCLUSIVE from reading, BEGIN IMMEDIATE from
   // writing. Ends with release().
   async lockDatabase(begin) {
-    const locker = spawn('sqlite3', ['-cmd', '.timeout 5000', database], { stdio: ['pipe', 'pipe', 'inherit'] });
+    const locker = spawn('sqlite3', ['-cmd', '.timeout 5000', database], {
+      stdio: ['pipe', 'pipe', 'inherit'],
+    });
     locker.stdin.write(`${begin};\nSELECT 'locked';\n`);
     await once(locker.stdout, 'data');
     return {

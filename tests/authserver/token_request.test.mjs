@@ -12,8 +12,15 @@ let server, album, printer;
 before(async () => {
   server = await Server.start();
   album = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read write profile', name: 'Photo album' });
-  printer = server.addClient({ redirectUri: 'https://printer.example/done', scope: 'read', name: 'Printer' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read write profile',
+    name: 'Photo album',
+  });
+  printer = server.addClient({
+    redirectUri: 'https://printer.example/done',
+    scope: 'read',
+    name: 'Printer',
+  });
 });
 after(() => server.stop());
 afterEach(() => {
@@ -40,32 +47,51 @@ test('a replayed code is refused and ends the tokens that it gave', async () => 
   const kept = await issued(server, album);
   const { access_token: access, code } = await issued(server, album);
   assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant');
-  assert.deepEqual(server.rows().tokens.map((row) => row.access_token), [kept.access_token]);
+  assert.deepEqual(
+    server.rows().tokens.map((row) => row.access_token),
+    [kept.access_token],
+  );
   assert.notEqual(kept.access_token, access);
-  assert.ok(server.log().includes('authserver: code replayed, tokens revoked of "Photo album" from 127.0.0.1'));
+  assert.ok(
+    server
+      .log()
+      .includes('authserver: code replayed, tokens revoked of "Photo album" from 127.0.0.1'),
+  );
 });
 
 test("a code that another client replays ends nobody's tokens", async () => {
   const { code } = await issued(server, album);
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, printer, code), 400, 'invalid_grant'));
+    assertRefused(await tradeCode(server, printer, code), 400, 'invalid_grant'),
+  );
 });
 
 test('a stolen code without its verifier is refused and stays good for its owner', async () => {
   const { verifier, challenge } = pkce();
   const { code } = await allowed(server, album, withChallenge({ challenge }));
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'));
-  assertTokens(await tradeCode(server, album, code, { code_verifier: verifier }), { scope: 'read write profile' });
+    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'),
+  );
+  assertTokens(await tradeCode(server, album, code, { code_verifier: verifier }), {
+    scope: 'read write profile',
+  });
 });
 
 test('a wrong verifier is refused and spends the code', async () => {
   for (const wrong of [pkce().verifier, 'x', 'x'.repeat(4096)]) {
     const { verifier, challenge } = pkce();
     const { code } = await allowed(server, album, withChallenge({ challenge }));
-    assertRefused(await tradeCode(server, album, code, { code_verifier: wrong }), 400, 'invalid_grant');
+    assertRefused(
+      await tradeCode(server, album, code, { code_verifier: wrong }),
+      400,
+      'invalid_grant',
+    );
     assert.deepEqual(server.rows(), { codes: [], tokens: [] });
-    assertRefused(await tradeCode(server, album, code, { code_verifier: verifier }), 400, 'invalid_grant');
+    assertRefused(
+      await tradeCode(server, album, code, { code_verifier: verifier }),
+      400,
+      'invalid_grant',
+    );
     assert.deepEqual(server.rows(), { codes: [], tokens: [] });
   }
 });
@@ -73,21 +99,34 @@ test('a wrong verifier is refused and spends the code', async () => {
 test('the challenge itself is no verifier', async () => {
   const { challenge } = pkce();
   const { code } = await allowed(server, album, withChallenge({ challenge }));
-  assertRefused(await tradeCode(server, album, code, { code_verifier: challenge }), 400, 'invalid_grant');
+  assertRefused(
+    await tradeCode(server, album, code, { code_verifier: challenge }),
+    400,
+    'invalid_grant',
+  );
   assert.deepEqual(server.rows(), { codes: [], tokens: [] });
 });
 
 test('a verifier for a code without a challenge is refused', async () => {
   const { code } = await allowed(server, album);
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, album, code, { code_verifier: pkce().verifier }), 400, 'invalid_grant'));
+    assertRefused(
+      await tradeCode(server, album, code, { code_verifier: pkce().verifier }),
+      400,
+      'invalid_grant',
+    ),
+  );
 });
 
 test('the code of another client is refused and stays good for its owner', async () => {
   const { code } = await allowed(server, album);
   await leavesNoTrace(server, async () => {
     assertRefused(await tradeCode(server, printer, code), 400, 'invalid_grant');
-    assertRefused(await tradeCode(server, printer, code, { redirect_uri: album.redirectUri }), 400, 'invalid_grant');
+    assertRefused(
+      await tradeCode(server, printer, code, { redirect_uri: album.redirectUri }),
+      400,
+      'invalid_grant',
+    );
   });
   assertTokens(await tradeCode(server, album, code), { scope: 'read write profile' });
 });
@@ -95,10 +134,23 @@ test('the code of another client is refused and stays good for its owner', async
 test('another redirect URI than that of the request is refused', async () => {
   const { code } = await allowed(server, album);
   await leavesNoTrace(server, async () => {
-    for (const uri of ['http://album.example/callback', 'https://album.example/', 'https://evil.example/', 'x'])
-      assertRefused(await tradeCode(server, album, code, { redirect_uri: uri }), 400, 'invalid_grant');
+    for (const uri of [
+      'http://album.example/callback',
+      'https://album.example/',
+      'https://evil.example/',
+      'x',
+    ])
+      assertRefused(
+        await tradeCode(server, album, code, { redirect_uri: uri }),
+        400,
+        'invalid_grant',
+      );
     for (const uri of [undefined, ''])
-      assertRefused(await tradeCode(server, album, code, { redirect_uri: uri }), 400, 'invalid_request');
+      assertRefused(
+        await tradeCode(server, album, code, { redirect_uri: uri }),
+        400,
+        'invalid_request',
+      );
   });
 });
 
@@ -106,12 +158,21 @@ test('an expired code is refused', async () => {
   const { code } = await allowed(server, album);
   server.sql("UPDATE oauth_grantCode SET expired_time = strftime('%s', 'now') - 1");
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'));
+    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'),
+  );
 });
 
 test('an unknown code is refused', async () => {
   await leavesNoTrace(server, async () => {
-    for (const code of ['x', '0'.repeat(64), '0'.repeat(65), "' OR '1'='1", '%', '_'.repeat(64), '\u20ac'])
+    for (const code of [
+      'x',
+      '0'.repeat(64),
+      '0'.repeat(65),
+      "' OR '1'='1",
+      '%',
+      '_'.repeat(64),
+      '\u20ac',
+    ])
       assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant');
   });
 });
@@ -121,8 +182,16 @@ test('a missing or repeated parameter is refused and spends nothing', async () =
   const full = { grant_type: 'authorization_code', code, redirect_uri: album.redirectUri };
   await leavesNoTrace(server, async () => {
     for (const name of Object.keys(full)) {
-      assertRefused(await post(server, '/token', { ...full, [name]: undefined }, basic(album)), 400, 'invalid_request');
-      assertRefused(await post(server, '/token', { ...full, [name]: '' }, basic(album)), 400, 'invalid_request');
+      assertRefused(
+        await post(server, '/token', { ...full, [name]: undefined }, basic(album)),
+        400,
+        'invalid_request',
+      );
+      assertRefused(
+        await post(server, '/token', { ...full, [name]: '' }, basic(album)),
+        400,
+        'invalid_request',
+      );
       const twice = [...Object.entries(full), [name, full[name]]];
       assertRefused(await post(server, '/token', twice, basic(album)), 400, 'invalid_request');
     }
@@ -130,9 +199,22 @@ test('a missing or repeated parameter is refused and spends nothing', async () =
 });
 
 test('other grant types are refused', async () => {
-  for (const type of ['password', 'client_credentials', 'urn:ietf:params:oauth:grant-type:device_code', 'Authorization_Code'])
-    assertRefused(await post(server, '/token', { grant_type: type, username: 'alice', password: 'x' }, basic(album)),
-      400, 'unsupported_grant_type');
+  for (const type of [
+    'password',
+    'client_credentials',
+    'urn:ietf:params:oauth:grant-type:device_code',
+    'Authorization_Code',
+  ])
+    assertRefused(
+      await post(
+        server,
+        '/token',
+        { grant_type: type, username: 'alice', password: 'x' },
+        basic(album),
+      ),
+      400,
+      'unsupported_grant_type',
+    );
 });
 
 test('tokens live as long as the settings say', async () => {

@@ -12,23 +12,39 @@ let server, album, printer, gateway;
 before(async () => {
   server = await Server.start();
   album = server.addClient({
-    redirectUri: 'https://album.example/callback', scope: 'read write profile', name: 'Photo album' });
-  printer = server.addClient({ redirectUri: 'https://printer.example/done', scope: 'read', name: 'Printer' });
-  gateway = server.addClient({ redirectUri: 'https://gateway.example/', scope: 'introspect', name: 'Gateway' });
+    redirectUri: 'https://album.example/callback',
+    scope: 'read write profile',
+    name: 'Photo album',
+  });
+  printer = server.addClient({
+    redirectUri: 'https://printer.example/done',
+    scope: 'read',
+    name: 'Printer',
+  });
+  gateway = server.addClient({
+    redirectUri: 'https://gateway.example/',
+    scope: 'introspect',
+    name: 'Gateway',
+  });
 });
 after(() => server.stop());
 afterEach(() => server.clear());
 
 const userinfo = (headers) => request(`${server.issuer}/userinfo`, { headers });
 const introspect = (client, token) => post(server, '/introspect', { token }, basic(client));
-const revoke = (client, token, changes = {}) => post(server, '/revoke', { token, ...changes }, basic(client));
+const revoke = (client, token, changes = {}) =>
+  post(server, '/revoke', { token, ...changes }, basic(client));
 
 function assertUnauthorized(answer, status, error) {
   assert.equal(answer.status, status, answer.text);
   assertNotStored(answer);
   const challenge = answer.headers['www-authenticate'];
   if (error === undefined) assert.equal(challenge, 'Bearer realm="authserver"');
-  else assert.match(challenge, new RegExp(`^Bearer realm="authserver", error="${error}", error_description="[^"]+"`));
+  else
+    assert.match(
+      challenge,
+      new RegExp(`^Bearer realm="authserver", error="${error}", error_description="[^"]+"`),
+    );
 }
 
 async function assertInactive(client, token) {
@@ -55,13 +71,25 @@ test('userinfo without a token says how to come by one', async () => {
 
 test('userinfo takes no token from the query', async () => {
   const { access_token: token } = await issued(server, album);
-  assertUnauthorized(await request(`${server.issuer}/userinfo?access_token=${token}`), 401, undefined);
+  assertUnauthorized(
+    await request(`${server.issuer}/userinfo?access_token=${token}`),
+    401,
+    undefined,
+  );
 });
 
 test('userinfo refuses unknown and expired tokens with invalid_token', async () => {
   const { access_token: token } = await issued(server, album);
-  const others = ['x', '0'.repeat(64), `${token}0`, token.slice(1), token.toUpperCase(), "' OR '1'='1"];
-  for (const other of others) assertUnauthorized(await userinfo(bearer(other)), 401, 'invalid_token');
+  const others = [
+    'x',
+    '0'.repeat(64),
+    `${token}0`,
+    token.slice(1),
+    token.toUpperCase(),
+    "' OR '1'='1",
+  ];
+  for (const other of others)
+    assertUnauthorized(await userinfo(bearer(other)), 401, 'invalid_token');
   server.sql("UPDATE oauth_token SET expired_time = strftime('%s', 'now') - 1");
   assertUnauthorized(await userinfo(bearer(token)), 401, 'invalid_token');
 });
@@ -83,7 +111,13 @@ test('the tokens of a disabled client open nothing', async () => {
 test('introspection tells a client about its own tokens', async () => {
   const tokens = await issued(server, album, { scope: 'read profile' });
   const common = {
-    active: true, scope: 'read profile', client_id: album.id, username: 'alice', sub: 'alice', iss: server.issuer };
+    active: true,
+    scope: 'read profile',
+    client_id: album.id,
+    username: 'alice',
+    sub: 'alice',
+    iss: server.issuer,
+  };
   const access = await introspect(album, tokens.access_token);
   assertNotStored(access);
   const [row] = server.rows().tokens;
@@ -102,7 +136,14 @@ test('introspection tells other clients nothing unless they are registered for i
 test('introspection calls unknown, expired and spent tokens inactive', async () => {
   const old = await issued(server, album);
   const { json: tokens } = await refresh(server, album, old.refresh_token);
-  for (const token of ['x', '0'.repeat(64), "' OR '1'='1", old.access_token, old.refresh_token, old.code])
+  for (const token of [
+    'x',
+    '0'.repeat(64),
+    "' OR '1'='1",
+    old.access_token,
+    old.refresh_token,
+    old.code,
+  ])
     await assertInactive(album, token);
   server.sql("UPDATE oauth_token SET expired_time = strftime('%s', 'now') - 1");
   await assertInactive(album, tokens.access_token);
@@ -117,7 +158,10 @@ test('revoking the access or the refresh token ends both', async () => {
       const answer = await revoke(album, tokens[name], { token_type_hint: hint });
       assert.deepEqual([answer.status, answer.json], [200, {}]);
       assertNotStored(answer);
-      assert.deepEqual(server.rows().tokens.map((row) => row.access_token), [kept.access_token]);
+      assert.deepEqual(
+        server.rows().tokens.map((row) => row.access_token),
+        [kept.access_token],
+      );
       assertUnauthorized(await userinfo(bearer(tokens.access_token)), 401, 'invalid_token');
       assertRefused(await refresh(server, album, tokens.refresh_token), 400, 'invalid_grant');
       server.clear();
@@ -142,6 +186,18 @@ test('nobody can revoke the tokens of another client', async () => {
 test('a missing or repeated token is refused', async () => {
   for (const path of ['/revoke', '/introspect']) {
     assertRefused(await post(server, path, {}, basic(album)), 400, 'invalid_request');
-    assertRefused(await post(server, path, [['token', 'x'], ['token', 'x']], basic(album)), 400, 'invalid_request');
+    assertRefused(
+      await post(
+        server,
+        path,
+        [
+          ['token', 'x'],
+          ['token', 'x'],
+        ],
+        basic(album),
+      ),
+      400,
+      'invalid_request',
+    );
   }
 });
