@@ -250,3 +250,13 @@ test('the first visit sets one cookie that scripts and other sites cannot use', 
     /^authserver=[\w.-]+; Path=\/; Max-Age=3600; HttpOnly; SameSite=Lax$/,
   );
 });
+
+test('behind https the cookie goes over https only and belongs to this host alone', async () => {
+  server.actFor('https://login.example');
+  const answer = await request(server.issuer + authorizeUrl(album));
+  server.actFor(server.issuer);
+  assert.match(
+    answer.headers['set-cookie'][0],
+    /^__Host-authserver=[\w.-]+; Path=\/; Max-Age=3600; HttpOnly; SameSite=Lax; Secure$/,
+  );
+});

@@ -104,6 +104,11 @@ export class Server {
     writeFileSync(`${databaseFolder}/oauth.cfg`, JSON.stringify(settings));
   }
 
+  // As if it were served under this address.
+  actFor(issuer) {
+    writeFileSync(`${folder}/config.json`, JSON.stringify({ issuer }));
+  }
+
   setup(words, input = '') {
     return execFileSync(`${build}/examples/authserver/authserver_setup`, words, {
       input,
