@@ -7,21 +7,13 @@ import { allowed, atConsent, authorizeUrl, pkce, tradeCode, withChallenge } from
 import { elements, FormBrowser, textOf } from './form_browser.mjs';
 import { encoded, request } from './http.mjs';
 import { assertBadRequest, assertErrorPage, assertRedirected, assertTokens } from './outcomes.mjs';
-import { Server } from './server.mjs';
+import { photoAlbum, printShop, Server } from './server.mjs';
 
 let server, album, printer, local;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read write profile',
-    name: 'Photo album',
-  });
-  printer = server.addClient({
-    redirectUri: 'https://printer.example/done',
-    scope: 'read',
-    name: 'Printer',
-  });
+  album = server.addClient(photoAlbum);
+  printer = server.addClient(printShop);
   local = server.addClient({
     redirectUri: 'http://127.0.0.1:9999/callback',
     scope: 'read',

@@ -9,7 +9,7 @@ import { after, afterEach, before, test } from 'node:test';
 import { launch, openWindow } from './chromium.mjs';
 import { authorizeUrl, tradeCode } from './code_flow.mjs';
 import { assertTokens } from './outcomes.mjs';
-import { alice, Server } from './server.mjs';
+import { alice, photoAlbum, Server } from './server.mjs';
 
 const axe = readFileSync(new URL('node_modules/axe-core/axe.min.js', import.meta.url), 'utf8');
 const phone = {
@@ -45,11 +45,7 @@ before(async () => {
     scope: 'read write profile',
     name: 'Photo album',
   });
-  remote = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read write profile',
-    name: 'Photo album',
-  });
+  remote = server.addClient(photoAlbum);
   hostile = server.addClient({
     redirectUri: `${here}/callback?"'><script>`,
     scope: '<script>alert(1)</script>',

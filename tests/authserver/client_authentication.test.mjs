@@ -6,21 +6,13 @@ import { after, afterEach, before, test } from 'node:test';
 import { allowed, issued, refresh, tradeCode } from './code_flow.mjs';
 import { basic, post } from './http.mjs';
 import { assertRefused, assertTokens, leavesNoTrace } from './outcomes.mjs';
-import { Server } from './server.mjs';
+import { photoAlbum, printShop, Server } from './server.mjs';
 
 let server, album, printer;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read write profile',
-    name: 'Photo album',
-  });
-  printer = server.addClient({
-    redirectUri: 'https://printer.example/done',
-    scope: 'read',
-    name: 'Printer',
-  });
+  album = server.addClient(photoAlbum);
+  printer = server.addClient(printShop);
 });
 after(() => server.stop());
 afterEach(() => server.clear());

@@ -6,23 +6,15 @@ import { after, afterEach, before, test } from 'node:test';
 import { allowed, atConsent, authorizeUrl, logIn } from './code_flow.mjs';
 import { attribute, elements, FormBrowser } from './form_browser.mjs';
 import { assertErrorPage, assertRedirected, leavesNoTrace } from './outcomes.mjs';
-import { alice, Server } from './server.mjs';
+import { alice, photoAlbum, printShop, Server } from './server.mjs';
 
 const bob = { name: 'bob', displayName: "Bob O'Neil", password: 'another sesame' };
 let server, album, printer;
 before(async () => {
   server = await Server.start();
   server.addUser(bob);
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read write profile',
-    name: 'Photo album',
-  });
-  printer = server.addClient({
-    redirectUri: 'https://printer.example/done',
-    scope: 'read',
-    name: 'Printer',
-  });
+  album = server.addClient(photoAlbum);
+  printer = server.addClient(printShop);
 });
 after(() => server.stop());
 afterEach(() => server.clear());

@@ -12,16 +12,12 @@ import {
   assertRefused,
   assertTokens,
 } from './outcomes.mjs';
-import { Server } from './server.mjs';
+import { photoAlbum, Server } from './server.mjs';
 
 let server, album, kept;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read write profile',
-    name: 'Photo album',
-  });
+  album = server.addClient(photoAlbum);
 });
 after(() => server.stop(/request-size too long|oversized request-header/));
 beforeEach(async () => {

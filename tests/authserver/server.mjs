@@ -14,6 +14,16 @@ const build = process.env.AUTHSERVER_BUILD;
 
 export const database = `${databaseFolder}/oauth.db`;
 export const alice = { name: 'alice', displayName: 'Alice Miller', password: 'open sesame 7' };
+export const photoAlbum = {
+  redirectUri: 'https://album.example/callback',
+  scope: 'read write profile',
+  name: 'Photo album',
+};
+export const printShop = {
+  redirectUri: 'https://printer.example/done',
+  scope: 'read',
+  name: 'Printer',
+};
 
 // What these tests empty must not be anything of the machine's.
 function requirePrivateVar() {

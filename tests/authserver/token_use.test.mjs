@@ -6,21 +6,13 @@ import { after, afterEach, before, test } from 'node:test';
 import { issued, refresh } from './code_flow.mjs';
 import { basic, bearer, post, request } from './http.mjs';
 import { assertNotStored, assertRefused, leavesNoTrace } from './outcomes.mjs';
-import { alice, Server } from './server.mjs';
+import { alice, photoAlbum, printShop, Server } from './server.mjs';
 
 let server, album, printer, gateway;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read write profile',
-    name: 'Photo album',
-  });
-  printer = server.addClient({
-    redirectUri: 'https://printer.example/done',
-    scope: 'read',
-    name: 'Printer',
-  });
+  album = server.addClient(photoAlbum);
+  printer = server.addClient(printShop);
   gateway = server.addClient({
     redirectUri: 'https://gateway.example/',
     scope: 'introspect',
