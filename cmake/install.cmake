@@ -30,9 +30,10 @@ configure_file(cmake/zevooauth.pc.in zevooauth.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/zevooauth.pc
   DESTINATION ${pkgconfig_folder} COMPONENT development)
 
-# Without the example server, which is the checkout's.
+# Without what belongs to the checkout: the example server, how fast it is, its front pages.
 install(DIRECTORY docs examples DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documentation
-  FILES_MATCHING PATTERN *.md PATTERN *.svg PATTERN lifecycle.cpp PATTERN authserver* EXCLUDE)
+  FILES_MATCHING PATTERN *.md PATTERN *.svg PATTERN lifecycle.cpp PATTERN authserver* EXCLUDE
+  PATTERN performance.* EXCLUDE PATTERN overview.svg EXCLUDE PATTERN mainpage.md EXCLUDE)
 install(FILES CHANGELOG.md DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documentation)
 
 if(ZEVOOAUTH_BUILD_TOOLS)

@@ -37,7 +37,7 @@ describe() {
   abidw --headers-dir include --drop-private-types --exported-interfaces-only --no-corpus-path \
     --no-comp-dir-path --no-show-locs --no-parameter-names --no-elf-needed --type-id-style hash \
     --out-file "$1" "$folder/libzevooauth.so"
-  if grep -nF -e "$PWD" -e "$libraries" -e /usr "$1" >&2; then
+  if grep -nF -e "$PWD/" -e "$libraries/" -e /usr/ "$1" >&2; then
     echo "abi: the description names a folder of this machine" >&2
     exit 1
   fi

@@ -42,7 +42,7 @@ cd "$work/$name"
 mapfile -t objects < <(LC_ALL=C grep -rlaP '^\x7fELF' . | sort)
 [ "${objects[*]}" = "./bin/oauthctl ./lib/libzevooauth.so.$version" ] ||
   fail "programs in the archive: ${objects[*]}"
-places=(-e "$source" -e "$(dirname "$build")" -e "$work")
+places=(-e "$source/" -e "$(dirname "$build")/" -e "$work/")
 if grep -rlaF "${places[@]}" .; then
   fail "these files name a folder of this machine"
 fi
@@ -131,7 +131,7 @@ cp "$(find_library libnettle.so.8)" "$root/lib/"
 
 # A program of somebody else's.
 export PKG_CONFIG_LIBDIR=$root/usr/lib/pkgconfig:$libraries/lib/pkgconfig
-read -ra options < <(pkg-config --cflags --libs zevooauth)
+mapfile -t options < <(pkg-config --cflags --libs zevooauth | xargs printf '%s\n')
 powerpc-linux-gnu-g++ -std=c++17 "$source/tests/install/consumer.cpp" "${options[@]}" \
   "-Wl,-rpath-link,$root/lib" -o "$root/consumer"
 

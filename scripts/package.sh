@@ -10,6 +10,12 @@ folder=$(scripts/build-folder.sh packages)
 rm -rf "$folder"
 mkdir -p "$folder"
 
+version=$(sed -nE '1s/.*\((.*)\).*/\1/p' debian/changelog)
+if ! grep -qF "project(zevooauth VERSION ${version%%[+~]*} " CMakeLists.txt; then
+  echo "package: debian/changelog has version $version, CMakeLists.txt another" >&2
+  exit 1
+fi
+
 # Elsewhere, since the packages are put beside the tree, and the path may hold no blank.
 work=$(mktemp --directory --tmpdir zevooauth-package-XXXXXX)
 trap 'rm -rf "$work"' EXIT

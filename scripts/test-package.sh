@@ -41,8 +41,8 @@ keep_downloads() { # ROOT
 if [ ! -e "$folder/bare.done" ]; then
   rm -rf "$folder/bare"
   # shellcheck disable=SC2016 # apt-get expands this itself
-  mirror=$(apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' 'Codename: bookworm' |
-    sort -u | head -n 1)
+  mirror=$(apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' 'Origin: Debian' \
+    'Codename: bookworm' | sort -u | head -n 1)
   debootstrap --variant=minbase bookworm "$folder/bare" "$mirror" >"$folder/debootstrap.log"
   cp /etc/resolv.conf "$folder/bare/etc/"
   echo 'Dpkg::Use-Pty "0";' >"$folder/bare/etc/apt/apt.conf.d/no-terminal"
@@ -53,9 +53,9 @@ echo "test-package: a bare Debian 12 is there"
 
 # Twice the same commit, in other places, under other habits.
 fresh build
-mkdir -p "$folder/build/first" "$folder/build/srv/second one"
-tar --create --exclude=./build --exclude=./.git . | tee >(tar --extract --directory "$folder/build/first") |
-  tar --extract --directory "$folder/build/srv/second one"
+mkdir "$folder/build/first"
+tar --create --exclude=./build --exclude=./.git . | tar --extract --directory "$folder/build/first"
+cp -a "$folder/build/first" "$folder/build/srv/second one"
 quietly within build /first/scripts/package.sh
 tail -n 5 "$folder/log"
 keep_downloads build
@@ -63,15 +63,16 @@ keep_downloads build
   umask 077
   quietly within build env TZ=Asia/Tokyo LC_ALL=C HOME=/tmp "/srv/second one/scripts/package.sh"
 )
-packages=(libzevooauth1 libzevooauth-dev oauthctl zevooauth-standins)
-for package in "${packages[@]}"; do
-  (cd "$folder/build" && cmp {first,srv/second\ one}/build/packages/"${package}"_1.0.0_*.deb)
+version=$(sed -nE '1s/.*\((.*)\).*/\1/p' debian/changelog)
+second=$(echo "$folder"/build/tmp/.cache/zevooauth-*/packages) # a path with a blank is not built in
+for package in libzevooauth1 libzevooauth-dev oauthctl zevooauth-standins; do
+  cmp "$folder"/{build/first/build/packages,"${second#"$folder/"}"}/"${package}_${version}"_*.deb
 done
 echo "test-package: two builds of one commit are the same, byte for byte"
 
 later=$(date --rfc-email --date "$(sed -n 's/^ -- .*>  //p' debian/changelog | head -n 1) + 1 minute")
 cat - debian/changelog >"$folder/build/first/debian/changelog" <<END
-zevooauth (1.0.0+next) bookworm; urgency=medium
+zevooauth ($version+next) bookworm; urgency=medium
 
   * To upgrade to.
 
@@ -87,7 +88,7 @@ mkdir -p "$folder/use/packages/new"
 cp "$folder"/build/packages/*.deb "$folder/use/packages"
 mv "$folder"/use/packages/*+next_* "$folder/use/packages/new"
 cp -r tests/install README.md tests/packages_in_use.sh "$folder/use/packages"
-within use /packages/packages_in_use.sh
+within use /packages/packages_in_use.sh "$version"
 keep_downloads use
 rm -rf "$folder/build" "$folder/use"
 echo "test-package: passed: built twice alike, installed, used, upgraded and removed"

@@ -2,10 +2,10 @@
 # Installs a build into a folder of its own, compiles a program against it twice, as CMake and as
 # pkg-config tell, and runs both.
 #
-#   install_test.sh BUILD COMPILER [FLAG...]
+#   install_test.sh BUILD VERSION COMPILER [FLAG...]
 set -euo pipefail
 
-build=$1 compiler=$2 flags="${*:3}"
+build=$1 version=$2 compiler=$3 flags="${*:4}"
 source=$(cd "$(dirname "$0")" && pwd)/install
 folder=$(mktemp --directory --tmpdir zevooauth-install-XXXXXX)
 trap 'rm -rf "$folder"' EXIT
@@ -15,7 +15,7 @@ cmake --install "$build" --prefix "$folder/tree" >install.log
 
 (cd tree && find . ! -type d ! -path './share/doc/*' | sort) |
   sed 's/Targets-[a-z]*/Targets-BUILD_TYPE/' >installed
-diff -u - installed <<'END'
+diff -u - installed <<END
 ./bin/oauthctl
 ./include/zevooauth/oauth_clientInfo.h
 ./include/zevooauth/oauth_db_basic.h
@@ -29,13 +29,21 @@ diff -u - installed <<'END'
 ./lib/cmake/ZevoOAuth/ZevoOAuthTargets.cmake
 ./lib/libzevooauth.so
 ./lib/libzevooauth.so.1
-./lib/libzevooauth.so.1.0.0
+./lib/libzevooauth.so.$version
 ./lib/pkgconfig/zevooauth.pc
 ./share/bash-completion/completions/oauthctl
 ./share/man/man1/oauthctl.1
 END
 test -s tree/share/doc/zevooauth/docs/operations.md
 test -s tree/share/doc/zevooauth/CHANGELOG.md
+dead=$(cd tree/share/doc/zevooauth && grep -roP '\]\(\K[^):#]+' --include='*.md' . |
+  while IFS=: read -r page target; do
+    [ -e "$(dirname "$page")/$target" ] || echo "$page links to $target"
+  done)
+if [ -n "$dead" ]; then
+  echo "install: links that lead nowhere: $dead" >&2
+  exit 1
+fi
 for program in bin/oauthctl lib/libzevooauth.so; do
   if readelf --dynamic "tree/$program" | grep -E 'RPATH|RUNPATH'; then
     echo "install: $program looks for libraries where it was built" >&2
@@ -60,8 +68,9 @@ cmake --build by-cmake >>cmake.log
 test "$(by-cmake/consumer)" = "$expected"
 
 export PKG_CONFIG_PATH=$folder/moved/lib/pkgconfig
-test "$(pkg-config --modversion zevooauth)" = 1.0.0
-read -ra options <<<"$flags $(pkg-config --cflags --libs zevooauth)"
-"$compiler" -std=c++17 "$source/consumer.cpp" "${options[@]}" -o by-pkg-config
+test "$(pkg-config --modversion zevooauth)" = "$version"
+mapfile -t options < <(pkg-config --cflags --libs zevooauth | xargs printf '%s\n') # as it escapes
+# shellcheck disable=SC2086 # each flag a word
+"$compiler" -std=c++17 $flags "$source/consumer.cpp" "${options[@]}" -o by-pkg-config
 test "$(./by-pkg-config)" = "$expected"
 echo "install: a program compiles against the installed library by CMake and by pkg-config"

@@ -1,9 +1,12 @@
 #!/usr/bin/env bash
 # Installs the packages beside this script in a bare system, uses, upgrades and removes them. For
 # systems made for it only: it takes over the machine's own database.
+#
+#   packages_in_use.sh VERSION
 set -euo pipefail
 cd "$(dirname "$0")"
 
+version=$1
 data=/var/packages/Keyloft/target/etc
 
 fail() {
@@ -28,11 +31,11 @@ expect() { # CODE OUTPUT COMMAND...: the exit code and the whole of standard out
 status_of() { dpkg-query --show --showformat='${db:Status-Status}' "$1" 2>/dev/null || true; }
 
 # The stand-ins come when they are asked for, and not by themselves.
-if install ./libzevooauth1_1.0.0_*.deb ./oauthctl_1.0.0_*.deb 2>refused; then
+if install "./libzevooauth1_${version}"_*.deb "./oauthctl_${version}"_*.deb 2>refused; then
   fail "it does without the host's libraries"
 fi
 grep -q 'libzevocore6' refused || fail "apt does not name the host's library: $(<refused)"
-install ./{libzevooauth1,oauthctl,zevooauth-standins}_1.0.0_*.deb
+install ./{libzevooauth1,oauthctl,zevooauth-standins}"_${version}"_*.deb
 echo "packages in use: installed"
 
 # An operator registers a client.
@@ -46,7 +49,7 @@ expect 0 $'ID NAME        ENABLED REDIRECT URI           SCOPE\n'\
 ' 1 Photo album yes     album.example/callback read write' oauthctl client list
 
 # A programmer compiles against the library, and the program issues a token.
-install ./libzevooauth-dev_1.0.0_*.deb g++ cmake ninja-build pkg-config
+install "./libzevooauth-dev_${version}"_*.deb g++ cmake ninja-build
 # shellcheck disable=SC2016 # the marks of a code block
 sed -n '/^```cpp$/,/^```$/{/^```/!p}' README.md >example.cpp
 read -ra options <<<"$(pkg-config --cflags --libs zevooauth)"
@@ -78,9 +81,9 @@ fingerprint() { find "$data" -type f -exec sha256sum {} + -exec stat --format '%
 before=$(fingerprint)
 listed=$(oauthctl client list)
 
-install ./new/{libzevooauth1,libzevooauth-dev,oauthctl,zevooauth-standins}_1.0.0+next_*.deb
+install ./new/{libzevooauth1,libzevooauth-dev,oauthctl,zevooauth-standins}"_${version}+next"_*.deb
 for package in libzevooauth1 libzevooauth-dev oauthctl zevooauth-standins; do
-  [ "$(dpkg-query --show --showformat='${Version}' $package)" = 1.0.0+next ] ||
+  [ "$(dpkg-query --show --showformat='${Version}' $package)" = "$version+next" ] ||
     fail "$package is not upgraded"
 done
 [ "$(fingerprint)" = "$before" ] || fail "the upgrade changed the database"

@@ -12,7 +12,7 @@ code() { sed 's|^ *//.*||' "$@" | tr '\n' ' ' | sed -E 's/" +"//g; s/\( +/(/g'; 
 # from elsewhere than a literal stays as it is, and is in no catalogue.
 messages_in_sources() {
   { code src/*/*.{h,cpp} && grep '^#define OAUTH_ENTER' src/oauth_syslog.h; } |
-    grep -oE '(OAUTH_(FAIL|DIAG|LOG)\(|[^_]syslog\(|SetErrMsg\(|kErrMsg\] = |auditLog\.Add\()[^";]*("[^"]*"|;)' |
+    grep -oE '(OAUTH_(FAIL|DIAG|LOG)\(|[^_]syslog\(|SetErrMsg\(|errMsg_ = |kErrMsg\] = |auditLog\.Add\()[^";]*("[^"]*"|;)' |
     sed -E '
       s/^OAUTH_FAIL\("(.*)"$/Failures: \1/
       s/^OAUTH_LOG\(LOG_AUTH \| LOG_ERR, "(.*)"$/Refused privileges: \1/
@@ -21,7 +21,7 @@ messages_in_sources() {
       s/^OAUTH_DIAG\(kRow, "(.*)"$/Rows, bit 2: \1/
       s/^OAUTH_DIAG\(kArgument, "(.*)"$/Arguments, bit 4: \1/
       s/^OAUTH_DIAG\(kEntry, "(.*)"$/Entry traces, bit 8: \1/
-      s/^(SetErrMsg\(|kErrMsg\] = )"(.*)"$/Error texts: \2/
+      s/^(SetErrMsg\(|errMsg_ = |kErrMsg\] = )"(.*)"$/Error texts: \2/
       s/^auditLog\.Add\("(.*)"$/Audit log: \1/' |
     # The definition, SQLite's own text, and the text of the store.
     grep -vxF -e 'SetErrMsg(const std::string& msg) { errMsg_ = msg;' -e 'SetErrMsg(text);' \

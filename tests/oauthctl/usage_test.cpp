@@ -56,7 +56,9 @@ TEST_F(UsageTest, ListsTheCommandsOfAGroup) {
   EXPECT_THAT(outcome.out, HasSubstr("\n  client delete   Delete a client\n"));
 }
 
-TEST_F(UsageTest, TellsItsVersion) { EXPECT_EQ("oauthctl 1.0.0\n", run({"--version"}).out); }
+TEST_F(UsageTest, TellsItsVersion) {
+  EXPECT_EQ("oauthctl " OAUTHCTL_VERSION "\n", run({"--version"}).out);
+}
 
 // Every line of help fits a terminal of 80 columns; examples are to be copied and stay whole.
 TEST_F(UsageTest, KeepsHelpWithinEightyColumns) {
