@@ -18,7 +18,7 @@ declare -A groups=(
   [docs]="doxygen"
   [abi]="abigail-tools"
   [authserver]="libcgicc-dev libctemplate-dev libsodium-dev lighttpd"
-  [e2e]="nodejs npm chromium fonts-liberation sqlite3"
+  [e2e]="ca-certificates nodejs npm chromium fonts-liberation sqlite3"
   [drawings]="mscgen"
 )
 
