@@ -38,15 +38,15 @@ void checkCode(const Code& code, const std::string& redirectUri, const std::stri
     throw invalidGrant("A code_verifier belongs to a code_challenge, and the other way round.");
 }
 
-// The code, which nobody else can spend any more. A wrong verifier spends it too: it must not be
-// guessed at.
-Code spentCode(CodeStore& codes, TokenStore& tokens, const Client& client, const Request& http) {
+// The code is spent if and only if the tokens are issued: whoever is told to try again can. The log
+// is another connection, and would wait for an open transaction in vain.
+Json::Value tradeCode(TokenStore& tokens, const Request& http, const Client& client) {
   const std::string presented = required(http, "code"), verifier = http.get("code_verifier");
   const std::string redirectUri = required(http, "redirect_uri");
-  Transaction transaction(codes);
-  const std::optional<Code> code = findCode(codes, presented);
+  Transaction transaction(tokens);
+  const std::optional<Code> code = findCode(tokens, presented);
   if (!code || code->clientId != client.id) {
-    transaction.rollBack();  // which other stores, the log among them, would wait for in vain
+    transaction.rollBack();
     if (code)
       audit("code of another client presented by " + quotedForLog(client.name));
     else
@@ -54,25 +54,16 @@ Code spentCode(CodeStore& codes, TokenStore& tokens, const Client& client, const
     throw invalidGrant("The code is not valid.");
   }
   checkCode(*code, redirectUri, verifier);
-  attempt(codes, [&] { return codes.Del(code->id); });
-  transaction.commit();
-  if (code->challenge.empty() || equalSecrets(code->challenge, sha256(verifier))) return *code;
-  audit("wrong code_verifier from " + quotedForLog(client.name));
-  throw invalidGrant("The code_verifier does not fit the code.");
-}
-
-Json::Value tradeCode(const Request& http, const Client& client) {
-  CodeStore codes;
-  TokenStore tokens;  // opened before anything is spent
-  const Code code = spentCode(codes, tokens, client, http);
-  const Grant grant{code.user, client.id, code.scope, code.scope, sha256(code.code)};
-  try {
-    return withRoom([&] { return issueTokens(tokens, grant, "authorization_code"); },
-                    [&] { purgeLongExpired(tokens); });
-  } catch (const std::exception&) {
-    giveBack(codes, code);
-    throw;
+  if (!spend(tokens, *code)) throw invalidGrant("The code is not valid.");
+  if (!code->challenge.empty() && !equalSecrets(code->challenge, sha256(verifier))) {
+    transaction.commit();  // spent for nothing, so that nobody guesses at the verifier
+    audit("wrong code_verifier from " + quotedForLog(client.name));
+    throw invalidGrant("The code_verifier does not fit the code.");
   }
+  const Grant grant{code->user, client.id, code->scope, code->scope, sha256(presented)};
+  Json::Value answer = issueTokens(tokens, grant, "authorization_code");
+  transaction.commit();
+  return answer;
 }
 
 Json::Value rotate(TokenStore& tokens, const Request& http, const Client& client) {
@@ -82,7 +73,8 @@ Json::Value rotate(TokenStore& tokens, const Request& http, const Client& client
     throw invalidGrant("The refresh token is not valid.");
   Grant grant = old->grant;
   grant.accessScope = narrowed(http.get("scope"), grant.refreshScope);
-  attempt(tokens, [&] { return tokens.Revoke(old->id); });
+  if (!attempt(tokens, [&] { return tokens.Revoke(old->id); }))
+    throw invalidGrant("The refresh token is not valid.");
   Json::Value answer = issueTokens(tokens, grant, "refresh_token");
   transaction.commit();
   return answer;
@@ -92,11 +84,13 @@ Response token(const Request& http) {
   http.requireSoundParameters();
   const Client client = authenticatedClient(http);
   const std::string type = required(http, "grant_type");
-  if (type == "authorization_code") return jsonResponse(200, tradeCode(http, client));
-  if (type != "refresh_token")
+  const auto trade = type == "authorization_code" ? tradeCode
+                     : type == "refresh_token"    ? rotate
+                                                  : nullptr;
+  if (trade == nullptr)
     throw Refusal(400, "unsupported_grant_type", "The grant_type is not known here.");
   TokenStore tokens;
-  return jsonResponse(200, withRoom([&] { return rotate(tokens, http, client); },
+  return jsonResponse(200, withRoom([&] { return trade(tokens, http, client); },
                                     [&] { purgeLongExpired(tokens); }));
 }
 

@@ -2,6 +2,7 @@
 
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
+import { setTimeout as sleep } from 'node:timers/promises';
 
 import { atConsent, allowed, authorizeUrl, issued, refresh, tradeCode } from './code_flow.mjs';
 import { FormBrowser } from './form_browser.mjs';
@@ -90,6 +91,50 @@ test('a database that cannot be written is 503 for what spends or issues', async
   assertBusy(answers);
   assert.deepEqual(server.rows(), before);
   assertTokens(await tradeCode(server, album, code), { scope: 'read profile' });
+});
+
+// Every code was traded, or is as good as it was.
+async function assertTradedOrGood(codes, answers) {
+  const busy = answers.filter((answer) => answer.status === 503);
+  assertBusy(busy);
+  for (const answer of answers)
+    if (answer.status !== 503) assertTokens(answer, { scope: 'read profile' });
+  const { codes: left, tokens } = server.rows();
+  assert.deepEqual(
+    left.map((row) => row.code).sort(),
+    codes.filter((_, i) => answers[i].status === 503).sort(),
+  );
+  assert.equal(tokens.length, codes.length - busy.length);
+  for (const { code } of left)
+    assertTokens(await tradeCode(server, album, code), { scope: 'read profile' });
+}
+
+async function someCodes(count) {
+  const codes = [];
+  while (codes.length < count) codes.push((await allowed(server, album)).code);
+  return codes;
+}
+
+test('a lock that comes while codes are traded loses none of them', async () => {
+  const codes = await someCodes(16);
+  const trades = codes.map(async (code, i) => {
+    await sleep(8 * i);
+    return tradeCode(server, album, code);
+  });
+  await sleep(40);
+  const lock = await server.lockDatabase('BEGIN EXCLUSIVE');
+  const answers = await Promise.all(trades);
+  await lock.release();
+  await assertTradedOrGood(codes, answers);
+});
+
+test('a trade that fails in its very last step is 503 and the code stays good', async () => {
+  const codes = await someCodes(1);
+  const reader = await server.lockDatabase('BEGIN; SELECT count(*) FROM oauth_token');
+  const answer = await tradeCode(server, album, codes[0]); // all but the commit passes a reader
+  await reader.release();
+  assertBusy([answer]);
+  await assertTradedOrGood(codes, [answer]);
 });
 
 test('a lock shorter than the wait is not noticed', async () => {

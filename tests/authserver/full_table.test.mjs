@@ -76,6 +76,19 @@ test('a full table of tokens that are in use is 503 and the code stays good', as
   assertTokens(await tradeCode(server, album, code), { scope });
 });
 
+test('codes and tokens both above their ceilings are 503 and every code stays good', async () => {
+  const codes = [];
+  for (let i = 0; i < 2; ++i) await issued(server, album);
+  for (let i = 0; i < 3; ++i) codes.push((await allowed(server, album)).code);
+  server.set({ grantcode_max: 1, token_max: 1 });
+  await leavesNoTrace(server, async () => {
+    for (const code of codes)
+      assertRefused(await tradeCode(server, album, code), 503, 'temporarily_unavailable');
+  });
+  server.set({});
+  for (const code of codes) assertTokens(await tradeCode(server, album, code), { scope });
+});
+
 test('a refresh at the ceiling succeeds because it takes as much room as it gives', async () => {
   const tokens = await issued(server, album);
   await issued(server, album);

@@ -34,12 +34,8 @@ function assertOneWon(answers) {
 test('of 8 that trade one code at once exactly one wins', async () => {
   for (let round = 0; round < rounds; ++round) {
     const { code } = await allowed(server, album);
-    const winner = assertOneWon(await eight(() => tradeCode(server, album, code)));
-    // The others replayed it, which may have ended the winner's tokens already.
-    const { codes, tokens } = server.rows();
-    assert.deepEqual(codes, []);
-    assert.ok(tokens.every((row) => row.access_token === winner.access_token));
-    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant');
+    assertOneWon(await eight(() => tradeCode(server, album, code)));
+    // The others replayed it, which ends the winner's tokens.
     assert.deepEqual(server.rows(), { codes: [], tokens: [] });
   }
 });

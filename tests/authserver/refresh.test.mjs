@@ -70,6 +70,16 @@ test('the refresh token of another client is refused and stays good for its owne
   assertTokens(await refresh(server, album, token), { scope: 'read write profile' });
 });
 
+test('a refresh token that cannot be spent gives no tokens', async () => {
+  const { refresh_token: token } = await issued(server, album);
+  server.sql('CREATE TRIGGER keep BEFORE DELETE ON oauth_token BEGIN SELECT RAISE(IGNORE); END');
+  await leavesNoTrace(server, async () =>
+    assertRefused(await refresh(server, album, token), 400, 'invalid_grant'),
+  );
+  server.sql('DROP TRIGGER keep');
+  assertTokens(await refresh(server, album, token), { scope: 'read write profile' });
+});
+
 test('an access token is no refresh token and the other way round', async () => {
   const tokens = await issued(server, album);
   await leavesNoTrace(server, async () => {

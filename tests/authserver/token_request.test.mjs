@@ -169,6 +169,18 @@ test('an unknown code is refused', async () => {
   });
 });
 
+test('a code that cannot be spent gives no tokens', async () => {
+  const { code } = await allowed(server, album);
+  server.sql(
+    'CREATE TRIGGER keep BEFORE DELETE ON oauth_grantCode BEGIN SELECT RAISE(IGNORE); END',
+  );
+  await leavesNoTrace(server, async () =>
+    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'),
+  );
+  server.sql('DROP TRIGGER keep');
+  assertTokens(await tradeCode(server, album, code), { scope: 'read write profile' });
+});
+
 test('a missing or repeated parameter is refused and spends nothing', async () => {
   const { code } = await allowed(server, album);
   const full = { grant_type: 'authorization_code', code, redirect_uri: album.redirectUri };

@@ -3,6 +3,7 @@
 #include <stdexcept>
 
 #include "digest.h"
+#include "oauth_grantCode.h"
 #include "oauth_utils.h"
 #include "refusal.h"
 #include "store_errors.h"
@@ -11,20 +12,38 @@
 namespace authserver {
 namespace {
 
+constexpr char kTable[] = "oauth_grantCode";
+constexpr std::size_t kCodeLength = 64;  // bytes
+
 // The column "state" is ours to use: "<digest of the redirect URI>.<challenge>", of a fixed length
 // and without quotes, whatever the client sent.
 std::string stateOf(const std::string& redirectDigest, const std::string& challenge) {
   return redirectDigest + '.' + challenge;
 }
 
-}  // namespace
+// Lets a store serve the codes for as long as this lives.
+class CodesFor {
+ public:
+  explicit CodesFor(ZEVOOAUTHSERVER::OAUTHDBBasic& store)
+      : store_(store), ownTable_(store.GetTabName()) {
+    store_.SetTabName(kTable);
+  }
+  ~CodesFor() { store_.SetTabName(ownTable_); }
+  CodesFor(const CodesFor&) = delete;
+  CodesFor& operator=(const CodesFor&) = delete;
 
-CodeStore::CodeStore() : OAUTHDBGrantCode("oauth_grantCode") { requireOpen(*this); }
+ private:
+  ZEVOOAUTHSERVER::OAUTHDBBasic& store_;
+  const std::string ownTable_;
+};
+
+}  // namespace
 
 std::string issueCode(const std::string& user, const std::string& clientId,
                       const std::string& scope, const std::string& redirectUri,
                       const std::string& challenge) {
-  CodeStore store;
+  ZEVOOAUTHSERVER::OAUTHDBGrantCode store(kTable);
+  requireOpen(store);
   const std::string state = stateOf(sha256(redirectUri), challenge);
   Json::Value issued;
   const auto add = [&] {
@@ -36,9 +55,13 @@ std::string issueCode(const std::string& user, const std::string& clientId,
   return issued["code"].asString();
 }
 
-std::optional<Code> findCode(CodeStore& store, const std::string& code) {
-  Json::Value rows;
-  if (!attempt(store, [&] { return store.Get(code, &rows); }) || rows.empty()) return std::nullopt;
+std::optional<Code> findCode(TokenStore& tokens, const std::string& code) {
+  if (code.size() != kCodeLength) return std::nullopt;
+  const CodesFor codes(tokens);
+  Json::Value request, rows(Json::arrayValue);
+  request["condition"]["code"] = code;
+  attempt(tokens, [&] { return tokens.DBGet(request, &rows); });
+  if (rows.empty()) return std::nullopt;
   const Json::Value& row = rows[0U];
   const std::string state = storedText(row, "state");
   Code found;
@@ -46,18 +69,15 @@ std::optional<Code> findCode(CodeStore& store, const std::string& code) {
   found.user = storedText(row, "username");
   found.clientId = storedText(row, "client_id");
   found.scope = storedText(row, "scope");
-  found.code = storedText(row, "code");
   found.expires = storedNumber(row, "expired_time");
   found.redirectDigest = state.substr(0, kDigestLength);
   if (state.size() > kDigestLength) found.challenge = state.substr(kDigestLength + 1);
-  found.ip = storedText(row, "ip");
   return found;
 }
 
-void giveBack(CodeStore& store, const Code& code) {
-  Json::Value issued;
-  store.Add(code.user, code.clientId, code.scope, code.code, std::to_string(code.expires),
-            stateOf(code.redirectDigest, code.challenge), code.ip, issued);
+bool spend(TokenStore& tokens, const Code& code) {
+  const CodesFor codes(tokens);
+  return attempt(tokens, [&] { return tokens.Del(code.id); });
 }
 
 }  // namespace authserver
