@@ -1,5 +1,6 @@
-// POST /introspect: what a token is good for (RFC 7662). A client learns about its own tokens, one
-// registered for the scope "introspect" about all.
+// POST /introspect: what a token is good for (RFC 7662). A client learns about its own tokens; one
+// registered for the scope "introspect", such as a resource server, about everybody's access
+// tokens. A refresh token is nobody's business but its client's.
 
 #include <ctime>
 
@@ -12,7 +13,7 @@
 namespace authserver {
 namespace {
 
-bool maySee(const Client& client, const Token& token) {
+bool maySeeAccess(const Client& client, const Token& token) {
   if (token.grant.clientId == client.id) return true;
   // The tokens of a disabled client are worth nothing.
   return contains(client.scope, kIntrospectScope) && findClient(token.grant.clientId).has_value();
@@ -39,14 +40,14 @@ Json::Value stateOf(const std::string& presented, const Client& client) {
   TokenStore tokens;
   if (const auto token = findAccessToken(tokens, presented)) {
     const bool expired = static_cast<std::int64_t>(std::time(nullptr)) > token->expires;
-    if (expired || !maySee(client, *token)) return inactive();
+    if (expired || !maySeeAccess(client, *token)) return inactive();
     Json::Value document = describe(*token, token->grant.accessScope);
     document["token_type"] = "Bearer";
     document["exp"] = static_cast<Json::Int64>(token->expires);
     return document;
   }
   const auto token = findRefreshToken(tokens, presented);  // of these none expires by itself
-  if (!token || !maySee(client, *token)) return inactive();
+  if (!token || token->grant.clientId != client.id) return inactive();
   return describe(*token, token->grant.refreshScope);
 }
 

@@ -122,7 +122,13 @@ test('introspection tells other clients nothing unless they are registered for i
   await assertInactive(printer, tokens.access_token);
   await assertInactive(printer, tokens.refresh_token);
   assert.equal((await introspect(gateway, tokens.access_token)).json.active, true);
-  assert.equal((await introspect(gateway, tokens.refresh_token)).json.active, true);
+});
+
+test('introspection tells about a refresh token only to the client that it belongs to', async () => {
+  const tokens = await issued(server, album);
+  await assertInactive(gateway, tokens.refresh_token);
+  await assertInactive(printer, tokens.refresh_token);
+  assert.equal((await introspect(album, tokens.refresh_token)).json.active, true);
 });
 
 test('introspection calls unknown, expired and spent tokens inactive', async () => {

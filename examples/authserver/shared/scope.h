@@ -7,7 +7,7 @@
 
 namespace authserver {
 
-// What a client may do by itself, and nobody is asked for: see every token's data.
+// What a client may do by itself, and nobody is asked for: see every access token's data.
 inline constexpr char kIntrospectScope[] = "introspect";
 // What the user information endpoint asks for.
 inline constexpr char kProfileScope[] = "profile";
