@@ -178,7 +178,7 @@ test('a request without a scope asks for everything registered', async () => {
 });
 
 test('state comes back unchanged whatever it holds', async () => {
-  for (const state of ['%', '&error=x', 'a b+c', '#?/\\', 'ümlaut €', '"\'<>', 'x'.repeat(4096)]) {
+  for (const state of ['%', '&error=x', 'a b+c', '#?/\\', 'ümlaut €', '"\'<>', '/'.repeat(4096)]) {
     const answer = await allowed(server, album, { state });
     assert.deepEqual(
       { ...answer, code: undefined },

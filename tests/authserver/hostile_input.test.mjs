@@ -249,7 +249,7 @@ test('requests that are no HTTP are refused by the web server', async () => {
     `${length} 5\r\nContent-Length: 6\r\n\r\nabcdef`,
     `${length} 99999999999999999999\r\n\r\n`,
     `${length} 4\r\nTransfer-Encoding: chunked\r\n\r\n0\r\n\r\n`,
-    `GET /userinfo HTTP/1.0\r\nAuthorization: ${'x'.repeat(20000)}\r\n\r\n`,
+    `GET /userinfo HTTP/1.0\r\nAuthorization: ${'x'.repeat(60000)}\r\n\r\n`,
     `GET /${'x'.repeat(100000)} HTTP/1.0\r\n\r\n`,
   ];
   for (const bytes of requests) {
