@@ -10,6 +10,7 @@
 #include <iostream>
 
 #include "configuration.h"
+#include "control_characters.h"
 #include "json/writer.h"
 #include "oauth_clientInfo.h"
 #include "redirect_uri.h"
@@ -56,10 +57,21 @@ void init(const std::string& folder, std::string issuer) {
   writeJsonFile(configurationPath("config.json"), configuration);
 }
 
-void addUser(const std::string& name, const std::string& displayName) {
+// The first line of standard input, which may end as Windows ends lines.
+std::string givenPassword() {
   std::string password;
   std::getline(std::cin, password);
-  if (password.size() < 8) throw std::runtime_error("a password has at least 8 characters");
+  if (!password.empty() && password.back() == '\r') password.pop_back();
+  if (password.size() < 8 || password.size() > 1024 || hasControlCharacters(password))
+    throw std::runtime_error("a password has 8 to 1024 bytes and no control characters");
+  return password;
+}
+
+void addUser(const std::string& name, const std::string& displayName) {
+  constexpr std::size_t kLongestName = 256;  // bytes, as the stores take
+  if (name.empty() || name.size() > kLongestName || hasControlCharacters(name))
+    throw std::runtime_error("a name has 1 to 256 bytes and no control characters");
+  const std::string password = givenPassword();
   Json::Value document = readJsonFile(configurationPath("users.json"));
   if (document["users"].isMember(name)) throw std::runtime_error("there is a user of that name");
   Json::Value& user = document["users"][name];

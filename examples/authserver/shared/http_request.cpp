@@ -7,6 +7,7 @@
 #include <cstdlib>
 #include <set>
 
+#include "control_characters.h"
 #include "refusal.h"
 
 namespace authserver {
@@ -19,10 +20,6 @@ constexpr char kForm[] = "application/x-www-form-urlencoded";
 std::string variable(const char* name) {
   const char* const value = std::getenv(name);
   return value == nullptr ? "" : value;
-}
-
-bool hasControlCharacters(const std::string& text) {
-  return std::any_of(text.begin(), text.end(), [](unsigned char c) { return c < ' ' || c == 127; });
 }
 
 std::string joined(const std::vector<std::string>& words) {

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <iostream>
 
+#include "control_characters.h"
+
 namespace authserver {
 namespace {
 
@@ -28,8 +30,7 @@ void write(std::ostream& out, const Headers& headers) {
 // A line break in a value would begin a header of somebody else's making.
 void check(const Headers& headers) {
   for (const auto& [name, value] : headers)
-    for (const unsigned char c : value)
-      if (c < ' ' || c == 127) throw std::logic_error("control character in header " + name);
+    if (hasControlCharacters(value)) throw std::logic_error("control character in header " + name);
 }
 
 }  // namespace

@@ -20,14 +20,14 @@ Json::Value document() { return readJsonFile(configurationPath("users.json")); }
 
 std::optional<User> findUser(const std::string& name) {
   const Json::Value users = document()["users"];
-  if (!users.isMember(name)) return std::nullopt;
+  if (name.empty() || !users.isMember(name)) return std::nullopt;
   return User{name, users[name]["display_name"].asString()};
 }
 
 std::optional<User> checkPassword(const std::string& name, const std::string& password) {
   const Json::Value content = document();
   const Json::Value& users = content["users"];
-  const bool known = users.isMember(name);
+  const bool known = !name.empty() && users.isMember(name);
   const std::string hash = known ? users[name]["password"].asString() : content["decoy"].asString();
   const bool right = crypto_pwhash_str_verify(hash.c_str(), password.c_str(), password.size()) == 0;
   if (!known || !right) return std::nullopt;

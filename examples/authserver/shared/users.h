@@ -12,6 +12,7 @@ struct User {
   std::string name, displayName;
 };
 
+// Nobody has the empty name, which stands for "not logged in".
 std::optional<User> findUser(const std::string& name);
 
 // The user, if the password is right. Takes as long for an unknown name: the decoy, the hash of a

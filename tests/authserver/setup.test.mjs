@@ -1,0 +1,85 @@
+// authserver_setup: what it refuses can never become part of a server.
+
+import assert from 'node:assert/strict';
+import { readFileSync, writeFileSync } from 'node:fs';
+import { after, afterEach, before, test } from 'node:test';
+
+import { authorizeUrl, logIn } from './code_flow.mjs';
+import { FormBrowser } from './form_browser.mjs';
+import { alice, photoAlbum, Server } from './server.mjs';
+
+const users = '/var/authserver/users.json';
+let server, album, original;
+before(async () => {
+  server = await Server.start();
+  album = server.addClient(photoAlbum);
+  original = readFileSync(users, 'utf8');
+});
+after(() => server.stop());
+afterEach(() => writeFileSync(users, original));
+
+const password = 'correct horse';
+const add = (name, input) =>
+  server.setup(['add-user', '/var/authserver', name, '--display-name', 'Bob'], input);
+
+function assertNotAdded(name, input, complaint) {
+  assert.throws(
+    () => add(name, input),
+    ({ status, stderr }) => status === 1 && String(stderr) === `authserver_setup: ${complaint}\n`,
+    JSON.stringify([name, input]),
+  );
+  assert.equal(readFileSync(users, 'utf8'), original);
+}
+
+async function heading(user) {
+  const browser = new FormBrowser(server);
+  await browser.open(authorizeUrl(album));
+  const { text } = await logIn(browser, user);
+  return /<h1>([^<]*)/.exec(text)[1];
+}
+
+test('names that are empty, too long or hold control characters are refused', () => {
+  for (const name of ['', 'x'.repeat(257), 'a\nb', 'a\tb', 'a\x7fb', '\x1b[2J'])
+    assertNotAdded(name, `${password}\n`, 'a name has 1 to 256 bytes and no control characters');
+});
+
+test('a name of 256 bytes can log in', async () => {
+  const bob = { name: 'x'.repeat(256), displayName: 'Bob', password };
+  server.addUser(bob);
+  assert.equal(await heading(bob), 'Allow Photo album?');
+});
+
+test('nobody has the empty name, whoever put it among the users', async () => {
+  const document = JSON.parse(original);
+  document.users[''] = document.users[alice.name];
+  writeFileSync(users, JSON.stringify(document));
+  const { text } = await new FormBrowser(server).open(authorizeUrl(album));
+  assert.match(text, /<h1>Log in<\/h1>/);
+  assert.equal(await heading({ name: '', password: alice.password }), 'Log in');
+  assert.equal(await heading(alice), 'Allow Photo album?');
+});
+
+test('passwords that are empty, of another length or hold control characters are refused', () => {
+  for (const input of [
+    '',
+    '\n',
+    '\r\n',
+    'seven 7\r\n',
+    `${'x'.repeat(1025)}\n`,
+    `tabbed\t${password}\n`,
+    `${password}\r\r\n`,
+    `${password}\0\n`,
+  ])
+    assertNotAdded('bob', input, 'a password has 8 to 1024 bytes and no control characters');
+});
+
+test('a password is the first line whichever way it ends', async () => {
+  const ends = ['', '\n', '\r\n', '\nsecond line\n'];
+  for (const [i, end] of ends.entries()) {
+    add(`bob${i}`, password + end);
+    assert.equal(await heading({ name: `bob${i}`, password }), 'Allow Photo album?');
+  }
+  const longest = { name: 'carol', displayName: 'Carol', password: 'x'.repeat(1024) };
+  server.addUser(longest);
+  assert.equal(await heading(longest), 'Allow Photo album?');
+});
