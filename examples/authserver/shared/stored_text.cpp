@@ -1,6 +1,7 @@
 #include "stored_text.h"
 
 #include <charconv>
+#include <limits>
 
 namespace authserver {
 
@@ -15,7 +16,11 @@ std::int64_t storedNumber(const Json::Value& row, const char* column) {
   const char* const end = text.data() + text.size();
   std::int64_t number = 0;
   const auto [stop, error] = std::from_chars(text.data(), end, number);
-  return error == std::errc() && stop == end ? number : 0;
+  if (error == std::errc::invalid_argument || stop != end) return 0;
+  using Limits = std::numeric_limits<std::int64_t>;
+  if (error == std::errc::result_out_of_range)
+    return text.front() == '-' ? Limits::min() : Limits::max();
+  return number;
 }
 
 }  // namespace authserver

@@ -13,7 +13,8 @@ namespace authserver {
 // SQL, which doubles it again, so that it comes back doubled. Every text of a row is read by this.
 std::string storedText(const Json::Value& row, const char* column);
 
-// A number, which rows hold as decimal text; 0 if it is none.
+// A number, which rows hold as decimal text; 0 if it is none, and the nearest that fits if it is
+// beyond 64 bits, as the library reads it: an expiry in the far future is not in the past.
 std::int64_t storedNumber(const Json::Value& row, const char* column);
 
 }  // namespace authserver
