@@ -9,6 +9,7 @@
 #include "endpoint.h"
 #include "scope.h"
 #include "tokens.h"
+#include "users.h"
 
 namespace authserver {
 namespace {
@@ -18,6 +19,9 @@ bool maySeeAccess(const Client& client, const Token& token) {
   // The tokens of a disabled client are worth nothing.
   return contains(client.scope, kIntrospectScope) && findClient(token.grant.clientId).has_value();
 }
+
+// Neither is what a user once allowed who was removed since.
+bool hasUser(const Token& token) { return findUser(token.grant.user).has_value(); }
 
 Json::Value describe(const Token& token, const std::string& scope) {
   Json::Value document;
@@ -40,14 +44,14 @@ Json::Value stateOf(const std::string& presented, const Client& client) {
   TokenStore tokens;
   if (const auto token = findAccessToken(tokens, presented)) {
     const bool expired = static_cast<std::int64_t>(std::time(nullptr)) > token->expires;
-    if (expired || !maySeeAccess(client, *token)) return inactive();
+    if (expired || !maySeeAccess(client, *token) || !hasUser(*token)) return inactive();
     Json::Value document = describe(*token, token->grant.accessScope);
     document["token_type"] = "Bearer";
     document["exp"] = static_cast<Json::Int64>(token->expires);
     return document;
   }
   const auto token = findRefreshToken(tokens, presented);  // of these none expires by itself
-  if (!token || token->grant.clientId != client.id) return inactive();
+  if (!token || token->grant.clientId != client.id || !hasUser(*token)) return inactive();
   return describe(*token, token->grant.refreshScope);
 }
 

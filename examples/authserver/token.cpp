@@ -12,6 +12,7 @@
 #include "store_errors.h"
 #include "tokens.h"
 #include "transaction.h"
+#include "users.h"
 
 namespace authserver {
 namespace {
@@ -26,6 +27,11 @@ std::string required(const Request& http, const char* name) {
 void endGrantOf(TokenStore& tokens, const std::string& code, const Client& client) {
   if (revokeIssuedFor(tokens, sha256(code), client.id) > 0)
     audit("code replayed, tokens revoked of " + quotedForLog(client.name));
+}
+
+// Who was removed has nothing more to allow.
+void checkUser(const std::string& name) {
+  if (!findUser(name)) throw invalidGrant("The user is gone.");
 }
 
 // What is refused without harm to the code.
@@ -54,6 +60,7 @@ Json::Value tradeCode(TokenStore& tokens, const Request& http, const Client& cli
     throw invalidGrant("The code is not valid.");
   }
   checkCode(*code, redirectUri, verifier);
+  checkUser(code->user);
   if (!spend(tokens, *code)) throw invalidGrant("The code is not valid.");
   if (!code->challenge.empty() && !equalSecrets(code->challenge, sha256(verifier))) {
     transaction.commit();  // spent for nothing, so that nobody guesses at the verifier
@@ -71,6 +78,7 @@ Json::Value rotate(TokenStore& tokens, const Request& http, const Client& client
   const std::optional<Token> old = findRefreshToken(tokens, required(http, "refresh_token"));
   if (!old || old->grant.clientId != client.id)
     throw invalidGrant("The refresh token is not valid.");
+  checkUser(old->grant.user);
   Grant grant = old->grant;
   grant.accessScope = narrowed(http.get("scope"), grant.refreshScope);
   if (!attempt(tokens, [&] { return tokens.Revoke(old->id); }))

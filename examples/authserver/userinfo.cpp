@@ -16,21 +16,19 @@ namespace {
 
 constexpr char kBearer[] = "Bearer ";
 
-// error is "" for a request that tried nothing (RFC 6750, section 3.1).
-Refusal unauthorized(int status, const std::string& error, const std::string& words,
-                     const std::string& more = "") {
+constexpr char kChallenge[] = "Bearer realm=\"authserver\"";
+
+Refusal refused(int status, const std::string& error, const std::string& words,
+                const std::string& more = "") {
   const std::string details =
-      error.empty() ? "" : ", error=\"" + error + "\", error_description=\"" + words + "\"" + more;
-  return {status,
-          error.empty() ? "invalid_request" : error,
-          words,
-          {{"WWW-Authenticate", "Bearer realm=\"authserver\"" + details}}};
+      ", error=\"" + error + "\", error_description=\"" + words + "\"" + more;
+  return {status, error, words, {{"WWW-Authenticate", kChallenge + details}}};
 }
 
+// "" if the request brings none.
 std::string presentedToken() {
   const std::string header = Request::authorization();
-  if (strncasecmp(header.c_str(), kBearer, sizeof kBearer - 1) != 0)
-    throw unauthorized(401, "", "An access token is needed.");
+  if (strncasecmp(header.c_str(), kBearer, sizeof kBearer - 1) != 0) return "";
   return header.substr(sizeof kBearer - 1);
 }
 
@@ -42,16 +40,19 @@ std::string userOf(const std::string& presented) {
   const bool valid = attempt(tokens, [&] { return tokens.Verify(presented, verified); });
   const auto token = valid ? findAccessToken(tokens, presented) : std::nullopt;
   if (!token || !findClient(token->grant.clientId))
-    throw unauthorized(401, "invalid_token", "The access token is not valid.");
+    throw refused(401, "invalid_token", "The access token is not valid.");
   if (!contains(storedText(verified, "scope"), kProfileScope))
-    throw unauthorized(403, "insufficient_scope", "The scope profile is needed.",
-                       std::string(", scope=\"") + kProfileScope + "\"");
+    throw refused(403, "insufficient_scope", "The scope profile is needed.",
+                  std::string(", scope=\"") + kProfileScope + "\"");
   return storedText(verified, "username");
 }
 
 Response userinfo(const Request&) {
-  const std::optional<User> user = findUser(userOf(presentedToken()));
-  if (!user) throw unauthorized(401, "invalid_token", "The user is gone.");
+  const std::string presented = presentedToken();
+  // Who tried nothing is told of no error (RFC 6750, section 3.1).
+  if (presented.empty()) return {401, {{"WWW-Authenticate", kChallenge}}, ""};
+  const std::optional<User> user = findUser(userOf(presented));
+  if (!user) throw refused(401, "invalid_token", "The user is gone.");
   Json::Value document;
   document["sub"] = user->name;
   document["name"] = user->displayName;

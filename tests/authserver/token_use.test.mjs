@@ -1,9 +1,10 @@
 // What becomes of tokens: /userinfo (RFC 6750), /introspect (RFC 7662), /revoke (RFC 7009).
 
 import assert from 'node:assert/strict';
+import { readFileSync, writeFileSync } from 'node:fs';
 import { after, afterEach, before, test } from 'node:test';
 
-import { issued, refresh } from './code_flow.mjs';
+import { allowed, issued, refresh, tradeCode } from './code_flow.mjs';
 import { basic, bearer, post, request } from './http.mjs';
 import { assertNotStored, assertRefused, leavesNoTrace } from './outcomes.mjs';
 import { alice, photoAlbum, printShop, Server } from './server.mjs';
@@ -22,6 +23,15 @@ before(async () => {
 after(() => server.stop());
 afterEach(() => server.clear());
 
+// As if all users had been removed.
+async function withoutUsers(action) {
+  const file = '/var/authserver/users.json';
+  const original = readFileSync(file, 'utf8');
+  writeFileSync(file, JSON.stringify({ ...JSON.parse(original), users: {} }));
+  await action();
+  writeFileSync(file, original);
+}
+
 const userinfo = (headers) => request(`${server.issuer}/userinfo`, { headers });
 const introspect = (client, token) => post(server, '/introspect', { token }, basic(client));
 const revoke = (client, token, changes = {}) =>
@@ -30,13 +40,19 @@ const revoke = (client, token, changes = {}) =>
 function assertUnauthorized(answer, status, error) {
   assert.equal(answer.status, status, answer.text);
   assertNotStored(answer);
-  const challenge = answer.headers['www-authenticate'];
-  if (error === undefined) assert.equal(challenge, 'Bearer realm="authserver"');
-  else
-    assert.match(
-      challenge,
-      new RegExp(`^Bearer realm="authserver", error="${error}", error_description="[^"]+"`),
-    );
+  assert.match(
+    answer.headers['www-authenticate'],
+    new RegExp(`^Bearer realm="authserver", error="${error}", error_description="[^"]+"`),
+  );
+  assert.equal(answer.json.error, error);
+}
+
+// No error: nothing was tried.
+function assertTokenNeeded(answer) {
+  assert.equal(answer.status, 401);
+  assertNotStored(answer);
+  assert.equal(answer.headers['www-authenticate'], 'Bearer realm="authserver"');
+  assert.equal(answer.text, '');
 }
 
 async function assertInactive(client, token) {
@@ -57,17 +73,13 @@ test('userinfo tells the name of the user to who has the scope profile', async (
 });
 
 test('userinfo without a token says how to come by one', async () => {
-  assertUnauthorized(await userinfo({}), 401, undefined);
-  assertUnauthorized(await userinfo(basic(album)), 401, undefined);
+  assertTokenNeeded(await userinfo({}));
+  assertTokenNeeded(await userinfo(basic(album)));
 });
 
 test('userinfo takes no token from the query', async () => {
   const { access_token: token } = await issued(server, album);
-  assertUnauthorized(
-    await request(`${server.issuer}/userinfo?access_token=${token}`),
-    401,
-    undefined,
-  );
+  assertTokenNeeded(await request(`${server.issuer}/userinfo?access_token=${token}`));
 });
 
 test('userinfo refuses unknown and expired tokens with invalid_token', async () => {
@@ -98,6 +110,36 @@ test('the tokens of a disabled client open nothing', async () => {
   await assertInactive(gateway, tokens.access_token);
   await assertInactive(gateway, tokens.refresh_token);
   server.oauthctl('client', 'enable', album.id);
+});
+
+test('a user who was removed gets no tokens and no answer', async () => {
+  const { code } = await allowed(server, album);
+  const tokens = await issued(server, album);
+  await withoutUsers(() =>
+    leavesNoTrace(server, async () => {
+      assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant');
+      assertRefused(await refresh(server, album, tokens.refresh_token), 400, 'invalid_grant');
+      for (const token of [tokens.access_token, tokens.refresh_token]) {
+        await assertInactive(album, token);
+        await assertInactive(gateway, token);
+      }
+      assertUnauthorized(await userinfo(bearer(tokens.access_token)), 401, 'invalid_token');
+    }),
+  );
+  assert.equal((await introspect(album, tokens.access_token)).json.active, true);
+});
+
+test('an expiry beyond 64 bits is the far future everywhere', async () => {
+  const { code } = await allowed(server, album);
+  const { access_token: token } = await issued(server, album);
+  for (const table of ['grantCode', 'token'])
+    server.sql(`UPDATE oauth_${table} SET expired_time = '99999999999999999999'`);
+  assert.equal((await userinfo(bearer(token))).status, 200);
+  assert.deepEqual((await introspect(album, token)).text.match(/"exp":\d+|"active":\w+/g), [
+    '"active":true',
+    '"exp":9223372036854775807',
+  ]);
+  assert.equal((await tradeCode(server, album, code)).status, 200);
 });
 
 test('introspection tells a client about its own tokens', async () => {
