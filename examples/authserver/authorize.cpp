@@ -72,15 +72,30 @@ void checkFormToken(const Request& http, const AuthorizationRequest& request,
                 "This form is too old, or does not come from this server. Nothing was done.");
 }
 
-Response authorize(const Request& http) {
-  AuthorizationRequest request(http);
+Response backToClient(const Request& http, const AuthorizationRequest& request,
+                      const Refusal& refusal) {
+  return redirection(http.isPost() ? 303 : 302, request.answer(refusal));
+}
+
+Response decide(const Request& http, AuthorizationRequest& request) {
   const Session session = currentSession(http);
   if (http.isPost()) checkFormToken(http, request, session);
   try {
     request.check();
     return http.isPost() ? act(http, request, session) : show(request, session);
   } catch (const Refusal& refusal) {
-    return redirection(http.isPost() ? 303 : 302, request.answer(refusal));
+    return backToClient(http, request, refusal);
+  }
+}
+
+Response authorize(const Request& http) {
+  AuthorizationRequest request(http);
+  try {
+    return decide(http, request);
+  } catch (const Refusal&) {
+    throw;
+  } catch (const std::exception& error) {  // as an error code, since no status goes by redirect
+    return backToClient(http, request, serverError(error));
   }
 }
 

@@ -7,6 +7,11 @@
 
 namespace authserver {
 
+Refusal serverError(const std::exception& error) {
+  std::cerr << std::string("authserver: ") + error.what() + '\n';
+  return {500, "server_error", "Something went wrong on the server."};
+}
+
 int serve(const std::vector<std::string>& methods, Response (*answer)(const Request& request),
           Response (*explain)(const Refusal& refusal)) {
   try {
@@ -18,15 +23,15 @@ int serve(const std::vector<std::string>& methods, Response (*answer)(const Requ
       send(explain(refusal));
     }
     return 0;
-  } catch (const std::exception& error) {
-    std::cerr << std::string("authserver: ") + error.what() + '\n';
+  } catch (const std::exception& failure) {
+    const Refusal refusal = serverError(failure);
+    try {
+      send(explain(refusal));
+    } catch (const std::exception& error) {  // the web server says so then
+      std::cerr << std::string("authserver: and no answer: ") + error.what() + '\n';
+    }
+    return 1;
   }
-  try {
-    send(explain({500, "server_error", "Something went wrong on the server."}));
-  } catch (const std::exception& error) {  // the web server says so then
-    std::cerr << std::string("authserver: and no answer: ") + error.what() + '\n';
-  }
-  return 1;
 }
 
 }  // namespace authserver
