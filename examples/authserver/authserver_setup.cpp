@@ -13,6 +13,7 @@
 #include "control_characters.h"
 #include "json/writer.h"
 #include "oauth_clientInfo.h"
+#include "random_bytes.h"
 #include "redirect_uri.h"
 #include "scope.h"
 #include "users.h"
@@ -34,16 +35,9 @@ void writeJsonFile(const std::string& path, const Json::Value& document) {
   writeFile(path, document.toStyledString());
 }
 
-std::string randomBytes(std::size_t count) {
-  std::string bytes(count, '\0');
-  randombytes_buf(bytes.data(), bytes.size());
-  return bytes;
-}
-
-void init(const std::string& folder, std::string issuer) {
-  if (issuer.rfind("https://", 0) != 0 && issuer.rfind("http://", 0) != 0)
-    throw std::runtime_error("the issuer must be an https URL, or http for a trial");
-  if (issuer.back() == '/') issuer.pop_back();
+void init(const std::string& folder, const std::string& issuer) {
+  if (!isOrigin(issuer))
+    throw std::runtime_error("the issuer must be https://HOST[:PORT], or http on this machine");
   std::filesystem::create_directories(folder);
   if (std::filesystem::exists(configurationPath("config.json")))
     throw std::runtime_error(folder + " is set up already");
@@ -85,7 +79,7 @@ void addClient(const std::string& redirectUri, const std::string& scope, const s
   if (!isRegistrable(redirectUri))
     throw std::runtime_error(
         "the redirect URI must be https, http on this machine, or an app's (com.example.app:/...)");
-  scopesOf(scope);
+  checkScopes(scope);
   ZEVOOAUTHSERVER::OAUTHDBClientInfo clients("oauth_clientInfo");
   Json::Value registered;
   if (!clients.Add(redirectUri, scope, name, registered))

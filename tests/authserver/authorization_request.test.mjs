@@ -5,7 +5,7 @@ import { after, afterEach, before, test } from 'node:test';
 
 import { allowed, atConsent, authorizeUrl, pkce, tradeCode, withChallenge } from './code_flow.mjs';
 import { elements, FormBrowser, textOf } from './form_browser.mjs';
-import { encoded, request } from './http.mjs';
+import { basic, encoded, post, request } from './http.mjs';
 import { assertBadRequest, assertErrorPage, assertRedirected, assertTokens } from './outcomes.mjs';
 import { photoAlbum, printShop, Server } from './server.mjs';
 
@@ -102,6 +102,34 @@ test('http is accepted for a loopback redirect URI only', async () => {
     assertErrorPage(await ask({ ...local, redirectUri }), 400);
 });
 
+test('a registration that kept its scheme matches with that scheme only', async () => {
+  const registered = { ...local, name: 'Changed', redirectUri: 'https://changed.example/cb' };
+  const changed = server.addClient(registered);
+  const store = (uri) =>
+    server.sql(`UPDATE oauth_clientInfo SET redirect_uri = '${uri}' WHERE display_name = 'Changed'`);
+  const status = async (redirectUri) => (await ask({ ...changed, redirectUri })).status;
+
+  store('https://changed.example/cb');
+  assert.equal(await status('https://changed.example/cb'), 200);
+  store('http://localhost:9999/cb');
+  assert.equal(await status('http://localhost:9999/cb'), 200);
+  for (const [stored, presented] of [
+    ['https://changed.example/cb', 'http://changed.example/cb'],
+    ['https://changed.example/cb', 'changed.example/cb'],
+    ['https://changed.example/cb', 'https://https://changed.example/cb'],
+    ['https://changed.example/cb', 'https://changed.example/cb/more'],
+    ['https://localhost/cb', 'http://localhost/cb'],
+    ['http://localhost/cb', 'https://localhost/cb'],
+    ['http://changed.example/cb', 'http://changed.example/cb'],
+    ['http://changed.example/cb', 'https://changed.example/cb'],
+    ['ftp://changed.example/cb', 'ftp://changed.example/cb'],
+    ['https://changed.example/cb#x', 'https://changed.example/cb#x'],
+  ]) {
+    store(stored);
+    assertErrorPage(await ask({ ...changed, redirectUri: presented }), 400);
+  }
+});
+
 test('redirect URIs that could never match safely cannot be registered', () => {
   for (const redirectUri of [
     'http://album.example/callback',
@@ -175,6 +203,21 @@ test('a request without a scope asks for everything registered', async () => {
     'Add, change and delete your photos and albums',
     'Know your name',
   ]);
+});
+
+test('a registered scope that is none is not granted and harms nothing', async () => {
+  const odd = server.addClient({ ...photoAlbum, name: 'Odd' });
+  server.sql(`UPDATE oauth_clientInfo SET scope = 'read "x" \\' WHERE display_name = 'Odd'`);
+  for (const scope of [undefined, 'read', 'read write']) {
+    const { code } = await allowed(server, odd, { scope });
+    const { json: tokens } = await tradeCode(server, odd, code);
+    assert.equal(tokens.scope, 'read');
+    const seen = await post(server, '/introspect', { token: tokens.access_token }, basic(odd));
+    assert.deepEqual([seen.status, seen.json.active, seen.json.scope], [200, true, 'read']);
+  }
+  for (const scope of ['"x"', 'read "x"', '\\'])
+    assertRedirected(await ask(odd, { scope }), server, odd, 'invalid_scope');
+  server.clear();
 });
 
 test('state comes back unchanged whatever it holds', async () => {

@@ -1,7 +1,7 @@
 // authserver_setup: what it refuses can never become part of a server.
 
 import assert from 'node:assert/strict';
-import { readFileSync, writeFileSync } from 'node:fs';
+import { existsSync, readFileSync, rmSync, writeFileSync } from 'node:fs';
 import { after, afterEach, before, test } from 'node:test';
 
 import { authorizeUrl, logIn } from './code_flow.mjs';
@@ -82,4 +82,50 @@ test('a password is the first line whichever way it ends', async () => {
   const longest = { name: 'carol', displayName: 'Carol', password: 'x'.repeat(1024) };
   server.addUser(longest);
   assert.equal(await heading(longest), 'Allow Photo album?');
+});
+
+test('an issuer is a scheme, a host and perhaps a port, and http on this machine only', () => {
+  const init = (folder, issuer) => server.setup(['init', folder, '--issuer', issuer]);
+  for (const issuer of [
+    '',
+    'login.example',
+    'https://',
+    'https://login.example/',
+    'https://login.example/path',
+    'https://login.example?query',
+    'https://login.example#fragment',
+    'https://user@login.example',
+    'https://login.example ',
+    'https://login .example',
+    'https://login.example:',
+    'https://login.example:port',
+    'HTTPS://login.example',
+    'https://https://login.example',
+    'ftp://login.example',
+    'com.example.login:/',
+    'http://login.example',
+    'http://127.0.0.1.login.example',
+  ]) {
+    assert.throws(
+      () => init('/var/refused', issuer),
+      ({ status, stderr }) =>
+        status === 1 &&
+        String(stderr) ===
+          'authserver_setup: the issuer must be https://HOST[:PORT], or http on this machine\n',
+      issuer,
+    );
+    assert.equal(existsSync('/var/refused'), false);
+  }
+  for (const issuer of [
+    'https://login.example',
+    'https://login.example:8443',
+    'https://[2001:db8::1]',
+    'http://127.0.0.1:8080',
+    'http://[::1]',
+    'http://localhost',
+  ]) {
+    init('/var/accepted', issuer);
+    assert.deepEqual(JSON.parse(readFileSync('/var/accepted/config.json', 'utf8')), { issuer });
+    rmSync('/var/accepted', { recursive: true });
+  }
 });

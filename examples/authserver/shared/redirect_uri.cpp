@@ -52,9 +52,14 @@ std::string withoutScheme(const std::string& uri) {
 bool isRegistered(const std::string& presented, const std::string& stored) {
   if (!isPlain(stored)) return false;
   if (hasPrivateScheme(stored)) return presented == stored;
-  const std::string authority = authorityOf(stored);
-  if (!isHost(authority)) return false;
-  return presented == kHttps + stored || (isThisMachine(authority) && presented == kHttp + stored);
+  const std::string bare = withoutScheme(stored), authority = authorityOf(bare);
+  if (!isHost(authority) || (stored != bare && stored != presented)) return false;
+  return presented == kHttps + bare || (isThisMachine(authority) && presented == kHttp + bare);
+}
+
+bool isOrigin(const std::string& uri) {
+  const std::string host = withoutScheme(uri);
+  return isHost(host) && isRegistrable(uri);
 }
 
 bool isRegistrable(const std::string& uri) { return isRegistered(uri, withoutScheme(uri)); }

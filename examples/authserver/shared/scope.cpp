@@ -12,6 +12,10 @@ constexpr std::size_t kLongestList = 1024;  // bytes; must fit into columns besi
 
 bool isScopeCharacter(char c) { return c == '!' || (c >= '#' && c <= '~' && c != '\\'); }
 
+bool isScope(const std::string& word) {
+  return std::all_of(word.begin(), word.end(), isScopeCharacter);
+}
+
 std::string listOf(const std::vector<std::string>& scopes) {
   std::string list;
   for (const std::string& scope : scopes) list += (list.empty() ? "" : " ") + scope;
@@ -35,15 +39,17 @@ std::string meaningOf(const std::string& scope) {
   return scope;
 }
 
+void checkScopes(const std::string& list) {
+  for (const std::string& word : scopesOf(list))
+    if (!isScope(word)) throw invalidScope("The scope holds characters that no scope has.");
+}
+
 std::vector<std::string> scopesOf(const std::string& list) {
   std::vector<std::string> scopes;
   std::istringstream words(list);
-  for (std::string scope; std::getline(words, scope, ' ');) {
-    if (!std::all_of(scope.begin(), scope.end(), isScopeCharacter))
-      throw invalidScope("The scope holds characters that no scope has.");
+  for (std::string scope; std::getline(words, scope, ' ');)
     if (!scope.empty() && std::find(scopes.begin(), scopes.end(), scope) == scopes.end())
       scopes.push_back(scope);
-  }
   return scopes;
 }
 
@@ -53,10 +59,12 @@ bool contains(const std::string& list, const std::string& scope) {
 }
 
 std::string grantable(const std::string& asked, const std::string& registered) {
+  checkScopes(asked);
   std::vector<std::string> scopes = scopesOf(asked.empty() ? registered : asked);
   scopes.erase(std::remove_if(scopes.begin(), scopes.end(),
                               [&](const std::string& scope) {
-                                return scope == kIntrospectScope || !contains(registered, scope);
+                                return scope == kIntrospectScope || !isScope(scope) ||
+                                       !contains(registered, scope);
                               }),
                scopes.end());
   if (scopes.empty()) throw invalidScope("The client is registered for none of these scopes.");
@@ -66,6 +74,7 @@ std::string grantable(const std::string& asked, const std::string& registered) {
 }
 
 std::string narrowed(const std::string& asked, const std::string& granted) {
+  checkScopes(asked);
   const std::vector<std::string> scopes = scopesOf(asked);
   for (const std::string& scope : scopes)
     if (!contains(granted, scope)) throw invalidScope("A scope was not granted.");

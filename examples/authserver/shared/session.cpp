@@ -6,7 +6,7 @@
 
 #include "configuration.h"
 #include "digest.h"
-#include "oauth_utils.h"
+#include "random_bytes.h"
 
 namespace authserver {
 namespace {
@@ -46,7 +46,7 @@ Session currentSession(const Request& request) {
 Session newSession(const std::string& user) {
   const long long expiry = static_cast<long long>(std::time(nullptr)) + kLifetime;
   const std::string content =
-      base64url(user) + '.' + std::to_string(expiry) + '.' + getRandomStr(32);
+      base64url(user) + '.' + std::to_string(expiry) + '.' + base64url(randomBytes(16));
   return {content + '.' + signatureOf(content), user};
 }
 
