@@ -54,10 +54,7 @@ test('a failure elsewhere is 500 without its reason', async () => {
     const answer = await request(`${server.issuer}/userinfo`, { headers: bearer(token) });
     assert.deepEqual(
       [answer.status, answer.json],
-      [
-        500,
-        { error: 'server_error', error_description: 'Something went wrong on the server.' },
-      ],
+      [500, { error: 'server_error', error_description: 'Something went wrong on the server.' }],
     );
   });
 });

@@ -15,12 +15,6 @@ namespace {
 constexpr char kTable[] = "oauth_grantCode";
 constexpr std::size_t kCodeLength = 64;  // bytes
 
-// The column "state" is ours to use: "<digest of the redirect URI>.<challenge>", of a fixed length
-// and without quotes, whatever the client sent.
-std::string stateOf(const std::string& redirectDigest, const std::string& challenge) {
-  return redirectDigest + '.' + challenge;
-}
-
 // Lets a store serve the codes for as long as this lives.
 class CodesFor {
  public:
@@ -44,7 +38,9 @@ std::string issueCode(const std::string& user, const std::string& clientId,
                       const std::string& challenge) {
   ZEVOOAUTHSERVER::OAUTHDBGrantCode store(kTable);
   requireOpen(store);
-  const std::string state = stateOf(sha256(redirectUri), challenge);
+  // The column "state" is ours to use: "<digest of the redirect URI>.<challenge>", of a fixed
+  // length and without quotes, whatever the client sent.
+  const std::string state = sha256(redirectUri) + '.' + challenge;
   Json::Value issued;
   const auto add = [&] {
     return attempt(store,
