@@ -61,7 +61,7 @@ mkdir -p "$AUTHSERVER_SCREENSHOTS"
 # shellcheck disable=SC2016 # expanded inside
 scripts/authserver-namespace.sh unshare --pid --fork --kill-child --mount-proc bash -c '
   export HOME=/var/tmp TMPDIR=/var/tmp
-  cd "$1" && shift && exec node --test --test-concurrency=1 --test-reporter=spec \
+  cd "$1" && shift && exec node --test --test-concurrency=1 --test-reporter=tap \
     --test-reporter-destination=stdout --test-reporter=tap --test-reporter-destination=tests.tap \
     "$@"' test-authserver "$tests" "${files[@]}" &
 runner=$!

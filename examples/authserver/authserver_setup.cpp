@@ -11,7 +11,6 @@
 
 #include "configuration.h"
 #include "control_characters.h"
-#include "json/writer.h"
 #include "oauth_clientInfo.h"
 #include "random_bytes.h"
 #include "redirect_uri.h"

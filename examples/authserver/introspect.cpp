@@ -20,7 +20,7 @@ bool maySeeAccess(const Client& client, const Token& token) {
   return contains(client.scope, kIntrospectScope) && findClient(token.grant.clientId).has_value();
 }
 
-// Neither is what a user once allowed who was removed since.
+// What a user allowed ends with the user.
 bool hasUser(const Token& token) { return findUser(token.grant.user).has_value(); }
 
 Json::Value describe(const Token& token, const std::string& scope) {

@@ -8,16 +8,12 @@ import { atConsent, allowed, authorizeUrl, issued, refresh, tradeCode } from './
 import { FormBrowser } from './form_browser.mjs';
 import { basic, bearer, post, request } from './http.mjs';
 import { assertErrorPage, assertRedirected, assertRefused, assertTokens } from './outcomes.mjs';
-import { Server } from './server.mjs';
+import { photoAlbum, Server } from './server.mjs';
 
 let server, album;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read profile',
-    name: 'Photo album',
-  });
+  album = server.addClient({ ...photoAlbum, scope: 'read profile' });
 });
 after(() => server.stop(/^authserver: the database did not open \[-1\] Create table failed$/));
 afterEach(() => server.clear());

@@ -9,7 +9,7 @@ import { AuthorizationCode } from 'simple-oauth2';
 import { logIn, pkce, withChallenge } from './code_flow.mjs';
 import { FormBrowser } from './form_browser.mjs';
 import { bearer, request } from './http.mjs';
-import { alice, Server } from './server.mjs';
+import { alice, photoAlbum, Server } from './server.mjs';
 
 globalThis.crypto ??= webcrypto; // node 18 has none of its own
 const oauth = await import('oauth4webapi');
@@ -19,11 +19,7 @@ const scope = 'read profile';
 let server, album;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope,
-    name: 'Photo album',
-  });
+  album = server.addClient({ ...photoAlbum, scope });
 });
 after(() => server.stop());
 afterEach(() => server.clear());

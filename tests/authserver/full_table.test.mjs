@@ -5,17 +5,13 @@ import { after, afterEach, before, test } from 'node:test';
 
 import { allowed, atConsent, issued, refresh, tradeCode } from './code_flow.mjs';
 import { assertRedirected, assertRefused, assertTokens, leavesNoTrace } from './outcomes.mjs';
-import { Server } from './server.mjs';
+import { photoAlbum, Server } from './server.mjs';
 
 const scope = 'read profile';
 let server, album;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope,
-    name: 'Photo album',
-  });
+  album = server.addClient({ ...photoAlbum, scope });
 });
 after(() => server.stop());
 afterEach(() => {

@@ -6,16 +6,12 @@ import { after, afterEach, before, test } from 'node:test';
 import { allowed, issued, pkce, refresh, tradeCode, withChallenge } from './code_flow.mjs';
 import { bearer, request } from './http.mjs';
 import { assertRefused, assertTokens } from './outcomes.mjs';
-import { alice, Server } from './server.mjs';
+import { alice, photoAlbum, Server } from './server.mjs';
 
 let server, album;
 before(async () => {
   server = await Server.start();
-  album = server.addClient({
-    redirectUri: 'https://album.example/callback',
-    scope: 'read profile',
-    name: 'Photo album',
-  });
+  album = server.addClient({ ...photoAlbum, scope: 'read profile' });
 });
 after(() => server.stop());
 afterEach(() => server.clear());
