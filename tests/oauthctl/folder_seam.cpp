@@ -3,11 +3,12 @@
 // used. The encryption is that of the host's seam.
 
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <sqlite3.h>
 #include <sys/time.h>
 #include <unistd.h>
 
-#include <cstdio>
+#include <cstdarg>
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
@@ -59,9 +60,23 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
                          nullptr);
 }
 
-extern "C" FILE* fopen64(const char* path, const char* mode) {
-  return next("fopen64", fopen64)(redirected(path).c_str(), mode);
+extern "C" int open64(const char* path, int flags, ...) {
+  va_list arguments;
+  va_start(arguments, flags);
+  const auto mode = va_arg(arguments, unsigned);  // unused by a call that gives none
+  va_end(arguments);
+  return next("open64", open64)(redirected(path).c_str(), flags, mode);
 }
+
+// lstat() by the names that it has in binaries: with 64-bit offsets, and with 64-bit times on a
+// 32-bit machine.
+#define REPLACE_LSTAT(function, symbol)                                 \
+  extern "C" int function(const char* path, void* out) __asm__(symbol); \
+  extern "C" int function(const char* path, void* out) {                \
+    return next(symbol, function)(redirected(path).c_str(), out);       \
+  }
+REPLACE_LSTAT(lstat64Seam, "lstat64")
+REPLACE_LSTAT(lstat64Time64Seam, "__lstat64_time64")
 
 extern "C" int access(const char* path, int mode) noexcept {
   return next("access", access)(redirected(path).c_str(), mode);
