@@ -42,6 +42,7 @@ cd "$work/$name"
 mapfile -t objects < <(LC_ALL=C grep -rlaP '^\x7fELF' . | sort)
 [ "${objects[*]}" = "./bin/oauthctl ./lib/libzevooauth.so.$version" ] ||
   fail "programs in the archive: ${objects[*]}"
+"$source/tests/hardening_test.sh" --installed . || fail "the archive is not hardened"
 places=(-e "$source/" -e "$(dirname "$build")/" -e "$work/")
 if grep -rlaF "${places[@]}" .; then
   fail "these files name a folder of this machine"

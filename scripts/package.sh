@@ -30,6 +30,15 @@ if ! (cd "$work/zevooauth" &&
   exit 1
 fi
 
+for package in "$work"/*.deb; do
+  dpkg-deb --extract "$package" "$work/installed"
+done
+if ! { tests/hardening_test.sh --built "$work"/zevooauth/obj-* &&
+  tests/hardening_test.sh --installed "$work/installed"; }; then
+  echo "package: the packages are not hardened" >&2
+  exit 1
+fi
+
 cp "$work"/zevooauth_* "$work"/*.deb "$folder"
 cd "$folder"
 if ! lintian --allow-root --fail-on error,warning --info ./*.changes; then

@@ -30,7 +30,7 @@ Dir::State::Lists "$apt/lists";
 Dir::Cache "$apt/cache";
 APT::Sandbox::User "root";
 END
-    APT_CONFIG=$apt/apt.conf apt-get update -qq
+    APT_CONFIG=$apt/apt.conf apt-get update -qq --error-on=any
     touch "$apt/updated"
   fi
   rm -rf "${work:?}/$1" "$work/download"
