@@ -6,7 +6,7 @@
 # FOLDER is a name below build/ (but see scripts/build-folder.sh). The last line tells where it is.
 # A release that is not hardened is an error.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 preset=$1
 folder=$(scripts/build-folder.sh "$2")

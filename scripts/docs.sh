@@ -3,7 +3,7 @@
 # An undocumented member, a broken reference and a link that leads nowhere are errors.
 # Installs what is missing (scripts/packages.sh, group docs). The last line tells where it is.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 scripts/packages.sh docs
 folder=$(scripts/build-folder.sh reference)

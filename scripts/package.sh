@@ -3,7 +3,7 @@
 # Installs what is missing (scripts/packages.sh, groups build and package). The same commit gives the
 # same packages, byte for byte.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 scripts/packages.sh build package
 folder=$(scripts/build-folder.sh packages)

@@ -7,7 +7,7 @@
 # What FOLDER holds already is not built again. The system's package configuration is left alone:
 # sources are fetched through one of their own, made from the places the system has.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 host=powerpc-linux-gnu
 mkdir -p "$1"

@@ -4,10 +4,14 @@
 # Runs as root. Installs what is missing (scripts/packages.sh, group bare); everything else goes into
 # those systems, whose downloads are kept for the next time.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 if [ "$(id -u)" -ne 0 ]; then
   echo "test-package: as root, please: it makes systems of their own" >&2
+  exit 1
+fi
+if ! unshare --mount --pid --fork --mount-proc true; then
+  echo "test-package: this machine does not let root make a namespace" >&2
   exit 1
 fi
 scripts/packages.sh bare
