@@ -26,7 +26,7 @@ done
 exec unshare "${user[@]}" --mount bash -c '
   set -euo pipefail
   new=$(mktemp --directory /tmp/authserver-var-XXXXXX)
-  trap "umount --recursive \"$new\"; rmdir \"$new\"" EXIT
+  trap "umount --recursive \"$new\" 2>/dev/null || true; rmdir \"$new\"" EXIT
   mount -t tmpfs -o mode=755 authserver "$new"
   (
     umask 022
@@ -40,7 +40,7 @@ exec unshare "${user[@]}" --mount bash -c '
   )
   while [ "$1" != -- ]; do shift; done
   shift
-  mount --move "$new" /var
+  mount --no-mtab --move "$new" /var
   rmdir "$new"
   trap - EXIT
   cd "$PWD"

@@ -94,11 +94,11 @@ ln -sfn /usr/include/CLI "$prefix/include/CLI"
 for package in sqlite3 libjsoncpp googletest nettle util-linux; do
   if [ ! -e "$prefix/$package.done" ]; then
     echo "powerpc-libraries: building $package"
-    fetch "$package"
     # Not in a condition: there the shell would go on after a step that failed.
     set +e
     (
       set -e
+      fetch "$package"
       build_$package
     ) >"$work/$package.log" 2>&1
     status=$?

@@ -37,7 +37,8 @@ if ! cmp --silent tests/authserver/package-lock.json "$tests/installed.json"; th
   cp tests/authserver/package.json tests/authserver/package-lock.json "$tests"
   # The machine's own certificate authorities count, too.
   if ! (cd "$tests" && NODE_EXTRA_CA_CERTS=/etc/ssl/certs/ca-certificates.crt \
-    npm ci --ignore-scripts --no-audit --no-fund --no-update-notifier) \
+    npm ci --ignore-scripts --no-audit --no-fund --no-update-notifier \
+    --fetch-retry-mintimeout=1000 --fetch-retry-maxtimeout=5000) \
     >"$tests/npm.log" 2>&1; then
     cat "$tests/npm.log" >&2
     echo "test-authserver: could not install what tests/authserver/package-lock.json names" >&2
