@@ -1,7 +1,6 @@
 // Linked into the test twin of oauthctl instead of its fixed paths: everything lies in the folder
-// that OAUTHCTL_FOLDER names, the clock stands at OAUTHCTL_NOW, the program runs as the user that
-// OAUTHCTL_USER names, and only the process's own ids are used. The encryption is that of the host's
-// seam.
+// that OAUTHCTL_FOLDER names, the clock stands at OAUTHCTL_NOW, and only the process's own ids are
+// used; root's process becomes user OAUTHCTL_USER. The encryption is that of the host's seam.
 
 #include <dlfcn.h>
 #include <grp.h>
@@ -50,8 +49,8 @@ std::time_t now() {
   return fixed == nullptr ? real.tv_sec : static_cast<std::time_t>(std::atoll(fixed));
 }
 
-// Root starts the program and becomes the user before main(): he need not reach the folder where the
-// program and its libraries lie. The process belongs to him as if he had started it himself.
+// Before main(), but after root has loaded the program: the user may be kept out of its folder.
+// The process then belongs to him as if he had started it himself.
 [[gnu::constructor]] void becomeUser() {
   const char* const user = std::getenv("OAUTHCTL_USER");
   if (user == nullptr) return;
