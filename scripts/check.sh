@@ -15,6 +15,7 @@ if ! "${user[@]}" true; then
   exit 1
 fi
 
+trap '[ $? -eq 0 ] || echo "check: failed" >&2' EXIT
 scripts/packages.sh build test check authserver
 
 mapfile -t sources < <(find include src platform examples tools tests -name '*.cpp' -o -name '*.h' | sort)

@@ -6,7 +6,7 @@ set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
 home=$(mktemp --directory /var/tmp/zevooauth-home-XXXXXX) # of mode 0700
-trap 'rm -rf "$home"' EXIT
+trap '[ $? -eq 0 ] || echo "test-odd-place: failed" >&2; rm -rf "$home"' EXIT
 mkdir "$home/a checkout"
 tar --create --exclude=./build --exclude=./.git . | tar --extract --directory "$home/a checkout"
 ln -s 'a checkout' "$home/link"

@@ -6,6 +6,7 @@
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
+trap '[ $? -eq 0 ] || echo "test-powerpc: failed" >&2' EXIT
 scripts/packages.sh build test powerpc
 libraries=$(scripts/build-folder.sh powerpc-libraries)
 scripts/powerpc-libraries.sh "$libraries"
