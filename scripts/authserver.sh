@@ -76,6 +76,10 @@ if [ "${AUTHSERVER_FOLDER-}" = /var/authserver ]; then # inside, see below
 fi
 
 # Asked first: building takes a minute.
+if [ "$port" -gt 65535 ] || [ "$port" -lt "$([ "$(id -u)" -eq 0 ] && echo 1 || echo 1024)" ]; then
+  echo "authserver: you cannot use port $port" >&2
+  exit 1
+fi
 if AUTHSERVER_PORT=$port answers; then
   echo "authserver: something else uses port $port" >&2
   exit 1
