@@ -3,8 +3,12 @@
 # empty entry, which the loader reads as the current folder, where anybody may have put a library.
 
 function(set_run_path target)  # FOLDER...
+  set(folders ${ARGN})
+  if(CMAKE_CROSSCOMPILING)  # the target's libraries lie in a folder of their own
+    list(APPEND folders ${JsonCpp_LIBRARY_DIRS})
+  endif()
   set_target_properties(${target} PROPERTIES
-    BUILD_WITH_INSTALL_RPATH ON INSTALL_RPATH "${ARGN}" INSTALL_RPATH_USE_LINK_PATH ON)
+    BUILD_WITH_INSTALL_RPATH ON INSTALL_RPATH "${folders}")
 endfunction()
 
 # After install(TARGETS), for the same folder and component.
