@@ -11,6 +11,7 @@ set(pkgconfig_folder ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
 install(TARGETS zevooauth EXPORT ZevoOAuthTargets
   LIBRARY COMPONENT runtime NAMELINK_COMPONENT development
   INCLUDES DESTINATION ${header_folder})
+install_without_run_path(zevooauth ${CMAKE_INSTALL_LIBDIR} runtime)
 install(DIRECTORY include/ DESTINATION ${header_folder} COMPONENT development
   FILES_MATCHING PATTERN *.h)
 
@@ -38,6 +39,7 @@ install(FILES CHANGELOG.md DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documen
 
 if(ZEVOOAUTH_BUILD_TOOLS)
   install(TARGETS oauthctl RUNTIME COMPONENT oauthctl)
+  install_without_run_path(oauthctl ${CMAKE_INSTALL_BINDIR} oauthctl)
   install(FILES tools/oauthctl/oauthctl.1
     DESTINATION ${CMAKE_INSTALL_MANDIR}/man1 COMPONENT oauthctl)
   install(FILES tools/oauthctl/oauthctl.bash RENAME oauthctl
@@ -46,3 +48,6 @@ endif()
 
 install(TARGETS zevocore zevocgi
   LIBRARY NAMELINK_SKIP COMPONENT standins EXCLUDE_FROM_ALL)
+foreach(stand_in zevocore zevocgi)
+  install_without_run_path(${stand_in} ${CMAKE_INSTALL_LIBDIR} standins EXCLUDE_FROM_ALL)
+endforeach()

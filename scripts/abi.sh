@@ -9,7 +9,7 @@
 # Installs what is missing (scripts/packages.sh, groups build, powerpc and abi) and keeps what it
 # builds for the target (scripts/powerpc-libraries.sh).
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 case ${1-} in
   '' | --record) mode=${1-} ;;

@@ -6,7 +6,7 @@
 #
 # Installs what is missing (scripts/packages.sh, group drawings).
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 drawing=docs/authserver-login.svg
 scripts/packages.sh drawings

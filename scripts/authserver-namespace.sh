@@ -3,20 +3,45 @@
 #
 #   scripts/authserver-namespace.sh COMMAND...
 #
-# Only the command and its children see the empty /var in memory, with the database's folder in it;
-# it is gone when the last of them ends. Needs root, or a kernel that lets users make namespaces.
+# Only the command and its children see the empty /var in memory, with the database's folder in it
+# and, if they lie there, this checkout and its build folder. It is gone when the last of them ends.
+# Needs root, or a kernel that lets users make namespaces.
 set -euo pipefail
+cd "$(dirname "$(readlink -f "$0")")/.."
 
-if [[ $PWD/ == /var/* ]]; then
-  echo "authserver-namespace: $PWD would be hidden, work outside /var" >&2
-  exit 1
-fi
 user=()
 [ "$(id -u)" -eq 0 ] || user=(--user --map-root-user)
+if ! unshare "${user[@]}" --mount true; then
+  echo "authserver-namespace: this machine does not let you make a namespace: run it as root" >&2
+  exit 1
+fi
+build=$(scripts/build-folder.sh authserver)
+kept=()
+for folder in "$PWD" "${build%/*}"; do
+  [[ $folder/ != /var/* ]] || kept+=("$folder")
+done
+
+# The new /var is made elsewhere, as long as what it takes over from the old one can be seen.
 # shellcheck disable=SC2016 # expanded inside
 exec unshare "${user[@]}" --mount bash -c '
   set -euo pipefail
-  mount -t tmpfs -o mode=755 authserver /var
-  mkdir -m 1777 /var/tmp
-  mkdir -p -m 700 /var/packages/Keyloft/target/etc
-  exec "$@"' authserver-namespace "$@"
+  new=$(mktemp --directory /tmp/authserver-var-XXXXXX)
+  trap "umount --recursive \"$new\" 2>/dev/null || true; rmdir \"$new\"" EXIT
+  mount -t tmpfs -o mode=755 authserver "$new"
+  (
+    umask 022
+    mkdir -m 1777 "$new/tmp"
+    mkdir -p -m 700 "$new/packages/Keyloft/target/etc"
+    while [ "$1" != -- ]; do
+      mkdir -p "$new${1#/var}"
+      mount --rbind "$1" "$new${1#/var}"
+      shift
+    done
+  )
+  while [ "$1" != -- ]; do shift; done
+  shift
+  mount --no-mtab --move "$new" /var
+  rmdir "$new"
+  trap - EXIT
+  cd "$PWD"
+  exec "$@"' authserver-namespace "${kept[@]}" -- "$@"

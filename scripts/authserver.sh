@@ -6,7 +6,7 @@
 # Installs what is missing (scripts/packages.sh, groups build and authserver). All it makes lies in
 # a private /var (scripts/authserver-namespace.sh): Ctrl-C ends it and removes everything.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 port=8080
 if [ $# -eq 2 ] && [ "$1" = --port ] && [[ $2 =~ ^[0-9]+$ ]]; then
@@ -34,10 +34,6 @@ serve() {
   id=$(grep -oP '"client_id" : "\K\w+' <<<"$client")
   secret=$(grep -oP '"client_secret" : "\K\w+' <<<"$client")
 
-  if answers; then
-    echo "authserver: something else uses port $AUTHSERVER_PORT" >&2
-    exit 1
-  fi
   lighttpd -D -f "$AUTHSERVER_SOURCE/lighttpd.conf" &
   server=$!
   trap 'kill "$server" 2>/dev/null || true' INT TERM
@@ -79,6 +75,16 @@ if [ "${AUTHSERVER_FOLDER-}" = /var/authserver ]; then # inside, see below
   exit
 fi
 
+# Asked first: building takes a minute.
+if [ "$port" -gt 65535 ] || [ "$port" -lt "$([ "$(id -u)" -eq 0 ] && echo 1 || echo 1024)" ]; then
+  echo "authserver: you cannot use port $port" >&2
+  exit 1
+fi
+if AUTHSERVER_PORT=$port answers; then
+  echo "authserver: something else uses port $port" >&2
+  exit 1
+fi
+scripts/authserver-namespace.sh true
 scripts/packages.sh build authserver
 build=$(scripts/build.sh release authserver -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
   -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=OFF | tail -n 1)

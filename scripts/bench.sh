@@ -9,7 +9,7 @@
 # Installs what is missing (scripts/packages.sh, groups build and bench). Works on a database of its
 # own in /var/tmp.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 recorded=bench/recorded_ratios.txt
 note=docs/performance.md

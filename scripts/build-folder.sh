@@ -5,24 +5,23 @@
 #
 #   scripts/build-folder.sh NAME
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 usable() { # ROOT NAME
   [[ $1 != *[[:space:]]* ]] && mkdir -p "$1" 2>/dev/null && [ -w "$1" ] &&
     { [ ! -e "$1/$2" ] || [ -w "$1/$2" ]; }
 }
 
-root=$PWD/build
-if ! usable "$root" "$1"; then
-  root=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth-$(cksum <<<"$PWD" | cut -d ' ' -f 1)
-  if ! usable "$root" "$1"; then
-    root=/tmp/zevooauth-build-$(id -u)
-    [ -d "$root" ] || mkdir -m 700 "$root"
+checkout=$(cksum <<<"$PWD" | cut -d ' ' -f 1)
+cache=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth-$checkout
+for root in "$PWD/build" "$cache" "/tmp/zevooauth-$(id -u)-$checkout"; do
+  root=$(realpath --canonicalize-missing "$root")
+  # What others may have made is no place to run programs from.
+  if usable "$root" "$1" && { [ "$root" = "$PWD/build" ] || [ -O "$root" ]; }; then
+    mkdir -p "$root/$1"
+    echo "$root/$1"
+    exit
   fi
-  if [ ! -O "$root" ]; then
-    echo "build-folder: $root belongs to somebody else" >&2
-    exit 1
-  fi
-fi
-mkdir -p "$root/$1"
-echo "$root/$1"
+done
+echo "build-folder: $root belongs to somebody else" >&2
+exit 1

@@ -4,8 +4,9 @@
 #   scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]
 #
 # FOLDER is a name below build/ (but see scripts/build-folder.sh). The last line tells where it is.
+# A release that is not hardened is an error.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 preset=$1
 folder=$(scripts/build-folder.sh "$2")
@@ -20,4 +21,7 @@ shift "$(($# > 0))"
 echo "build: preset $preset in $folder" >&2
 cmake --preset "$preset" -B "$folder" "${options[@]}" >/dev/null
 cmake --build "$folder" ${1:+--target "$@"} -- --quiet >&2
+if grep -qx 'CMAKE_BUILD_TYPE:STRING=RelWithDebInfo' "$folder/CMakeCache.txt" && [ "$preset" != fuzz ]; then
+  tests/hardening_test.sh --built "$folder" >&2
+fi
 echo "$folder"

@@ -3,7 +3,7 @@
 # Installs what is missing (scripts/packages.sh, group build). Makes the database's folder if there
 # is none, and the database and the key of the encryption stand-in in it; rows it makes are removed.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 data=/var/packages/Keyloft/target/etc
 

@@ -3,11 +3,16 @@
 # An undocumented member, a broken reference and a link that leads nowhere are errors.
 # Installs what is missing (scripts/packages.sh, group docs). The last line tells where it is.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 scripts/packages.sh docs
 folder=$(scripts/build-folder.sh reference)
 rm -rf "${folder:?}"/*
+# Elsewhere, since doxygen cannot follow a link in a path with a blank.
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+cp -r include docs "$work"
+cd "$work"
 {
   cat docs/reference/Doxyfile
   echo "OUTPUT_DIRECTORY = \"$folder\""

@@ -6,7 +6,7 @@
 # Installs what is missing (scripts/packages.sh, groups build and fuzz). Starts from the inputs kept
 # in tests/fuzz/corpus and what earlier runs found worth keeping, which stays in the build folder.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 if ! [[ ${1:-} =~ ^[1-9][0-9]*$ ]]; then
   echo "usage: scripts/fuzz.sh SECONDS" >&2

@@ -8,7 +8,7 @@
 # begin with "session:" are run unseen. FOLDER holds the test programs and is built if none is
 # given. The clock stands still, and random values are replaced by others that stay the same.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 check=
 if [ "${1-}" = --check ]; then

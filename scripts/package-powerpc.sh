@@ -6,7 +6,7 @@
 # Installs what is missing (scripts/packages.sh, groups build and powerpc) and keeps what it builds
 # for the target (scripts/powerpc-libraries.sh). The same commit gives the same archive anywhere.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 source=$PWD
 list=platform/powerpc/NEEDS.txt
@@ -16,6 +16,11 @@ fail() {
   echo "package-powerpc: $1" >&2
   exit 1
 }
+
+# Asked first, since what comes before takes minutes: the archive is used in a root folder of its own.
+user=()
+[ "$(id -u)" -eq 0 ] || user=(--user --map-root-user)
+unshare "${user[@]}" --mount true || fail 'this machine does not let you make a namespace: run it as root'
 
 scripts/packages.sh build powerpc
 libraries=$(scripts/build-folder.sh powerpc-libraries)
@@ -42,6 +47,7 @@ cd "$work/$name"
 mapfile -t objects < <(LC_ALL=C grep -rlaP '^\x7fELF' . | sort)
 [ "${objects[*]}" = "./bin/oauthctl ./lib/libzevooauth.so.$version" ] ||
   fail "programs in the archive: ${objects[*]}"
+"$source/tests/hardening_test.sh" --installed . || fail "the archive is not hardened"
 places=(-e "$source/" -e "$(dirname "$build")/" -e "$work/")
 if grep -rlaF "${places[@]}" .; then
   fail "these files name a folder of this machine"
@@ -137,15 +143,10 @@ powerpc-linux-gnu-g++ -std=c++17 "$source/tests/install/consumer.cpp" "${options
 
 cp "$(command -v qemu-ppc-static)" "$root/qemu"
 mkdir "$root/dev"
-if [ "$(id -u)" -eq 0 ]; then
-  mknod "$root/dev/urandom" c 1 9
-  enter=(chroot "$root")
-else
-  touch "$root/dev/urandom"
-  # shellcheck disable=SC2016 # for the inner shell
-  enter=(unshare --user --map-root-user --mount
-    sh -c 'mount --bind /dev/urandom "$0/dev/urandom" && exec chroot "$0" "$@"' "$root")
-fi
+touch "$root/dev/urandom"
+# shellcheck disable=SC2016 # for the inner shell
+enter=(unshare "${user[@]}" --mount
+  sh -c 'mount --bind /dev/urandom "$0/dev/urandom" && exec chroot "$0" "$@"' "$root")
 
 # STATUS TEXT PROGRAM ARGUMENT...: what the program says is TEXT, a regular expression, no more.
 expect() {

@@ -3,7 +3,7 @@
 # Installs what is missing (scripts/packages.sh, groups build and package). The same commit gives the
 # same packages, byte for byte.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 scripts/packages.sh build package
 folder=$(scripts/build-folder.sh packages)
@@ -27,6 +27,15 @@ if ! (cd "$work/zevooauth" &&
   dpkg-buildpackage --build=binary --unsigned-source --unsigned-changes) >"$work/build.log" 2>&1; then
   tail -n 40 "$work/build.log"
   echo "package: could not build the packages" >&2
+  exit 1
+fi
+
+for package in "$work"/*.deb; do
+  dpkg-deb --extract "$package" "$work/installed"
+done
+if ! { tests/hardening_test.sh --built "$work"/zevooauth/obj-* &&
+  tests/hardening_test.sh --installed "$work/installed"; }; then
+  echo "package: the packages are not hardened" >&2
   exit 1
 fi
 

@@ -7,7 +7,7 @@
 # What FOLDER holds already is not built again. The system's package configuration is left alone:
 # sources are fetched through one of their own, made from the places the system has.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 host=powerpc-linux-gnu
 mkdir -p "$1"
@@ -30,7 +30,7 @@ Dir::State::Lists "$apt/lists";
 Dir::Cache "$apt/cache";
 APT::Sandbox::User "root";
 END
-    APT_CONFIG=$apt/apt.conf apt-get update -qq
+    APT_CONFIG=$apt/apt.conf apt-get update -qq --error-on=any
     touch "$apt/updated"
   fi
   rm -rf "${work:?}/$1" "$work/download"
@@ -94,11 +94,11 @@ ln -sfn /usr/include/CLI "$prefix/include/CLI"
 for package in sqlite3 libjsoncpp googletest nettle util-linux; do
   if [ ! -e "$prefix/$package.done" ]; then
     echo "powerpc-libraries: building $package"
-    fetch "$package"
     # Not in a condition: there the shell would go on after a step that failed.
     set +e
     (
       set -e
+      fetch "$package"
       build_$package
     ) >"$work/$package.log" 2>&1
     status=$?

@@ -10,7 +10,7 @@
 # below the build folder). Everything runs in a private /var (scripts/authserver-namespace.sh) and
 # among processes of its own, which end with it.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 preset=release
 screenshots=
@@ -26,19 +26,19 @@ while [[ ${1-} == --* ]]; do
   shift
 done
 
+# Asked first, as the modules come first: building takes minutes.
+scripts/authserver-namespace.sh unshare --pid --fork --mount-proc true
 scripts/packages.sh build authserver e2e
-build=$(scripts/build.sh "$preset" "authserver-$preset" -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
-  -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=ON | tail -n 1)
 
 # Modules are looked for beside the tests: these run where they lie, not in the source tree.
-tests=$(dirname "$build")/authserver-tests
-mkdir -p "$tests"
+tests=$(scripts/build-folder.sh authserver-tests)
 if ! cmp --silent tests/authserver/package-lock.json "$tests/installed.json"; then
   rm -f "$tests/installed.json"
   cp tests/authserver/package.json tests/authserver/package-lock.json "$tests"
   # The machine's own certificate authorities count, too.
   if ! (cd "$tests" && NODE_EXTRA_CA_CERTS=/etc/ssl/certs/ca-certificates.crt \
-    npm ci --ignore-scripts --no-audit --no-fund --no-update-notifier) \
+    npm ci --ignore-scripts --no-audit --no-fund --no-update-notifier \
+    --fetch-retry-mintimeout=1000 --fetch-retry-maxtimeout=5000) \
     >"$tests/npm.log" 2>&1; then
     cat "$tests/npm.log" >&2
     echo "test-authserver: could not install what tests/authserver/package-lock.json names" >&2
@@ -47,6 +47,8 @@ if ! cmp --silent tests/authserver/package-lock.json "$tests/installed.json"; th
   cp tests/authserver/package-lock.json "$tests/installed.json"
   echo "test-authserver: installed the modules of tests/authserver/package-lock.json"
 fi
+build=$(scripts/build.sh "$preset" "authserver-$preset" -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
+  -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=ON | tail -n 1)
 rm -f "$tests"/*.mjs
 cp tests/authserver/*.mjs "$tests"
 

@@ -4,12 +4,17 @@
 # Runs as root. Installs what is missing (scripts/packages.sh, group bare); everything else goes into
 # those systems, whose downloads are kept for the next time.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
 if [ "$(id -u)" -ne 0 ]; then
   echo "test-package: as root, please: it makes systems of their own" >&2
   exit 1
 fi
+if ! unshare --mount --pid --fork --mount-proc true; then
+  echo "test-package: this machine does not let root make a namespace" >&2
+  exit 1
+fi
+trap '[ $? -eq 0 ] || echo "test-package: failed" >&2' EXIT
 scripts/packages.sh bare
 folder=$(scripts/build-folder.sh test-package)
 
@@ -43,7 +48,7 @@ if [ ! -e "$folder/bare.done" ]; then
   # shellcheck disable=SC2016 # apt-get expands this itself
   mirror=$(apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' 'Origin: Debian' \
     'Codename: bookworm' | sort -u | head -n 1)
-  debootstrap --variant=minbase bookworm "$folder/bare" "$mirror" >"$folder/debootstrap.log"
+  quietly debootstrap --variant=minbase bookworm "$folder/bare" "$mirror"
   cp /etc/resolv.conf "$folder/bare/etc/"
   echo 'Dpkg::Use-Pty "0";' >"$folder/bare/etc/apt/apt.conf.d/no-terminal"
   within bare apt-get -qq update

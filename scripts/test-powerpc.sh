@@ -4,12 +4,13 @@
 # Installs what is missing (scripts/packages.sh, groups build, test and powerpc) and keeps what it
 # builds for the target (scripts/powerpc-libraries.sh) for the next time.
 set -euo pipefail
-cd "$(dirname "$0")/.."
+cd "$(dirname "$(readlink -f "$0")")/.."
 
+trap '[ $? -eq 0 ] || echo "test-powerpc: failed" >&2' EXIT
 scripts/packages.sh build test powerpc
-native=$(scripts/build.sh dev dev | tail -n 1)
 libraries=$(scripts/build-folder.sh powerpc-libraries)
 scripts/powerpc-libraries.sh "$libraries"
+native=$(scripts/build.sh dev dev | tail -n 1)
 folder=$(scripts/build.sh powerpc powerpc -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
 
 ctest --test-dir "$folder" --output-on-failure --parallel "$(nproc)"

@@ -44,19 +44,18 @@ if [ -n "$dead" ]; then
   echo "install: links that lead nowhere: $dead" >&2
   exit 1
 fi
-for program in bin/oauthctl lib/libzevooauth.so; do
-  if readelf --dynamic "tree/$program" | grep -E 'RPATH|RUNPATH'; then
-    echo "install: $program looks for libraries where it was built" >&2
-    exit 1
-  fi
-done
-
 cmake --install "$build" --prefix "$folder/host" --component standins >>install.log
 (cd host && find . ! -type d | sort) >installed
 diff -u - installed <<'END'
 ./lib/libzevocgi.so.6
 ./lib/libzevocore.so.6
 END
+for program in tree/bin/oauthctl tree/lib/libzevooauth.so host/lib/*.so.6; do
+  if readelf --dynamic "$program" | grep -E 'RPATH|RUNPATH'; then
+    echo "install: $program looks for libraries where it was built" >&2
+    exit 1
+  fi
+done
 
 mv tree moved # nothing in it says where it was
 export LD_LIBRARY_PATH=$folder/moved/lib:$folder/host/lib

@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# What the shared library shows to the outside: its name, the libraries it needs, what it exports
-# and that it never looks at the environment.
+# What the shared library shows to the outside: its name, the libraries it needs, what it exports,
+# that it never looks at the environment, and that it stays in memory once loaded.
 #
 #   shared_library_test.sh LIBRARY NM READELF
 set -euo pipefail
@@ -20,6 +20,8 @@ soname=$(sed -n 's/.*(SONAME).*\[\(.*\)\]/\1/p' <<<"$dynamic")
 for needed in libzevocore.so.6 libzevocgi.so.6; do
   grep -q "(NEEDED).*\[$needed\]" <<<"$dynamic" || fail "it does not need $needed"
 done
+
+grep -q '(FLAGS_1).* NODELETE' <<<"$dynamic" || fail "dlclose() would take it from memory"
 
 exported=$("$nm" --dynamic --defined-only --demangle "$library" | cut -d ' ' -f 3- |
   sed 's/std::__cxx11::basic_string<char, std::char_traits<char>, std::allocator<char> >/std::string/g; s/\[abi:cxx11\]//' |

@@ -1,10 +1,12 @@
 // Linked into the test twin of oauthctl instead of its fixed paths: everything lies in the folder
 // that OAUTHCTL_FOLDER names, the clock stands at OAUTHCTL_NOW, and only the process's own ids are
-// used. The encryption is that of the host's seam.
+// used; root's process becomes user OAUTHCTL_USER. The encryption is that of the host's seam.
 
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <grp.h>
 #include <sqlite3.h>
+#include <sys/prctl.h>
 #include <sys/time.h>
 #include <unistd.h>
 
@@ -46,6 +48,17 @@ std::time_t now() {
   timespec real;
   clock_gettime(CLOCK_REALTIME, &real);
   return fixed == nullptr ? real.tv_sec : static_cast<std::time_t>(std::atoll(fixed));
+}
+
+// Before main(), but after root has loaded the program: the user may be kept out of its folder.
+// The process then belongs to him as if he had started it himself.
+[[gnu::constructor]] void becomeUser() {
+  const char* const user = std::getenv("OAUTHCTL_USER");
+  if (user == nullptr) return;
+  const auto id = static_cast<unsigned>(std::atoi(user));
+  if (setgroups(0, nullptr) != 0 || setgid(id) != 0 || setuid(id) != 0 ||
+      prctl(PR_SET_DUMPABLE, 1) != 0)
+    _exit(99);
 }
 
 template <class Function>

@@ -146,7 +146,7 @@ TEST_F(UsageTest, KeepsTheManualCurrent) {
 
 // What bash would offer after the words given, the last of which is still being typed.
 std::string completed(const std::string& words) {
-  const std::string script = "source " OAUTHCTL_SOURCE "/oauthctl.bash; COMP_WORDS=(" + words +
+  const std::string script = "source \"" OAUTHCTL_SOURCE "/oauthctl.bash\"; COMP_WORDS=(" + words +
                              "); COMP_CWORD=$((${#COMP_WORDS[@]} - 1)); _oauthctl; "
                              "echo \"${COMPREPLY[@]}\"";
   std::FILE* const bash = popen(("bash -c '" + script + "'").c_str(), "r");
