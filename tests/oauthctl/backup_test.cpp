@@ -201,16 +201,43 @@ TEST_F(IssuingTest, RestoresLoseNothing) {
   expectAll(acknowledged(), found);
 }
 
+// Ctrl-C when the file is written and has no name yet.
+class InterruptedTest : public BackupTest, public testing::WithParamInterface<bool> {
+ protected:
+  InterruptedTest() {
+    addClient('c');
+    if (GetParam()) environment_ = {"OAUTHCTL_NO_TMPFILE=1"};
+  }
+};
+
+TEST_P(InterruptedTest, LeavesNothing) {
+  environment_.emplace_back("OAUTHCTL_INTERRUPT=1");
+  const Outcome outcome = run({"backup", copy_});
+  EXPECT_EQ(128 + SIGINT, outcome.code);
+  EXPECT_EQ("", outcome.out);
+  EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
+}
+
+// What the tests above interrupt does come to its end otherwise.
+TEST_P(InterruptedTest, IsWholeWithoutThat) {
+  EXPECT_EQ(0, run({"backup", copy_}).code);
+  EXPECT_EQ(rowsIn(files_.database()), rowsIn(copy_));
+  EXPECT_EQ(0600U, modeOf(copy_));
+  EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+  EXPECT_THAT(fileNames(),
+              ElementsAre("copy.db", "oauth.db", "oauth.db.before-restore-20231114-221320"));
+}
+
+INSTANTIATE_TEST_SUITE_P(WithATemporaryName, InterruptedTest, testing::Bool());
+
 // Ctrl-C while it waits for the database.
-TEST_F(BackupTest, LeavesNothingWhenItIsInterrupted) {
+TEST_F(BackupTest, LeavesNothingWhenItIsInterruptedWhileItWaits) {
   addClient('c');
   sqlite3* db = nullptr;
   sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
   sqlite3_exec(db, "BEGIN EXCLUSIVE", nullptr, nullptr, nullptr);
-  beforeTyping_ = [this] {
-    while (fileNames().size() < 2) {
-    }  // Without a pause: the first moment is the dangerous one.
-  };
+  beforeTyping_ = [] { usleep(300'000); };
   const Outcome outcome = runOnTerminal({"backup", copy_}, "\x03");
   sqlite3_close_v2(db);
   EXPECT_EQ(128 + SIGINT, outcome.code);

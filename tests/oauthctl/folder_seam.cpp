@@ -3,10 +3,14 @@
 // used. The encryption is that of the host's seam.
 
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <sqlite3.h>
 #include <sys/time.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <csignal>
+#include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -61,6 +65,46 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
 
 extern "C" FILE* fopen64(const char* path, const char* mode) {
   return next("fopen64", fopen64)(redirected(path).c_str(), mode);
+}
+
+extern "C" int open64(const char* path, int flags, ...) {
+  va_list arguments;
+  va_start(arguments, flags);
+  const auto mode = va_arg(arguments, unsigned);  // unused by a call that gives none
+  va_end(arguments);
+  return next("open64", open64)(redirected(path).c_str(), flags, mode);
+}
+
+// lstat() by the names that it has in binaries: with 64-bit offsets, and with 64-bit times on a
+// 32-bit machine.
+#define REPLACE_LSTAT(function, symbol)                                 \
+  extern "C" int function(const char* path, void* out) __asm__(symbol); \
+  extern "C" int function(const char* path, void* out) {                \
+    return next(symbol, function)(redirected(path).c_str(), out);       \
+  }
+REPLACE_LSTAT(lstat64Seam, "lstat64")
+REPLACE_LSTAT(lstat64Time64Seam, "__lstat64_time64")
+
+// With OAUTHCTL_NO_TMPFILE, as on a file system that has no files without a name.
+extern "C" int openat64(int folder, const char* path, int flags, ...) {
+  va_list arguments;
+  va_start(arguments, flags);
+  const auto mode = va_arg(arguments, unsigned);
+  va_end(arguments);
+  if ((flags & O_TMPFILE) == O_TMPFILE && std::getenv("OAUTHCTL_NO_TMPFILE") != nullptr) {
+    errno = EOPNOTSUPP;
+    return -1;
+  }
+  return next("openat64", openat64)(folder, path, flags, mode);
+}
+
+// Between the writing of a file and its naming: waits for a file with the name OAUTHCTL_HOLD, and
+// interrupts the program if OAUTHCTL_INTERRUPT is set.
+extern "C" int fsync(int descriptor) {
+  const char* const hold = std::getenv("OAUTHCTL_HOLD");
+  while (hold != nullptr && faccessat(AT_FDCWD, hold, F_OK, 0) != 0) usleep(1000);
+  if (std::getenv("OAUTHCTL_INTERRUPT") != nullptr) raise(SIGINT);
+  return next("fsync", fsync)(descriptor);
 }
 
 extern "C" int access(const char* path, int mode) noexcept {

@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <filesystem>
 #include <fstream>
 #include <memory>
 #include <sstream>
@@ -130,6 +131,13 @@ Outcome OauthctlTest::runAsNobody(const Words& words) const {
   outcome.err = readAll(err.ends[0]);
   outcome.code = exitOf(child);
   return outcome;
+}
+
+void OauthctlTest::giveToNobody() const {
+  if (getuid() != 0) return;
+  EXPECT_EQ(0, chown(files_.directory().c_str(), kNobody, kNobody));
+  for (const auto& entry : std::filesystem::directory_iterator(files_.directory()))
+    EXPECT_EQ(0, lchown(entry.path().c_str(), kNobody, kNobody));
 }
 
 Json::Value OauthctlTest::json(const Words& words) const {

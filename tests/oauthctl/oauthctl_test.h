@@ -38,6 +38,8 @@ class OauthctlTest : public StoreTest {
                         const std::string& prompt = "") const;
   // run() as user 65534, if the tests run as root.
   Outcome runAsNobody(const Words& words) const;
+  // The folder and all it holds now belong to user 65534, if the tests run as root.
+  void giveToNobody() const;
   // The document that a run with "--json" printed.
   Json::Value json(const Words& words) const;
 

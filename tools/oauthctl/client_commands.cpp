@@ -2,8 +2,8 @@
 
 #include "commands.h"
 #include "exit_code.h"
-#include "fixed_paths.h"
 #include "grants.h"
+#include "human_time.h"
 #include "oauth_clientInfo.h"
 #include "oauth_utils.h"
 #include "registry.h"
@@ -154,14 +154,12 @@ void addClient(const Invocation& invocation) {
   for (const Field& field : {kName, kRedirectUri, kScope}) fieldValue(invocation, field);
   requireDatabase(Access::kMake);
   const std::string secret = callersSecret(invocation);
-  const bool isNew = !databaseExists();
   const Made made = registerClient(invocation, secret);
-  if (isNew) giveToFolderOwner(fixed_paths::database());
   Database database(Access::kRead);
   const Json::Value id = findClient(database, made.identifier)["id"];
   if (invocation.has("--json")) {
     Json::Value document;
-    document["id"] = static_cast<Json::Int64>(std::stoll(id.asString()));
+    document["id"] = static_cast<Json::Int64>(number(id.asString()).value_or(0));
     document["client_id"] = made.identifier;
     document["client_secret"] = made.secret;
     printJson(document);
