@@ -56,12 +56,13 @@ struct Pipe {
 
 }  // namespace
 
-OauthctlTest::OauthctlTest() { clock_.set(kNow); }
+OauthctlTest::OauthctlTest() : command_(OAUTHCTL_COMMAND) { clock_.set(kNow); }
 
-// OAUTHCTL_COMMAND is the program behind its emulator, if it needs one, separated by blanks.
+void OauthctlTest::useRealCipher() { command_ = OAUTHCTL_COMMAND_WITH_KEY; }
+
 pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asNobody) const {
   Words all;
-  std::istringstream command(OAUTHCTL_COMMAND);
+  std::istringstream command(command_);
   for (std::string word; command >> word;) all.push_back(word);
   all.insert(all.end(), words.begin(), words.end());
   std::vector<char*> arguments;

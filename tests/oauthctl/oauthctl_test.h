@@ -62,9 +62,15 @@ class OauthctlTest : public StoreTest {
   // Every row of the file, of whatever table.
   static Lines rowsIn(const std::string& file);
 
+  // The program encrypts with a key in the folder, as it does where it is installed.
+  void useRealCipher();
+
   std::vector<std::string> environment_;  // more of it, as "NAME=value"
   std::function<void()> beforeTyping_;    // while the program runs already
 
  private:
   pid_t start(const Words& words, int in, int out, int err, bool asNobody) const;
+
+  // The program behind its emulator, if it needs one, separated by blanks.
+  std::string command_;
 };
