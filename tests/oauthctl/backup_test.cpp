@@ -370,6 +370,41 @@ TEST_F(RestoreTest, RefusesWhatIsNoFile) {
             complaint(run({"restore", files_.database(), "--yes"})));
 }
 
+TEST_F(RestoreTest, WaitsForNoPipe) {
+  std::filesystem::remove(copy_);
+  ASSERT_EQ(0, mkfifo(copy_.c_str(), 0600));
+  expectRefused("it is not a file");
+}
+
+TEST_F(RestoreTest, RefusesALink) {
+  std::filesystem::rename(copy_, path("real.db"));
+  ASSERT_EQ(0, symlink("real.db", copy_.c_str()));
+  EXPECT_EQ("1 " + copy_ + " is refused, nothing changed: it is a link, name the file itself",
+            complaint(run({"restore", copy_, "--yes"})));
+}
+
+// No room is asked for it either.
+TEST_F(RestoreTest, RefusesAFileThatIsTooLarge) {
+  ASSERT_EQ(0, truncate(copy_.c_str(), 512L * 1024 * 1024 + 1));
+  expectRefused("it is too large for a backup");
+}
+
+// Half a database: SQLite would take the other half from there.
+TEST_F(RestoreTest, RefusesAFileWithAJournal) {
+  for (const std::string& journal : {copy_ + "-journal", copy_ + "-wal"}) {
+    std::ofstream(journal, std::ios::binary) << "\xd9\xd5\x05\xf9";
+    const std::string before = databaseBytes();
+    EXPECT_EQ("1 " + copy_ +
+                  " is refused, nothing changed: it is half of a database, the other "
+                  "half is " +
+                  journal,
+              complaint(run({"restore", copy_, "--yes"})));
+    EXPECT_EQ(before, databaseBytes());
+    ASSERT_EQ(0, truncate(journal.c_str(), 0));
+  }
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+}
+
 TEST_F(RestoreTest, MakesADatabaseWhereThereIsNone) {
   std::filesystem::remove(files_.database());
   EXPECT_EQ("restored 1 client, 0 codes, 1 token, 1 log line\n",

@@ -2,12 +2,18 @@
 // turn root against the machine.
 
 #include <fcntl.h>
+#include <linux/capability.h>
 #include <sqlite3.h>
+#include <sys/prctl.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <chrono>
+#include <csignal>
 #include <filesystem>
 #include <fstream>
 #include <thread>
@@ -315,6 +321,90 @@ TEST_F(SwappedNameTest, PutsNothingIntoWhatARestoreKeeps) {
   EXPECT_EQ("65534:65534 0600", ownerOf(path(kKept)));
   EXPECT_EQ(before, rowsIn(path(kKept)));
   expectNothingGivenAway();
+}
+
+// What the kernel tells about the program while it has a backup in hand.
+class IdsTest : public HostileFolderTest {
+ protected:
+  IdsTest() : copy_("/copy.db") {}
+  void SetUp() override {
+    HostileFolderTest::SetUp();
+    if (IsSkipped()) return;
+    fillDatabase();
+    copy_ = rootsFolder_ + copy_;
+  }
+  // The process with our backup among its arguments, "" if there is none yet.
+  std::string program() const {
+    for (const auto& entry : fs::directory_iterator("/proc")) {
+      const std::string arguments = bytesOf(entry.path() / "cmdline");
+      if (arguments.find(std::string("backup\0", 7) + copy_) != std::string::npos)
+        return entry.path().filename();
+    }
+    return "";
+  }
+  static std::string statusLine(const std::string& process, const std::string& name) {
+    std::ifstream status("/proc/" + process + "/status");
+    for (std::string line; std::getline(status, line);)
+      if (line.rfind(name, 0) == 0) return line;
+    return "";
+  }
+  // Runs the backup, and the body as soon as the program is about to name the file.
+  Outcome runBackup(const std::function<void(const std::string& process)>& body) {
+    environment_ = {"OAUTHCTL_HOLD=" + rootsFolder_ + "/go"};
+    std::thread observer([&] {
+      std::string process;
+      const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(20);
+      while (statusLine(process, "Uid:").find("65534") == std::string::npos &&
+             std::chrono::steady_clock::now() < end)
+        process = program();
+      body(process);
+      std::ofstream(rootsFolder_ + "/go") << "";
+    });
+    Outcome outcome = run({"backup", copy_});
+    observer.join();
+    return outcome;
+  }
+
+  std::string copy_;
+};
+
+TEST_F(IdsTest, AreThoseOfTheOwnerWhoCannotTouchTheProgram) {
+  std::string users, groups, more;
+  int signalled = -1;
+  const Outcome outcome = runBackup([&](const std::string& process) {
+    users = statusLine(process, "Uid:");
+    groups = statusLine(process, "Gid:");
+    more = statusLine(process, "Groups:");
+    const pid_t owner = fork();
+    if (owner == 0) {
+      if (setgid(kNobody) != 0 || syscall(SYS_setuid, kNobody) != 0) _exit(9);
+      const bool refused = kill(std::stoi(process), SIGTERM) != 0 && errno == EPERM;
+      const bool hidden = access(("/proc/" + process + "/fd/0").c_str(), F_OK) != 0;
+      _exit(refused && hidden ? 0 : 1);
+    }
+    waitpid(owner, &signalled, 0);
+  });
+  EXPECT_EQ("Uid:\t0\t65534\t0\t65534", users);
+  EXPECT_EQ("Gid:\t0\t65534\t0\t65534", groups);
+  EXPECT_THAT(more, testing::MatchesRegex("Groups:\t65534 *"));
+  EXPECT_EQ(0, signalled);
+  EXPECT_EQ(0, outcome.code) << outcome.err;
+  EXPECT_EQ("0:0 0600", ownerOf(copy_));
+}
+
+// Without the right to change its ids root does not go on.
+TEST_F(IdsTest, AreTakenOrNothingHappens) {
+  for (const int right : {CAP_SETUID, CAP_SETGID}) {
+    beforeExec_ = [right] {
+      if (prctl(PR_CAPBSET_DROP, right, 0, 0, 0) != 0) _exit(97);
+    };
+    for (const Words& words : kEveryCommand)
+      EXPECT_EQ("3 cannot take the ids of user 65534: Operation not permitted",
+                complaint(run(words)));
+    EXPECT_EQ("3 cannot take the ids of user 65534: Operation not permitted",
+              complaint(run({"backup", copy_})));
+  }
+  EXPECT_FALSE(fs::exists(copy_));
 }
 
 // An installation whose database root made.

@@ -56,14 +56,15 @@ struct Pipe {
 
 }  // namespace
 
-OauthctlTest::OauthctlTest() : command_(OAUTHCTL_COMMAND) { clock_.set(kNow); }
+OauthctlTest::OauthctlTest() : program_(OAUTHCTL_PROGRAM) { clock_.set(kNow); }
 
-void OauthctlTest::useRealCipher() { command_ = OAUTHCTL_COMMAND_WITH_KEY; }
+void OauthctlTest::useRealCipher() { program_ = OAUTHCTL_PROGRAM_WITH_KEY; }
 
 pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asNobody) const {
   Words all;
-  std::istringstream command(command_);
-  for (std::string word; command >> word;) all.push_back(word);
+  std::istringstream emulator(OAUTHCTL_EMULATOR);
+  for (std::string word; emulator >> word;) all.push_back(word);
+  all.push_back(program_);
   all.insert(all.end(), words.begin(), words.end());
   std::vector<char*> arguments;
   arguments.reserve(all.size() + 1);
@@ -84,6 +85,7 @@ pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asN
   for (const std::string& variable : environment_)
     putenv(strdup(variable.c_str()));  // the program that follows takes it along
   if (asNobody && (setgid(kNobody) != 0 || setuid(kNobody) != 0)) _exit(99);
+  if (beforeExec_) beforeExec_();
   alarm(120);  // rather than wait for an answer that never comes
   execvp(arguments.front(), arguments.data());
   _exit(98);

@@ -67,10 +67,10 @@ class OauthctlTest : public StoreTest {
 
   std::vector<std::string> environment_;  // more of it, as "NAME=value"
   std::function<void()> beforeTyping_;    // while the program runs already
+  std::function<void()> beforeExec_;      // in the process that becomes the program
 
  private:
   pid_t start(const Words& words, int in, int out, int err, bool asNobody) const;
 
-  // The program behind its emulator, if it needs one, separated by blanks.
-  std::string command_;
+  std::string program_;  // runs behind an emulator where the machine needs one
 };

@@ -26,7 +26,7 @@ std::optional<struct stat> look(const std::string& path) {
 
 void checkOwner(const std::string& path, const struct stat& status, const struct stat& folder,
                 Findings& findings) {
-  if (status.st_uid == 0 || status.st_uid == folder.st_uid) return;
+  if (status.st_uid == folder.st_uid) return;
   findings.push_back({path + " belongs to user " + std::to_string(status.st_uid) +
                           " and its folder to user " + std::to_string(folder.st_uid),
                       "chown both to the server's user"});
@@ -105,7 +105,8 @@ Findings checkSettings() {
   if (file && (file->st_mode & (S_IWGRP | S_IWOTH)) != 0)
     findings.push_back(
         {path + " has mode " + octal(file->st_mode) + ", others may write it", "chmod go-w"});
-  if (file && stat(fixed_paths::folder().c_str(), &folder) == 0)
+  // Root may keep the settings to himself.
+  if (file && file->st_uid != 0 && stat(fixed_paths::folder().c_str(), &folder) == 0)
     checkOwner(path, *file, folder, findings);
   const SettingsReport report = readSettings();
   if (!report.problem.empty())
