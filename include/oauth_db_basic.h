@@ -33,7 +33,9 @@ inline constexpr int kErrTableFull = -5;      ///< "... Table is full", with the
 /// thread at a time.
 ///
 /// Opening and closing raise the effective user and group id of the whole process to root for the
-/// length of that one call: no other thread may depend on the ids meanwhile.
+/// length of that one call: no other thread may depend on the ids meanwhile. Where a link or
+/// anything else that is not a regular file lies in the database's place, it is opened without.
+/// Compare geteuid() and getegid() afterwards if the system might refuse to restore the ids.
 ///
 /// Many processes may use the file at once: each statement waits up to 5 seconds for the others
 /// and then fails with SQLite's code 5, "database is locked".
@@ -55,17 +57,20 @@ inline constexpr int kErrTableFull = -5;      ///< "... Table is full", with the
 ///      "option": string,            ready-made SQL after the condition
 ///      "modified": {"<column>": string, ...}}               columns to write
 ///
-/// "condition_like" and "option" enter the statement as they are: never pass on a user's text.
-/// A value ends at its first NUL byte.
+/// "condition_like" and "option" enter the statement as they are, and so do names of columns and
+/// tables: never pass on a user's text. A value that holds a NUL byte makes SQLite refuse the
+/// statement (code 1, "unrecognized token"); "client_id" and "client_secret" end at it instead,
+/// because the host's encryption takes texts that end there.
 class OAUTHDBBasic {
  public:
   /// Row callback, as sqlite3_exec() calls it; context is the result document.
   using RowCallback = int (*)(void* context, int columns, char** values, char** columnNames);
 
-  /// Opens and initialises. Never throws for a database failure: the error is recorded, and every
-  /// later operation on records fails with the log line "DB is not ready!!".
+  /// Opens and initialises. A new database has mode 0600 and belongs to the program's own user.
+  /// Never throws for a database failure: the error is recorded, and every later operation on
+  /// records fails with the log line "DB is not ready!!".
   OAUTHDBBasic();
-  /// Closes the database.
+  /// Closes the database. A transaction that is still open is rolled back.
   ~OAUTHDBBasic();
   /// A store owns its connection and cannot be copied.
   OAUTHDBBasic(const OAUTHDBBasic&) = delete;
@@ -90,7 +95,8 @@ class OAUTHDBBasic {
   /// \{
 
   /// Creates the tables that are missing; the meta table and the schema-version rows in it come
-  /// together or not at all. True once all five exist.
+  /// together or not at all, as a part of the caller's transaction if one is open. True once all
+  /// five exist; kErrCreateTable on failure.
   bool DBInit();
   /// Runs one CREATE statement; kErrCreateTable on failure.
   bool CreateDBTab(const std::string& sql);
@@ -138,27 +144,27 @@ class OAUTHDBBasic {
 
   /// \}
   /// \name Fragments of SQL made from requests
-  /// Members come in ascending byte order of their names; single quotes in values are doubled,
-  /// names are inserted as they are.
+  /// Members come in ascending byte order of their names; single quotes in values are doubled, all
+  /// other bytes stay, NUL included; names are inserted as they are.
   /// \{
 
   /// The columns and values of an INSERT. A null "timestamp" is the database's current time.
   ///
   ///     {"a": "1", "id": null} -> " (a, id) VALUES('1', NULL)"
-  static std::string GetInsertParam(const Json::Value& record);
+  std::string GetInsertParam(const Json::Value& record);
   /// The members as assignments or comparisons.
   ///
   ///     {"a": "1", "b": "2"} -> "a='1'<separator>b='2'"
-  static std::string ConcateParam(const Json::Value& values, const std::string& separator);
+  std::string ConcateParam(const Json::Value& values, const std::string& separator);
   /// The WHERE of a condition.
   ///
   ///     {"a": "1", "b": "2"} -> " WHERE a='1' and b='2'"
   ///     nothing -> ""
-  static std::string GetConditionParam(const Json::Value& condition);
+  std::string GetConditionParam(const Json::Value& condition);
   /// The SET and WHERE of a request.
   ///
   ///     request -> " SET <modified> WHERE <condition>"
-  static std::string GetUpdateParam(const Json::Value& request);
+  std::string GetUpdateParam(const Json::Value& request);
 
   /// \}
   /// \name Record operations
@@ -186,10 +192,10 @@ class OAUTHDBBasic {
   /// the rest as it was (log only).
   /// \{
 
-  /// Replaces them by their encrypted forms.
-  static bool ParamEncrypt(Json::Value& doc);
+  /// Replaces them by their encrypted forms. A value ends at its first NUL byte.
+  bool ParamEncrypt(Json::Value& doc);
   /// Replaces them by their plain forms.
-  static bool ParamDecrypt(Json::Value& doc);
+  bool ParamDecrypt(Json::Value& doc);
 
   /// \}
 
@@ -202,6 +208,7 @@ class OAUTHDBBasic {
 
   bool lookUpTable(const std::string& name, bool& exists);
   bool createMetaTable();
+  bool fillMetaTable();
 
   int errCode_ = kErrNone;
   bool ready_ = false;

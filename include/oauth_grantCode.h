@@ -14,8 +14,9 @@ namespace ZEVOOAUTHSERVER {
 /// "code", "expired_time" (Unix seconds, decimal text), "state", "ip", "id".
 ///
 /// Lengths in bytes: username 1 to 256; client_id and code 64; scope and state 1 to 2048;
-/// expired_time 1 to 128. ip is empty or an IPv4 or IPv6 address. A code is expired once the
-/// current time is greater than its expired_time.
+/// expired_time 1 to 128. ip is empty or an IPv4 or IPv6 address, with or without a zone after "%".
+/// Refuse texts with a NUL byte before you call: what is quoted is cut there. A code is expired
+/// once the current time is greater than its expired_time.
 class OAUTHDBGrantCode : public OAUTHDBBasic {
  public:
   /// Opens the database; tabName is "oauth_grantCode".
@@ -58,8 +59,10 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
   /// nothing: of several processes that try, all succeed.
   int Revoke(long long id);
 
-  /// Deletes every expired code. 0 only if a row could not be deleted: a failed read deletes
-  /// nothing and is a success, though it leaves its error.
+  /// Deletes every expired code, in one transaction or as a part of the caller's. Where the disk
+  /// has no room for that, it commits row by row, and the error of the first attempt stays. 0 only
+  /// if a row could not be deleted: a failed read deletes nothing and is a success, though it
+  /// leaves its error.
   int Purge();
 };
 

@@ -17,7 +17,8 @@ namespace ZEVOOAUTHSERVER {
 ///
 /// Lengths in bytes: username 1 to 256; client_id, refresh_token and access_token 64; scope and
 /// state 1 to 2048; expired_time 1 to 128; flow_type 1 to 32. Anything else is kErrBadParameters.
-/// ip is empty or an IPv4 or IPv6 address.
+/// ip is empty or an IPv4 or IPv6 address, with or without a zone after "%". Refuse texts with a
+/// NUL byte before you call: what is quoted is cut there.
 ///
 /// expired_time concerns the access token: it is expired once the current time is greater. The
 /// refresh token has no expiry of its own and goes with the row.
@@ -67,9 +68,10 @@ class OAUTHDBToken : public OAUTHDBBasic {
   /// Row id of the access token, its low 32 bits; 0 for an unknown token or a failed look-up.
   int GetIndex(const std::string& access_token);
 
-  /// Deletes every row whose access token has expired, refresh token included. 0 only if a row
-  /// could not be deleted: a failed read deletes nothing and is a success, though it leaves
-  /// its error.
+  /// Deletes every row whose access token has expired, refresh token included, in one transaction
+  /// or as a part of the caller's. Where the disk has no room for that, it commits row by row,
+  /// and the error of the first attempt stays. 0 only if a row could not be deleted: a failed read
+  /// deletes nothing and is a success, though it leaves its error.
   int Purge();
 
   /// Checks a presented access token against the clock.

@@ -35,8 +35,8 @@ bool checkStrLen(const std::string& str, int minLen, int maxLen, bool allowEmpty
 /// empty outside a request.
 std::string getRemoteIP();
 
-/// The value with every single quote doubled, for use between single quotes in SQL. The value
-/// ends at its first NUL byte. Empty when memory runs out (log only).
+/// The value with every single quote doubled, for use between single quotes in SQL. It ends at the
+/// value's first NUL byte, so refuse values that hold one. Empty when memory runs out (log only).
 std::string getSQLFormatStr(const std::string& value);
 
 /// The SQL condition that a column contains a value, the value quoted as above.
@@ -48,9 +48,9 @@ std::string getSQLFormatStr(const std::string& value);
 std::string getSQLFormatLikeStr(const std::string& column, const std::string& value);
 
 /// Random lower-case hexadecimal digits for secrets: version-4 UUIDs (RFC 4122) without hyphens,
-/// from the operating system's entropy. The length is rounded up to a multiple of 32: 40 gives 64
-/// digits, 0 gives none. Empty if the system has no entropy to give, which the stores then refuse
-/// as too short: a guessable secret would be worse.
+/// from the operating system: getrandom(), or "/dev/urandom" where that call fails. The length is
+/// rounded up to a multiple of 32: 40 gives 64 digits, 0 gives none. Empty if both sources fail,
+/// which the stores then refuse as too short: a guessable secret would be worse.
 std::string getRandomStr(unsigned int length);
 
 }  // namespace ZEVOOAUTHSERVER

@@ -51,6 +51,31 @@ TEST(BinaryInterfaceTest, KeepsTheErrorCodesThatProgramsWereCompiledWith) {
   EXPECT_EQ(-5, kErrTableFull);
 }
 
+// A static member has the same symbol, but is called without an object.
+template <class Result, class... Arguments>
+using Member = Result (OAUTHDBBasic::*)(Arguments...);
+template <class Expected, class Actual>
+constexpr bool isCalledAs = std::is_same_v<Expected, Actual>;
+
+TEST(BinaryInterfaceTest, CallsTheTranslationsOnAnObject) {
+  using Value = const Json::Value&;
+  using Base = OAUTHDBBasic;
+  using Fragment = Member<std::string, Value>;
+  EXPECT_TRUE((isCalledAs<Fragment, decltype(&Base::GetInsertParam)>));
+  EXPECT_TRUE((isCalledAs<Fragment, decltype(&Base::GetConditionParam)>));
+  EXPECT_TRUE((isCalledAs<Fragment, decltype(&Base::GetUpdateParam)>));
+  EXPECT_TRUE(
+      (isCalledAs<Member<std::string, Value, const std::string&>, decltype(&Base::ConcateParam)>));
+  EXPECT_TRUE((isCalledAs<Member<bool, Json::Value&>, decltype(&Base::ParamEncrypt)>));
+  EXPECT_TRUE((isCalledAs<Member<bool, Json::Value&>, decltype(&Base::ParamDecrypt)>));
+}
+
+TEST(BinaryInterfaceTest, CallsTheRowCallbacksWithoutAnObject) {
+  EXPECT_TRUE((isCalledAs<OAUTHDBBasic::RowCallback, decltype(&OAUTHDBBasic::IsTabExistCallback)>));
+  EXPECT_TRUE((isCalledAs<OAUTHDBBasic::RowCallback, decltype(&OAUTHDBBasic::TabCountCallback)>));
+  EXPECT_TRUE((isCalledAs<OAUTHDBBasic::RowCallback, decltype(&OAUTHDBBasic::TabGetCallback)>));
+}
+
 class BinaryInterfaceMembersTest : public StoreTest {
  protected:
   static const Layout& layoutOf(const OAUTHDBBasic& store) {

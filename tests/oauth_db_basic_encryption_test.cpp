@@ -21,12 +21,8 @@ namespace {
 
 class EncryptionTest : public StoreTest {
  protected:
-  bool encrypt(const std::string& document) {
-    return OAUTHDBBasic::ParamEncrypt(doc_ = parse(document));
-  }
-  bool decrypt(const std::string& document) {
-    return OAUTHDBBasic::ParamDecrypt(doc_ = parse(document));
-  }
+  bool encrypt(const std::string& document) { return store_.ParamEncrypt(doc_ = parse(document)); }
+  bool decrypt(const std::string& document) { return store_.ParamDecrypt(doc_ = parse(document)); }
   // The calls of the host's cipher since the last time.
   std::vector<std::string> newCalls() {
     const auto& all = host_.calls();
@@ -35,6 +31,7 @@ class EncryptionTest : public StoreTest {
     return found;
   }
 
+  OAUTHDBBasic store_;
   Json::Value doc_;
 
  private:
@@ -130,9 +127,9 @@ TEST_F(EncryptionTest, IsUndoneByDecryption) {
                                    std::string("Grüße, 東京"), times(64), std::string()}) {
     Json::Value doc;
     doc["client_id"] = doc["client_secret"] = plain;
-    EXPECT_TRUE(OAUTHDBBasic::ParamEncrypt(doc)) << plain;
+    EXPECT_TRUE(store_.ParamEncrypt(doc)) << plain;
     EXPECT_EQ(FakeHost::sealed(plain), doc["client_id"].asString());
-    EXPECT_TRUE(OAUTHDBBasic::ParamDecrypt(doc)) << plain;
+    EXPECT_TRUE(store_.ParamDecrypt(doc)) << plain;
     EXPECT_EQ(plain, doc["client_id"].asString());
     EXPECT_EQ(plain, doc["client_secret"].asString());
   }

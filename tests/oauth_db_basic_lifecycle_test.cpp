@@ -2,6 +2,7 @@
 
 #include <dlfcn.h>
 #include <sqlite3.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -52,6 +53,7 @@ class ConnectionWatch {
   static std::string ids() { return std::to_string(geteuid()) + ":" + std::to_string(getegid()); }
   static void unused(sqlite3_context*, int, sqlite3_value**) {}
   static void closing(void*);
+  static void rollingBack(void*);
 
   static ConnectionWatch* current;
 };
@@ -69,6 +71,11 @@ void ConnectionWatch::watchClosing(sqlite3* db) {
   if (current == nullptr) return;
   sqlite3_create_function_v2(db, "watch", 0, SQLITE_UTF8, nullptr, unused, nullptr, nullptr,
                              closing);
+  sqlite3_rollback_hook(db, rollingBack, nullptr);
+}
+
+void ConnectionWatch::rollingBack(void*) {
+  if (current != nullptr) current->seen.push_back("roll back as " + ids());
 }
 
 void ConnectionWatch::closing(void*) {
@@ -636,8 +643,9 @@ TEST_F(InitTest, CreatesNothingWithoutVersionRows) {
       "3 oauth_db_basic.cpp Run Command failed!![cannot modify oauth_meta because it is a view][1]";
   EXPECT_THAT(log_.lines(), ElementsAre(failed, "3 oauth_db_basic.cpp Add Meta failed", failed,
                                         "3 oauth_db_basic.cpp Add Meta failed", failed,
-                                        "3 oauth_db_basic.cpp Add Meta failed"));
-  expectUnready(store, 1, "cannot modify oauth_meta because it is a view");
+                                        "3 oauth_db_basic.cpp Add Meta failed",
+                                        "3 oauth_db_basic.cpp Create Table failed!![meta]"));
+  expectUnready(store, -1, "Create table failed");
   EXPECT_EQ(before, databaseBytes());
 }
 
@@ -1377,6 +1385,106 @@ TEST_F(PrivilegeTest, IsRestoredBeforeAFailedCloseIsReported) {
   EXPECT_THAT(log_.lines(), ElementsAre(kGroupRaised, kUserRaised, kUserRaised,
                                         "3 oauth_db_basic.cpp Close DB failed!![5]"));
   expectIds(1000, 500);
+}
+
+// --- A new file ---
+
+TEST_F(PrivilegeTest, MakesANewFileForItsUserAlone) {
+  const mode_t before = umask(0);
+  open();
+  umask(before);
+  EXPECT_EQ(std::filesystem::perms::owner_read | std::filesystem::perms::owner_write,
+            std::filesystem::status(files_.database()).permissions());
+  EXPECT_THAT(log_.lines(), IsEmpty());
+}
+
+TEST_F(PrivilegeTest, GivesANewFileToTheProgramsOwnUser) {
+  if (getuid() != 0) GTEST_SKIP() << "only root gives files away";
+  ids_.become(1000, 500);
+  open();
+  struct stat status;
+  ASSERT_EQ(0, stat(files_.database().c_str(), &status));
+  EXPECT_EQ(1000U, status.st_uid);
+  EXPECT_EQ(500U, status.st_gid);
+}
+
+TEST_F(PrivilegeTest, LeavesTheModeOfAnExistingFileAlone) {
+  createDatabaseFile("");
+  std::filesystem::permissions(files_.database(), std::filesystem::perms(0640));
+  open();
+  EXPECT_EQ(std::filesystem::perms(0640), std::filesystem::status(files_.database()).permissions());
+}
+
+TEST_F(PrivilegeTest, OpensAnExistingFileWithErrnoAsRaisingLeftIt) {
+  createDatabaseFile("");
+  open();
+  EXPECT_THAT(connections_.seen, ElementsAre("open as 0:0, errno 0"));
+}
+
+// --- Something else in the file's place ---
+
+TEST_F(PrivilegeTest, IsNotRaisedWhereALinkLies) {
+  std::filesystem::create_symlink(files_.directory() + "/elsewhere", files_.database());
+  ids_.become(1000, 500);
+  open();
+  EXPECT_THAT(idCalls(), IsEmpty());
+  EXPECT_THAT(connections_.seen, ElementsAre(testing::StartsWith("open as 1000:500,")));
+  EXPECT_THAT(log_.lines(), IsEmpty());
+  expectReady(*store_);
+}
+
+TEST_F(PrivilegeTest, IsNotRaisedWhereADirectoryLies) {
+  std::filesystem::create_directory(files_.database());
+  ids_.become(1000, 500);
+  open();
+  EXPECT_THAT(idCalls(), IsEmpty());
+  EXPECT_THAT(connections_.seen, ElementsAre(testing::StartsWith("open as 1000:500,")));
+  expectUnready(*store_, -1, "Create table failed");
+}
+
+// The program's own user may not look into the directory.
+TEST_F(PrivilegeTest, IsGivenUpAgainWhereOnlyRootSeesALink) {
+  std::filesystem::create_symlink(files_.directory() + "/elsewhere", files_.database());
+  ids_.become(1000, 500);
+  files_.failNextLook(EACCES);
+  open();
+  EXPECT_THAT(idCalls(),
+              ElementsAre("setresgid(-1, 0, -1)", "setresuid(-1, 0, -1)", "setresuid(-1, 0, -1)",
+                          "setresgid(-1, 500, -1)", "setresuid(-1, 1000, -1)"));
+  EXPECT_THAT(connections_.seen, ElementsAre(testing::StartsWith("open as 1000:500,")));
+}
+
+// --- A transaction left open ---
+
+// A roll-back deletes the files that the journal names.
+TEST_F(PrivilegeTest, IsNotRaisedForTheRollBackOfAnOpenTransaction) {
+  open();
+  EXPECT_TRUE(
+      store_->DBCmd("BEGIN; INSERT INTO oauth_log VALUES(1, 'lost', 1);", nullptr, nullptr));
+  ids_.become(1000, 500);
+  connections_.seen.clear();
+  forgetOpening();
+  close();
+  EXPECT_THAT(connections_.seen, ElementsAre("roll back as 1000:500", "close as 0:0"));
+  EXPECT_THAT(log_.lines(), ElementsAre(kGroupRaised, kUserRaised, kUserRaised));
+  EXPECT_EQ(0, rowCount("oauth_log"));
+}
+
+// --- A file that cannot be trusted ---
+
+TEST_F(OpenFailureTest, RefusesToChangeTheTablesOfSqlite) {
+  OAUTHDBBasic store;
+  EXPECT_FALSE(
+      store.DBCmd("PRAGMA writable_schema = ON; DELETE FROM sqlite_master;", nullptr, nullptr));
+  expectError(store, 1, "table sqlite_master may not be modified");
+  EXPECT_EQ(5, static_cast<int>(query(kTables).size()));
+}
+
+TEST_F(OpenFailureTest, DoesNotTrustFunctionsInViewsOrTriggers) {
+  OAUTHDBBasic store;
+  Json::Value rows;
+  EXPECT_TRUE(store.DBCmd("PRAGMA trusted_schema;", OAUTHDBBasic::TabCountCallback, &rows));
+  EXPECT_EQ("0", rows[0U].asString());
 }
 
 TEST_F(PrivilegeTest, IsNotRaisedForStatements) {

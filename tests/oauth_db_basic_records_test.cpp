@@ -329,10 +329,24 @@ TEST_F(AddTest, TakesTheTimeFromTheDatabase) {
   EXPECT_THAT(query("SELECT typeof(timestamp) FROM t"), ElementsAre("integer"));
 }
 
-TEST_F(AddTest, StoresAValueUpToItsNulByte) {
-  EXPECT_TRUE(add(R"({"name": "a\u0000'b", "scope": "s"})"));
-  EXPECT_TRUE(get(R"({"condition": {"name": "a\u0000c"}})"));
-  EXPECT_EQ(R"([{"id":"1","name":"a","scope":"s","timestamp":"0"}])", text(rows_));
+TEST_F(AddTest, RefusesAValueWithANulByte) {
+  EXPECT_FALSE(add(R"({"name": "a\u0000'b", "scope": "s"})"));
+  expectFailure(1, "unrecognized token: \"'a\"", "Add failed[t]");
+  EXPECT_EQ(0, rowCount("t"));
+}
+
+// The statement ends inside its literal, so it cannot match more than was meant.
+TEST_F(AddTest, KeepsRowsFromAConditionWithANulByte) {
+  execute("INSERT INTO t(name) VALUES('a')");
+  EXPECT_FALSE(get(R"({"condition": {"name": "a\u0000"}})"));
+  expectFailure(1, "unrecognized token: \"'a\"", "Get failed[t]");
+  log_.clear();
+  EXPECT_FALSE(del(R"({"condition": {"name": "a\u0000"}})"));
+  expectFailure(1, "unrecognized token: \"'a\"", "Delete failed[t]");
+  log_.clear();
+  EXPECT_FALSE(edit(R"({"modified": {"name": "b\u0000"}})"));
+  expectFailure(1, "unrecognized token: \"'b\"", "Edit failed[t]");
+  EXPECT_THAT(query("SELECT name FROM t"), ElementsAre("a"));
 }
 
 TEST_F(AddTest, StoresAnyOtherText) {

@@ -1,5 +1,6 @@
 
 #include <stdexcept>
+#include <string_view>
 
 #include "json_text.h"
 #include "oauth_db_basic.h"
@@ -7,6 +8,7 @@
 
 using testing::ElementsAre;
 using testing::IsEmpty;
+using namespace std::string_view_literals;
 using ZEVOOAUTHSERVER::OAUTHDBBasic;
 
 namespace {
@@ -19,7 +21,7 @@ Json::Value member(const std::string& name, const Json::Value& value) {
 
 struct Row {
   const char* json;
-  const char* sql;
+  std::string_view sql;
 };
 
 // Every row's document must become exactly the row's text.
@@ -55,10 +57,10 @@ constexpr Row kValues[] = {
     {"9223372036854775807", "'9223372036854775807'"},
     {"-9223372036854775808", "'-9223372036854775808'"},
     {"18446744073709551615", "'18446744073709551615'"},
-    // SQLite would take the statement to end at a NUL byte, so the value ends there.
-    {R"("a\u0000b")", "'a'"},
-    {R"("\u0000' OR 1")", "''"},
-    {R"("it's\u0000'")", "'it''s'"},
+    // A NUL byte stays, and the quotes behind it are doubled too.
+    {R"("a\u0000b")", "'a\0b'"sv},
+    {R"("\u0000' OR 1")", "'\0'' OR 1'"sv},
+    {R"("it's\u0000'")", "'it''s\0'''"sv},
 };
 
 // Values that no text can be made of.
@@ -85,15 +87,15 @@ class TranslationTest : public StoreTest {
     withDiagnostics(15, body);
     return log_.lines();
   }
+
+  OAUTHDBBasic store_;
 };
 
 // --- Name and value pairs ---
 
 class PairsTest : public TranslationTest {
  protected:
-  static std::string concatenated(const Json::Value& values) {
-    return OAUTHDBBasic::ConcateParam(values, ", ");
-  }
+  std::string concatenated(const Json::Value& values) { return store_.ConcateParam(values, ", "); }
 };
 
 constexpr Row kPairs[] = {
@@ -118,19 +120,21 @@ constexpr Row kPairs[] = {
     {R"({"a b": "1", "c\\d": "2"})", "a b='1', c\\d='2'"},
 };
 
-TEST_F(PairsTest, ComeInByteOrderOfTheirNames) { expectEach(kPairs, concatenated); }
+TEST_F(PairsTest, ComeInByteOrderOfTheirNames) {
+  expectEach(kPairs, [this](const Json::Value& v) { return concatenated(v); });
+}
 
 TEST_F(PairsTest, QuoteTheirValues) {
   for (const Row& value : kValues)
-    EXPECT_EQ(std::string("a=") + value.sql, concatenated(member("a", parse(value.json))))
+    EXPECT_EQ(std::string("a=").append(value.sql), concatenated(member("a", parse(value.json))))
         << value.json;
 }
 
 TEST_F(PairsTest, TakeTheSeparatorAsItIs) {
   const Json::Value values = parse(R"({"b": "2", "a": "1", "c": "3"})");
-  EXPECT_EQ("a='1' and b='2' and c='3'", OAUTHDBBasic::ConcateParam(values, " and "));
-  EXPECT_EQ("a='1'b='2'c='3'", OAUTHDBBasic::ConcateParam(values, ""));
-  EXPECT_EQ("a='1''b='2''c='3'", OAUTHDBBasic::ConcateParam(values, "'"));
+  EXPECT_EQ("a='1' and b='2' and c='3'", store_.ConcateParam(values, " and "));
+  EXPECT_EQ("a='1'b='2'c='3'", store_.ConcateParam(values, ""));
+  EXPECT_EQ("a='1''b='2''c='3'", store_.ConcateParam(values, "'"));
 }
 
 TEST_F(PairsTest, HaveNoLimitOfLength) {
@@ -143,7 +147,7 @@ TEST_F(PairsTest, PassOnTheRefusalOfAValue) {
 }
 
 TEST_F(PairsTest, AreTraced) {
-  EXPECT_THAT(traceOf([] { concatenated(parse(R"({"a": "1"})")); }),
+  EXPECT_THAT(traceOf([this] { concatenated(parse(R"({"a": "1"})")); }),
               ElementsAre("3 oauth_db_basic.cpp ==> ConcateParam"));
   EXPECT_THAT(log_.formats(), ElementsAre("%s:%d ==> %s"));
 }
@@ -165,30 +169,30 @@ constexpr Row kConditions[] = {
 };
 
 TEST_F(ConditionTest, JoinsItsPairsOrIsNothing) {
-  expectEach(kConditions, OAUTHDBBasic::GetConditionParam);
+  expectEach(kConditions, [this](const Json::Value& v) { return store_.GetConditionParam(v); });
 }
 
 TEST_F(ConditionTest, QuotesItsValues) {
   for (const Row& value : kValues)
-    EXPECT_EQ(std::string(" WHERE a=") + value.sql,
-              OAUTHDBBasic::GetConditionParam(member("a", parse(value.json))))
+    EXPECT_EQ(std::string(" WHERE a=").append(value.sql),
+              store_.GetConditionParam(member("a", parse(value.json))))
         << value.json;
 }
 
 TEST_F(ConditionTest, PassesOnTheRefusalOfAValue) {
   for (const char* const json : kRefused)
-    EXPECT_THROW(OAUTHDBBasic::GetConditionParam(parse(json)), Json::Exception) << json;
+    EXPECT_THROW(store_.GetConditionParam(parse(json)), Json::Exception) << json;
 }
 
 TEST_F(ConditionTest, IsTraced) {
-  EXPECT_THAT(traceOf([] { OAUTHDBBasic::GetConditionParam(parse(R"({"a": "1"})")); }),
+  EXPECT_THAT(traceOf([this] { store_.GetConditionParam(parse(R"({"a": "1"})")); }),
               ElementsAre("3 oauth_db_basic.cpp ==> GetConditionParam",
                           "3 oauth_db_basic.cpp ==> ConcateParam"));
   EXPECT_THAT(log_.formats(), ElementsAre("%s:%d ==> %s", "%s:%d ==> %s"));
 }
 
 TEST_F(ConditionTest, MakesNoPairsOfNothing) {
-  EXPECT_THAT(traceOf([] { OAUTHDBBasic::GetConditionParam(parse("{}")); }),
+  EXPECT_THAT(traceOf([this] { store_.GetConditionParam(parse("{}")); }),
               ElementsAre("3 oauth_db_basic.cpp ==> GetConditionParam"));
 }
 
@@ -219,7 +223,7 @@ constexpr Row kUpdates[] = {
 };
 
 TEST_F(UpdateTest, SetsWhatIsModifiedUnderTheCondition) {
-  expectEach(kUpdates, OAUTHDBBasic::GetUpdateParam);
+  expectEach(kUpdates, [this](const Json::Value& v) { return store_.GetUpdateParam(v); });
 }
 
 TEST_F(UpdateTest, QuotesItsValues) {
@@ -227,8 +231,8 @@ TEST_F(UpdateTest, QuotesItsValues) {
     Json::Value request;
     request["modified"]["a"] = parse(value.json);
     request["condition"]["b"] = parse(value.json);
-    EXPECT_EQ(std::string(" SET a=") + value.sql + " WHERE b=" + value.sql,
-              OAUTHDBBasic::GetUpdateParam(request))
+    EXPECT_EQ(std::string(" SET a=").append(value.sql).append(" WHERE b=").append(value.sql),
+              store_.GetUpdateParam(request))
         << value.json;
   }
 }
@@ -236,14 +240,14 @@ TEST_F(UpdateTest, QuotesItsValues) {
 TEST_F(UpdateTest, PassesOnTheRefusalOfAValue) {
   for (const char* const key : {"modified", "condition"})
     for (const char* const json : kRefused)
-      EXPECT_THROW(OAUTHDBBasic::GetUpdateParam(member(key, parse(json))), Json::Exception)
+      EXPECT_THROW(store_.GetUpdateParam(member(key, parse(json))), Json::Exception)
           << key << " " << json;
 }
 
 TEST_F(UpdateTest, IsTraced) {
   EXPECT_THAT(
-      traceOf([] {
-        OAUTHDBBasic::GetUpdateParam(parse(R"({"modified": {"a": "1"}, "condition": {"b": "2"}})"));
+      traceOf([this] {
+        store_.GetUpdateParam(parse(R"({"modified": {"a": "1"}, "condition": {"b": "2"}})"));
       }),
       ElementsAre(
           "3 oauth_db_basic.cpp ==> GetUpdateParam", "3 oauth_db_basic.cpp ==> ConcateParam",
@@ -283,51 +287,53 @@ constexpr Row kInserts[] = {
 };
 
 TEST_F(InsertTest, ListsColumnsBesideTheirValues) {
-  expectEach(kInserts, OAUTHDBBasic::GetInsertParam);
+  expectEach(kInserts, [this](const Json::Value& v) { return store_.GetInsertParam(v); });
 }
 
 TEST_F(InsertTest, QuotesItsValues) {
   for (const Row& value : kValues)
-    EXPECT_EQ(std::string(" (a) VALUES(") + value.sql + ")",
-              OAUTHDBBasic::GetInsertParam(member("a", parse(value.json))))
+    EXPECT_EQ(std::string(" (a) VALUES(").append(value.sql) + ")",
+              store_.GetInsertParam(member("a", parse(value.json))))
         << value.json;
 }
 
 TEST_F(InsertTest, HasNoLimitOfLength) {
   EXPECT_EQ(" (a) VALUES(" + manyQuotesQuoted() + ")",
-            OAUTHDBBasic::GetInsertParam(member("a", manyQuotes())));
+            store_.GetInsertParam(member("a", manyQuotes())));
 }
 
 TEST_F(InsertTest, PassesOnTheRefusalOfAValue) {
   for (const char* const json : kRefused)
-    EXPECT_THROW(OAUTHDBBasic::GetInsertParam(parse(json)), Json::Exception) << json;
+    EXPECT_THROW(store_.GetInsertParam(parse(json)), Json::Exception) << json;
 }
 
 TEST_F(InsertTest, IsTraced) {
-  EXPECT_THAT(traceOf([] { OAUTHDBBasic::GetInsertParam(parse(R"({"a": "1", "b": null})")); }),
+  EXPECT_THAT(traceOf([this] { store_.GetInsertParam(parse(R"({"a": "1", "b": null})")); }),
               ElementsAre("3 oauth_db_basic.cpp ==> GetInsertParam"));
   EXPECT_THAT(log_.formats(), ElementsAre("%s:%d ==> %s"));
 }
 
 // --- All four ---
 
-void translateEverything() {
+void translateEverything(OAUTHDBBasic& store) {
   const Json::Value request = parse(R"({"modified": {"a": "1"}, "condition": {"b": "2"}})");
-  OAUTHDBBasic::GetInsertParam(request["modified"]);
-  OAUTHDBBasic::ConcateParam(request["modified"], ", ");
-  OAUTHDBBasic::GetConditionParam(request["condition"]);
-  OAUTHDBBasic::GetUpdateParam(request);
+  store.GetInsertParam(request["modified"]);
+  store.ConcateParam(request["modified"], ", ");
+  store.GetConditionParam(request["condition"]);
+  store.GetUpdateParam(request);
 }
 
 TEST_F(TranslationTest, IsSilentWithoutEntryTraces) {
-  withDiagnostics(7, translateEverything);
+  withDiagnostics(7, [this] { translateEverything(store_); });
   EXPECT_THAT(log_.lines(), IsEmpty());
 }
 
 TEST_F(TranslationTest, NeedsNoDatabase) {
-  translateEverything();
-  EXPECT_THAT(files_.calls(), IsEmpty());
-  EXPECT_EQ("", databaseBytes());
+  files_.openWithoutHandle(7);
+  OAUTHDBBasic store;
+  log_.clear();
+  translateEverything(store);
+  expectError(store, 7, "Open DB failed!!");
   EXPECT_THAT(log_.lines(), IsEmpty());
 }
 

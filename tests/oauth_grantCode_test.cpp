@@ -94,6 +94,14 @@ int longEdit(OAUTHDBGrantCode& codes, long long id, const Grant& grant) {
 
 class GrantCodeTest : public StoreTest {
  protected:
+  // A value with a NUL byte ended the statement inside a literal.
+  void expectUnclosedLiteral(const std::string& failure) const {
+    EXPECT_THAT(
+        log_.lines(),
+        ElementsAre(testing::StartsWith("3 oauth_db_basic.cpp Run Command failed!![unrecognized "
+                                        "token: \"'"),
+                    "3 oauth_db_basic.cpp " + failure));
+  }
   static void createDatabase() { const OAUTHDBGrantCode codes("oauth_grantCode"); }
 
   // A row as query() prints it.
@@ -287,7 +295,7 @@ TEST_F(GrantCodeAddTest, KeepsStatementsInsideAValueAsText) {
   EXPECT_THAT(rows(), ElementsAre(row(hostile)));
 }
 
-TEST_F(GrantCodeAddTest, EndsEveryValueAtItsFirstNul) {
+TEST_F(GrantCodeAddTest, EndsEveryQuotedValueAtItsFirstNul) {
   const std::string nul(1, '\0');
   expectStored(
       {
@@ -295,12 +303,23 @@ TEST_F(GrantCodeAddTest, EndsEveryValueAtItsFirstNul) {
           {&Grant::client_id, "client_id", "c" + nul + times(62, 'x'), FakeHost::sealed("c")},
           {&Grant::scope, "scope", nul + "read", ""},
           {&Grant::code, "code", "a" + nul + times(62, 'x'), "a"},
-          {&Grant::expired_time, "expired_time", "17" + nul + "'00", "17"},
           {&Grant::state, "state", "xyz" + nul, "xyz"},
-          {&Grant::ip, "ip", "192.0.2.7" + nul + "'", "192.0.2.7"},
       },
       [](OAUTHDBGrantCode& codes, const Grant& grant) { return add(codes, grant); },
       [this] { emptyTable(); });
+}
+
+TEST_F(GrantCodeAddTest, RefusesANulInAValueTakenAsGiven) {
+  const std::string nul(1, '\0');
+  for (const Grant& grant : {grantWith(&Grant::expired_time, "17" + nul + "'00"),
+                             grantWith(&Grant::ip, "192.0.2.7" + nul + "'")}) {
+    OAUTHDBGrantCode codes("oauth_grantCode");
+    log_.clear();
+    EXPECT_EQ(0, add(codes, grant));
+    EXPECT_EQ(1, codes.GetErrCode());
+    expectUnclosedLiteral("Add failed[oauth_grantCode]");
+    EXPECT_EQ(0, rowCount("oauth_grantCode"));
+  }
 }
 
 TEST_F(GrantCodeAddTest, AcceptsAddressesOfBothFamilies) {
@@ -608,17 +627,33 @@ TEST_F(GrantCodeEditTest, LongFormStoresASingleQuoteDoubledExceptInTheExpiry) {
       longEditOfFirst, [this] { restoreRow(); });
 }
 
-TEST_F(GrantCodeEditTest, EndsEveryValueAtItsFirstNul) {
+TEST_F(GrantCodeEditTest, EndsEveryQuotedValueAtItsFirstNul) {
   const std::string nul(1, '\0');
-  std::vector<StoredValue> values = {
+  const std::vector<StoredValue> values = {
       {&Grant::username, "username", "al" + nul + "ice", "al"},
       {&Grant::client_id, "client_id", "c" + nul + times(62, 'x'), FakeHost::sealed("c")},
       {&Grant::scope, "scope", nul + "read", ""},
       {&Grant::state, "state", "xyz" + nul + "'", "xyz"},
   };
-  expectStored(values, shortEditOfFirst, [this] { restoreRow(); });
-  values.push_back({&Grant::expired_time, "expired_time", "17" + nul + "'00", "17"});
   expectStored(values, longEditOfFirst, [this] { restoreRow(); });
+}
+
+TEST_F(GrantCodeEditTest, RefusesANulInAValueTakenAsGiven) {
+  const std::string nul(1, '\0');
+  OAUTHDBGrantCode codes("oauth_grantCode");
+  const Lines before = rows();
+  for (const Grant& grant :
+       {grantWith(&Grant::username, "al" + nul + "ice"), grantWith(&Grant::scope, nul + "read"),
+        grantWith(&Grant::state, "xyz" + nul + "'")}) {
+    log_.clear();
+    EXPECT_EQ(0, shortEdit(codes, 1, grant));
+    EXPECT_EQ(1, codes.GetErrCode());
+    expectUnclosedLiteral("Edit failed[oauth_grantCode]");
+  }
+  log_.clear();
+  EXPECT_EQ(0, longEdit(codes, 1, grantWith(&Grant::expired_time, "17" + nul + "'00")));
+  expectUnclosedLiteral("Edit failed[oauth_grantCode]");
+  EXPECT_EQ(before, rows());
 }
 
 TEST_F(GrantCodeEditTest, KeepsStatementsInsideAValueAsText) {
@@ -820,15 +855,16 @@ TEST_F(GrantCodeGetTest, TakesWildcardsLiterally) {
   }
 }
 
-TEST_F(GrantCodeGetTest, EndsTheCodeAtItsFirstNul) {
+TEST_F(GrantCodeGetTest, RefusesACodeWithANul) {
   OAUTHDBGrantCode codes("oauth_grantCode");
   Grant grant;
   grant.code[10] = '\0';
   EXPECT_EQ(1, add(codes, grant));
   Json::Value rows;
-  EXPECT_EQ(1, codes.Get(grant.code, &rows));
-  grant.code.resize(10);
-  EXPECT_EQ(list({document(grant, "1")}), rows);
+  EXPECT_EQ(0, codes.Get(grant.code, &rows));
+  EXPECT_EQ(1, codes.GetErrCode());
+  expectUnclosedLiteral("Get failed[oauth_grantCode]");
+  EXPECT_EQ(Json::Value(Json::arrayValue), rows);
 }
 
 TEST_F(GrantCodeGetTest, ReportsAFailedRead) {

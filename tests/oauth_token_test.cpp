@@ -184,12 +184,13 @@ class TokenTest : public StoreTest {
   }
 };
 
-// --- Without entropy ---
+// --- Without random bytes ---
 
 // A token that could be guessed would be worse than none.
-TEST_F(TokenTest, IssuesNothingWithoutEntropy) {
+TEST_F(TokenTest, IssuesNothingWithoutRandomBytes) {
   OAUTHDBToken tokens("oauth_token");
-  files_.failEntropy();
+  files_.failRandomCall(ENOSYS);
+  files_.removeRandomDevice();
   Json::Value result;
   EXPECT_EQ(0, tokens.Add("alice", times(64), "read", "code", "xyz", "", result));
   EXPECT_EQ(-2, tokens.GetErrCode());
@@ -715,7 +716,7 @@ TEST_F(TokenEditTest, LongFormStoresASingleQuoteDoubledExceptInTheExpiry) {
   }
 }
 
-TEST_F(TokenEditTest, EndsEveryValueAtItsFirstNul) {
+TEST_F(TokenEditTest, EndsEveryQuotedValueAtItsFirstNul) {
   const std::string nul(1, '\0');
   const StoredValue values[] = {
       {&Grant::username, "username", "al" + nul + "ice", "al"},
@@ -727,14 +728,33 @@ TEST_F(TokenEditTest, EndsEveryValueAtItsFirstNul) {
   OAUTHDBToken tokens("oauth_token");
   for (const StoredValue& value : values) {
     SCOPED_TRACE(value.column);
-    EXPECT_EQ(1, shortEdit(tokens, 1, grantWith(value.member, value.given)));
-    EXPECT_EQ(value.stored, stored(value.column));
     EXPECT_EQ(1, longEdit(tokens, 1, Grant()));
     EXPECT_EQ(1, longEdit(tokens, 1, grantWith(value.member, value.given)));
     EXPECT_EQ(value.stored, stored(value.column));
   }
-  EXPECT_EQ(1, longEdit(tokens, 1, grantWith(&Grant::expired_time, "17" + nul + "00")));
-  EXPECT_EQ("17", stored("expired_time"));
+}
+
+TEST_F(TokenEditTest, RefusesANulInAValueTakenAsGiven) {
+  const std::string nul(1, '\0');
+  OAUTHDBToken tokens("oauth_token");
+  const Lines before = rows();
+  const auto refused = [&](int result) {
+    EXPECT_EQ(0, result);
+    EXPECT_EQ(1, tokens.GetErrCode());
+    EXPECT_THAT(
+        log_.lines(),
+        ElementsAre(testing::StartsWith("3 oauth_db_basic.cpp Run Command failed!![unrecognized "
+                                        "token: \"'"),
+                    "3 oauth_db_basic.cpp Edit failed[oauth_token]"));
+    log_.clear();
+  };
+  log_.clear();
+  refused(shortEdit(tokens, 1, grantWith(&Grant::username, "al" + nul + "ice")));
+  refused(shortEdit(tokens, 1, grantWith(&Grant::scope, nul + "read")));
+  refused(shortEdit(tokens, 1, grantWith(&Grant::flow_type, "co" + nul + "'de")));
+  refused(shortEdit(tokens, 1, grantWith(&Grant::state, "xyz" + nul)));
+  refused(longEdit(tokens, 1, grantWith(&Grant::expired_time, "17" + nul + "00")));
+  EXPECT_EQ(before, rows());
 }
 
 TEST_F(TokenEditTest, KeepsStatementsInsideAValueAsText) {

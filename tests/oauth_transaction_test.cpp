@@ -3,14 +3,17 @@
 
 #include "oauth_transaction.h"
 
+#include <filesystem>
 #include <memory>
 
+#include "faulty_disk.h"
 #include "oauth_grantCode.h"
 #include "oauth_token.h"
 #include "store_test.h"
 
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::StartsWith;
 using ZEVOOAUTHSERVER::OAUTHDBBasic;
 using ZEVOOAUTHSERVER::OAUTHDBGrantCode;
 using ZEVOOAUTHSERVER::OAUTHDBToken;
@@ -87,6 +90,61 @@ TEST_F(FirstCreationTest, SaysWhyWhenVersionRowsVanishWithoutAnError) {
                                         "3 oauth_db_basic.cpp DB is not ready!!"));
 }
 
+TEST_F(FirstCreationTest, EndsWithItsLineWhereverTheDiskIsFull) {
+  const FaultyDisk disk;
+  int failures = 0;
+  for (;; ++failures) {
+    SCOPED_TRACE(failures);
+    std::filesystem::remove(files_.database());
+    std::filesystem::remove(files_.database() + "-journal");
+    log_.clear();
+    FaultyDisk::fillAfter(failures);
+    const OAUTHDBBasic store;
+    if (!FaultyDisk::mend()) break;
+    expectError(store, -1, "Create table failed");
+    EXPECT_THAT(log_.lines().back(), StartsWith("3 oauth_db_basic.cpp Create Table failed!!["));
+  }
+  EXPECT_GT(failures, 10);
+  EXPECT_EQ(3, rowCount("oauth_meta"));
+}
+
+// --- First creation inside the caller's transaction ---
+
+class JoinedCreationTest : public FirstCreationTest {
+ protected:
+  JoinedCreationTest() {
+    EXPECT_TRUE(store_.DBCmd("BEGIN; DROP TABLE oauth_meta;", nullptr, nullptr));
+  }
+  OAUTHDBBasic store_;
+};
+
+TEST_F(JoinedCreationTest, IsAPartOfIt) {
+  EXPECT_TRUE(store_.DBInit());
+  EXPECT_TRUE(store_.DBCmd("COMMIT;", nullptr, nullptr));
+  EXPECT_EQ(3, rowCount("oauth_meta"));
+  expectError(store_, 255, "");
+  EXPECT_THAT(log_.lines(), IsEmpty());
+}
+
+TEST_F(JoinedCreationTest, IsRolledBackWithIt) {
+  EXPECT_TRUE(store_.DBInit());
+  execute("PRAGMA user_version");  // nothing of it is visible yet
+  EXPECT_TRUE(store_.DBCmd("DROP TABLE oauth_meta; ROLLBACK;", nullptr, nullptr));
+  EXPECT_EQ(3, rowCount("oauth_meta"));
+  expectError(store_, 255, "");
+}
+
+TEST_F(JoinedCreationTest, LeavesTheCallersChangesAloneWhenItFails) {
+  EXPECT_TRUE(
+      store_.DBCmd("CREATE VIEW oauth_meta AS SELECT 1 AS tab_name, 2 AS version;"
+                   "INSERT INTO oauth_log VALUES(1, 'kept', 1);",
+                   nullptr, nullptr));
+  EXPECT_TRUE(store_.DBInit());  // tells whether the store is ready, and it was already
+  expectError(store_, -1, "Create table failed");
+  EXPECT_TRUE(store_.DBCmd("COMMIT;", nullptr, nullptr));
+  EXPECT_THAT(query("SELECT msg FROM oauth_log"), ElementsAre("kept"));
+}
+
 // --- Sweep ---
 
 template <class Store>
@@ -161,19 +219,62 @@ TYPED_TEST(SweepTest, CommitsTheOtherRowsAfterAFailedDelete) {
                           "3 oauth_db_basic.cpp Delete failed[" + this->table_ + "]"));
 }
 
-// What was deleted before the error comes back with it; the rest goes row by row.
-TYPED_TEST(SweepTest, GoesOnRowByRowWhenSqliteEndsTheTransaction) {
+// What was deleted before the error comes back with it, so the sweep starts again, row by row.
+TYPED_TEST(SweepTest, StartsAgainRowByRowWhenSqliteEndsTheTransaction) {
   this->insertExpired(4);
   this->onDeleteOf(2, "ROLLBACK, 'all back'");
   TypeParam store(this->table_);
   const unsigned before = this->commits();
   EXPECT_EQ(0, store.Purge());
-  EXPECT_THAT(this->ids(), ElementsAre("1", "2"));
-  EXPECT_EQ(before + 2, this->commits());
+  EXPECT_THAT(this->ids(), ElementsAre("2"));
+  EXPECT_EQ(before + 3, this->commits());
   this->expectError(store, 19, "all back");
+  const std::string error = "3 oauth_db_basic.cpp Run Command failed!![all back][19]";
+  const std::string failed = "3 oauth_db_basic.cpp Delete failed[" + this->table_ + "]";
+  EXPECT_THAT(this->log_.lines(), ElementsAre(error, failed, error, failed));
+}
+
+TYPED_TEST(SweepTest, NeedsLittleRoomOnTheDisk) {
+  const FaultyDisk disk;
+  this->insertExpired(200);
+  this->execute("UPDATE " + this->table_ + " SET state = hex(zeroblob(1000))");
+  TypeParam store(this->table_);
+  FaultyDisk::limitJournal(128 * 1024);
+  EXPECT_EQ(1, store.Purge());
+  EXPECT_TRUE(FaultyDisk::mend());
+  EXPECT_THAT(this->ids(), IsEmpty());
+  this->expectError(store, 13, "database or disk is full");
   EXPECT_THAT(this->log_.lines(),
-              ElementsAre("3 oauth_db_basic.cpp Run Command failed!![all back][19]",
+              ElementsAre("3 oauth_db_basic.cpp Run Command failed!![database or disk is full][13]",
                           "3 oauth_db_basic.cpp Delete failed[" + this->table_ + "]"));
+}
+
+// Wherever the one fault is: in a delete or in the commit.
+TYPED_TEST(SweepTest, SurvivesAMomentWithoutRoom) {
+  const FaultyDisk disk;
+  int faults = 0;
+  for (;; ++faults) {
+    SCOPED_TRACE(faults);
+    this->insertExpired(5);
+    TypeParam store(this->table_);
+    FaultyDisk::fail(FaultyDisk::Call::kWrite, faults + 1, SQLITE_FULL);
+    EXPECT_EQ(1, store.Purge());
+    EXPECT_THAT(this->ids(), IsEmpty());
+    if (!FaultyDisk::mend()) break;
+    this->expectError(store, 13, "database or disk is full");
+  }
+  EXPECT_GT(faults, 3);
+}
+
+TYPED_TEST(SweepTest, ReportsADiskThatStaysFull) {
+  const FaultyDisk disk;
+  this->insertExpired(2);
+  TypeParam store(this->table_);
+  FaultyDisk::fillAfter(0);
+  EXPECT_EQ(0, store.Purge());
+  EXPECT_TRUE(FaultyDisk::mend());
+  EXPECT_THAT(this->ids(), ElementsAre("1", "2"));
+  this->expectError(store, 13, "database or disk is full");
 }
 
 TYPED_TEST(SweepTest, TriesRowByRowWhereNoTransactionCanBegin) {
@@ -197,6 +298,42 @@ TYPED_TEST(SweepTest, DeletesNothingWhenItCannotCommit) {
   this->expectError(store, 5, "database is locked");
   EXPECT_THAT(this->log_.lines(),
               ElementsAre("3 oauth_db_basic.cpp Run Command failed!![database is locked][5]"));
+}
+
+TYPED_TEST(SweepTest, IsAPartOfTheCallersTransaction) {
+  for (const std::string begin : {"BEGIN;", "BEGIN IMMEDIATE;", "SAVEPOINT mine;"}) {
+    SCOPED_TRACE(begin);
+    this->insertExpired(2);
+    TypeParam store(this->table_);
+    EXPECT_TRUE(store.DBCmd(begin, nullptr, nullptr));
+    EXPECT_EQ(1, store.Purge());
+    EXPECT_THAT(this->ids(), ElementsAre("1", "2"));  // for others, until the caller commits
+    EXPECT_TRUE(store.DBCmd("COMMIT;", nullptr, nullptr));
+    EXPECT_THAT(this->ids(), IsEmpty());
+    this->expectError(store, 255, "");
+  }
+  EXPECT_THAT(this->log_.lines(), IsEmpty());
+}
+
+TYPED_TEST(SweepTest, IsRolledBackWithTheCallersTransaction) {
+  this->insertExpired(2);
+  TypeParam store(this->table_);
+  EXPECT_TRUE(store.DBCmd("BEGIN;", nullptr, nullptr));
+  EXPECT_EQ(1, store.Purge());
+  EXPECT_TRUE(store.DBCmd("ROLLBACK;", nullptr, nullptr));
+  EXPECT_THAT(this->ids(), ElementsAre("1", "2"));
+  this->expectError(store, 255, "");
+}
+
+TYPED_TEST(SweepTest, KeepsTheCallersTransactionOpenAfterAFailedDelete) {
+  this->insertExpired(3);
+  this->onDeleteOf(2, "ABORT, 'kept'");
+  TypeParam store(this->table_);
+  EXPECT_TRUE(store.DBCmd("BEGIN;", nullptr, nullptr));
+  EXPECT_EQ(0, store.Purge());
+  EXPECT_TRUE(store.DBCmd("COMMIT;", nullptr, nullptr));
+  EXPECT_THAT(this->ids(), ElementsAre("2"));
+  this->expectError(store, 19, "kept");
 }
 
 TYPED_TEST(SweepTest, LeavesTheStoreUsableAfterAFailedCommit) {

@@ -1,5 +1,6 @@
 #include "oauth_utils.h"
 
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -98,6 +99,33 @@ TEST_F(SettingsTest, FallsBackToDefaultsOnADirectory) {
   expectDefaults();
 }
 
+// Opening a pipe for reading waits for a writer, and a device may never end.
+TEST_F(SettingsTest, FallsBackToDefaultsOnAPipe) {
+  ASSERT_EQ(0, mkfifo(files_.settings().c_str(), 0600));
+  expectDefaults();
+}
+
+TEST_F(SettingsTest, FallsBackToDefaultsOnADevice) {
+  std::filesystem::create_symlink("/dev/zero", files_.settings());
+  expectDefaults();
+}
+
+TEST_F(SettingsTest, ReadsAMebibyteAtMost) {
+  constexpr std::size_t kLargest = 1024 * 1024;
+  const std::string text = everySetting("7");
+  writeSettings(text + times(static_cast<int>(kLargest - text.size()), ' '));
+  expectEverySetting(7, 7, 7);
+  writeSettings(text + times(static_cast<int>(kLargest + 1 - text.size()), ' '));
+  expectDefaults();
+}
+
+TEST_F(SettingsTest, FollowsALinkToAFile) {
+  writeSettings(everySetting("7"));
+  std::filesystem::rename(files_.settings(), files_.directory() + "/elsewhere");
+  std::filesystem::create_symlink("elsewhere", files_.settings());
+  expectEverySetting(7, 7, 7);
+}
+
 TEST_F(SettingsTest, FallsBackToDefaultsOnAnUnreadableFile) {
   writeSettings(everySetting("7"));
   if (!lock(files_.settings())) GTEST_SKIP() << "this user may read every file";
@@ -114,6 +142,7 @@ std::vector<std::string> badFiles() {
       words(R"({ {} [] [7] null true 7 7.5 "token_expired" ["token_expired"] token_expired=7)"
             R"( {token_expired:7} {'token_expired':7})");
   files.push_back(good.substr(0, good.size() - 1));
+  files.push_back(good.substr(0, good.size() - 1) + ",}");
   files.push_back(good.substr(0, good.size() / 2));
   files.push_back(good.substr(1));
   files.push_back("[" + good + "]");
@@ -614,8 +643,33 @@ TEST_F(RemoteIpTest, IgnoresTheEnvironment) {
 
 class RandomStrTest : public StoreTest {};
 
-TEST_F(RandomStrTest, IsEmptyWithoutEntropy) {
-  files_.failEntropy();
+TEST_F(RandomStrTest, NeedsNoDevice) {
+  files_.removeRandomDevice();
+  const std::string text = getRandomStr(64);
+  EXPECT_EQ(64U, text.size());
+  EXPECT_NE(text, getRandomStr(64));
+}
+
+TEST_F(RandomStrTest, ComesFromTheDeviceWhereTheKernelLacksTheCall) {
+  files_.failRandomCall(ENOSYS);
+  const std::string text = getRandomStr(64);
+  EXPECT_EQ(64U, text.size());
+  EXPECT_NE(text, getRandomStr(64));
+}
+
+TEST_F(RandomStrTest, IsWholeWhenTheCallIsInterrupted) {
+  files_.trickleRandomBytes();
+  files_.removeRandomDevice();
+  const std::string text = getRandomStr(3200);
+  EXPECT_EQ(3200U, text.size());
+  std::set<std::string> blocks;
+  for (std::size_t i = 0; i < text.size(); i += 32) blocks.insert(text.substr(i, 32));
+  EXPECT_EQ(100U, blocks.size());
+}
+
+TEST_F(RandomStrTest, IsEmptyWhenBothSourcesFail) {
+  files_.failRandomCall(ENOSYS);
+  files_.removeRandomDevice();
   for (const unsigned length : {0U, 1U, 32U, 64U}) EXPECT_EQ("", getRandomStr(length)) << length;
   EXPECT_THAT(log_.lines(), IsEmpty());
 }

@@ -1,6 +1,8 @@
 #include "oauth_db_basic.h"
 
+#include <fcntl.h>
 #include <sqlite3.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <boost/algorithm/string/replace.hpp>
@@ -34,7 +36,7 @@ class RaisedPrivilege {
     }
     errno = 1;
     OAUTH_LOG(LOG_AUTH | LOG_ERR, "ERROR: ENTERCriticalSection");
-    errno = 1;  // whatever sending the line made of it
+    errno = 1;  // Sending the line may change errno.
   }
   ~RaisedPrivilege() {
     const bool user = geteuid() != user_;
@@ -76,6 +78,45 @@ class RaisedPrivilege {
 
 constexpr int kBusyTimeout = 5000;  // milliseconds
 
+// True if the path holds something other than a regular file. Root must not open it: a link would
+// choose the file.
+bool holdsNoDatabase(const char* path) {
+  struct stat status;
+  return lstat(path, &status) == 0 && !S_ISREG(status.st_mode);
+}
+
+// Makes an empty file of mode 0600 that belongs to this user, if nothing has the name yet. SQLite
+// would make it as root, with a mode that the umask decides.
+void makeFile(const char* path, uid_t user, gid_t group) {
+  const int file = open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR);
+  if (file < 0) return;  // It exists, or sqlite3_open() reports what is wrong.
+  static_cast<void>(!fchown(file, user, group));  // The file may stay with whoever made it.
+  close(file);
+}
+
+int openDatabase(sqlite3** db) {
+  const char* const path = names::path::kDatabase;
+  const uid_t user = geteuid();
+  const gid_t group = getegid();
+  if (!holdsNoDatabase(path)) {
+    const RaisedPrivilege raised;
+    const int error = errno;
+    makeFile(path, user, group);
+    // Root looks again: it also sees what the program's own user may not look at.
+    const bool mayOpen = !holdsNoDatabase(path);
+    errno = error;
+    if (mayOpen) return sqlite3_open(path, db);
+  }
+  return sqlite3_open(path, db);
+}
+
+// The file may come from anybody who can write its folder. Refuse statements that change SQLite's
+// own tables, and functions with side effects in views and triggers.
+void distrustSchema(sqlite3* db) {
+  sqlite3_db_config(db, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
+  sqlite3_db_config(db, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
+}
+
 using HostCipher = int (*)(const char* text, char* out, int outSize);
 
 // The text that the host's cipher makes of the input; false, and out left empty, if it refuses.
@@ -110,6 +151,25 @@ bool replaceMember(Json::Value& doc, const char* key, ValueConverter converter) 
 // A document that is no object, such as an absent condition, has no member to convert.
 bool has(const Json::Value& doc, const char* key) { return doc.isObject() && doc.isMember(key); }
 
+// Converts the sensitive members. The trace names the operation that was called.
+bool replaceSensitive(Json::Value& doc, const char* operation, ValueConverter converter) {
+  if (has(doc, names::column::kClientId)) {
+    OAUTH_DIAG(kResult, "==> %s[client_id]", operation);
+    if (!replaceMember(doc, names::column::kClientId, converter)) return false;
+  }
+  if (has(doc, names::column::kClientSecret)) {
+    OAUTH_DIAG(kResult, "==> %s[client_secret]", operation);
+    if (!replaceMember(doc, names::column::kClientSecret, converter)) return false;
+  }
+  return true;
+}
+bool encryptMembers(Json::Value& doc) {
+  return replaceSensitive(doc, "ParamEncrypt", EncryptValue);
+}
+bool decryptMembers(Json::Value& doc) {
+  return replaceSensitive(doc, "ParamDecrypt", DecryptValue);
+}
+
 void dumpColumn(int index, const char* name, const char* value) {
   OAUTH_DIAG(kRow, "##### [%d][%s = %s]", index, name, textOrEmpty(value));
 }
@@ -133,11 +193,10 @@ bool badParameters(OAUTHDBBasic& store) {
   return false;
 }
 
-// A value between single quotes, those inside doubled. It ends at its first NUL byte, where
-// SQLite would take the statement to end.
+// A value between single quotes, those inside doubled. A NUL byte stays in it: SQLite reads the
+// statement up to that byte only, finds no closing quote, and refuses it. So no value is cut.
 std::string quoted(const Json::Value& value) {
   std::string text = value.asString();
-  text.resize(std::strlen(text.c_str()));
   boost::algorithm::replace_all(text, "'", "''");
   return "'" + text + "'";
 }
@@ -147,16 +206,13 @@ std::string quoted(const Json::Value& value) {
 // --- Construction and schema ---
 
 OAUTHDBBasic::OAUTHDBBasic() : OAUTHDBBasic(nullptr) {
-  int result;
-  {
-    const RaisedPrivilege raised;
-    result = sqlite3_open(names::path::kDatabase, &db_);
-  }
+  const int result = openDatabase(&db_);
   if (result != SQLITE_OK) {
     SetErrCode(result);
     SetErrMsg("Open DB failed!!");
     OAUTH_FAIL("Open DB failed!![%d]", result);
   } else {
+    distrustSchema(db_);
     sqlite3_busy_timeout(db_, kBusyTimeout);
   }
   // Also after a failed open: SQLite hands out a handle then too, and what fails on it is logged.
@@ -165,6 +221,8 @@ OAUTHDBBasic::OAUTHDBBasic() : OAUTHDBBasic(nullptr) {
 
 OAUTHDBBasic::~OAUTHDBBasic() {
   if (db_ == nullptr) return;
+  // A roll-back deletes files that the journal names, so it must not happen as root.
+  if (sqlite3_get_autocommit(db_) == 0) DBCmdRun("ROLLBACK;", nullptr, nullptr);
   int result;
   {
     const RaisedPrivilege raised;
@@ -189,7 +247,12 @@ bool OAUTHDBBasic::DBInit() {
   };
 
   OAUTH_DIAG(kEntry, "==> %s[init meta table]", __func__);
-  if (!IsDBTabExist(names::table::kMeta) && !createMetaTable()) return ready_;
+  if (!IsDBTabExist(names::table::kMeta) && !createMetaTable()) {
+    SetErrCode(kErrCreateTable);
+    SetErrMsg("Create table failed");
+    OAUTH_FAIL("Create Table failed!![meta]");
+    return ready_;
+  }
   // Two of these five traces are entry traces and three are results: log filters rely on it.
   OAUTH_DIAG(kEntry, "==> %s[init client table]", __func__);
   if (!create(names::schema::kClientInfo, names::table::kClientInfo)) return ready_;
@@ -203,33 +266,23 @@ bool OAUTHDBBasic::DBInit() {
   return true;
 }
 
-// All or nothing, and only once: whoever comes first among several processes creates the table,
-// and the others see so inside their own transaction. A look-up that failed before is made up for
-// here; one that fails again is a failed initialisation, not a missing table.
+// All or nothing, and only once: the first of several processes creates the table. The others
+// look again under the write lock and find it. A look-up that fails there is a failure, not a
+// missing table.
 bool OAUTHDBBasic::createMetaTable() {
   Transaction transaction(*this, &OAUTHDBBasic::DBCmdRun);
   bool exists = false;
-  if (!transaction.begun() || !lookUpTable(names::table::kMeta, exists)) {
-    SetErrCode(kErrCreateTable);
-    SetErrMsg("Create table failed");
-    OAUTH_FAIL("Create Table failed!![meta]");
-    return false;
-  }
-  if (exists) return transaction.commit();
-  if (!CreateDBTab(names::schema::kMeta)) {
-    OAUTH_FAIL("Create Table failed!![meta]");
-    return false;
-  }
+  if (!transaction.begun() || !lookUpTable(names::table::kMeta, exists)) return false;
+  return (exists || fillMetaTable()) && transaction.commit();
+}
+
+// Counts the rows that came, because a view of that name can swallow them without an error.
+bool OAUTHDBBasic::fillMetaTable() {
+  if (!CreateDBTab(names::schema::kMeta)) return false;
   const int rowsBefore = sqlite3_total_changes(db_);
   AddMetaData();
   constexpr int kVersionedTables = 3;
-  if (sqlite3_total_changes(db_) - rowsBefore == kVersionedTables) return transaction.commit();
-  if (errCode_ == kErrNone) {  // passed over without an error, by a view of that name for one
-    SetErrCode(kErrCreateTable);
-    SetErrMsg("Create table failed");
-    OAUTH_FAIL("Create Table failed!![meta]");
-  }
-  return false;
+  return sqlite3_total_changes(db_) - rowsBefore == kVersionedTables;
 }
 
 bool OAUTHDBBasic::CreateDBTab(const std::string& sql) {
@@ -327,7 +380,7 @@ int OAUTHDBBasic::TabGetCallback(void* context, int columns, char** values, char
   return deliver([&] {
     for (int i = 0; i < columns; ++i) dumpColumn(i, columnNames[i], values[i]);
     Json::Value row = makeRow(columns, values, columnNames);
-    if (!ParamDecrypt(row)) OAUTH_FAIL("Decrypt data failed");
+    if (!decryptMembers(row)) OAUTH_FAIL("Decrypt data failed");
     if (context != nullptr) static_cast<Json::Value*>(context)->append(std::move(row));
   });
 }
@@ -387,7 +440,8 @@ std::string OAUTHDBBasic::ConcateParam(const Json::Value& values, const std::str
 
 std::string OAUTHDBBasic::GetConditionParam(const Json::Value& condition) {
   OAUTH_ENTER();
-  // An array is nobody's condition, an empty one neither: its statement must fail, not take all.
+  // An array is not a condition. Build a statement that SQLite rejects, not one that matches
+  // every row.
   if (condition.empty() && !condition.isArray()) return {};
   return " WHERE " + ConcateParam(condition, " and ");
 }
@@ -479,28 +533,7 @@ bool OAUTHDBBasic::DBEdit(Json::Value& request) {
 
 // --- Sensitive values ---
 
-bool OAUTHDBBasic::ParamEncrypt(Json::Value& doc) {
-  if (has(doc, names::column::kClientId)) {
-    OAUTH_DIAG(kResult, "==> %s[client_id]", __func__);
-    if (!replaceMember(doc, names::column::kClientId, EncryptValue)) return false;
-  }
-  if (has(doc, names::column::kClientSecret)) {
-    OAUTH_DIAG(kResult, "==> %s[client_secret]", __func__);
-    if (!replaceMember(doc, names::column::kClientSecret, EncryptValue)) return false;
-  }
-  return true;
-}
-
-bool OAUTHDBBasic::ParamDecrypt(Json::Value& doc) {
-  if (has(doc, names::column::kClientId)) {
-    OAUTH_DIAG(kResult, "==> %s[client_id]", __func__);
-    if (!replaceMember(doc, names::column::kClientId, DecryptValue)) return false;
-  }
-  if (has(doc, names::column::kClientSecret)) {
-    OAUTH_DIAG(kResult, "==> %s[client_secret]", __func__);
-    if (!replaceMember(doc, names::column::kClientSecret, DecryptValue)) return false;
-  }
-  return true;
-}
+bool OAUTHDBBasic::ParamEncrypt(Json::Value& doc) { return encryptMembers(doc); }
+bool OAUTHDBBasic::ParamDecrypt(Json::Value& doc) { return decryptMembers(doc); }
 
 }  // namespace ZEVOOAUTHSERVER

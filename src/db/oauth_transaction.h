@@ -1,4 +1,5 @@
-// A transaction of a store's connection, rolled back unless it is committed.
+// A transaction of a store's connection, rolled back unless it is committed. Inside a transaction
+// that the caller has begun it is a part of that one, which the caller commits.
 
 #pragma once
 
@@ -19,8 +20,9 @@ class Transaction {
   // committed one by one. On a store that is not ready nothing is tried, since whatever comes
   // next is refused with the same line.
   Transaction(OAUTHDBBasic& store, Runner run) : store_(store), run_(run) {
-    const bool refused = run_ == &OAUTHDBBasic::DBCmd && !store_.ready_;
-    begun_ = !refused && (store_.*run_)("BEGIN IMMEDIATE;", nullptr, nullptr);
+    if (run_ == &OAUTHDBBasic::DBCmd && !store_.ready_) return;
+    isPart_ = isUnderWay();
+    begun_ = execute(isPart_ ? "SAVEPOINT zevooauth;" : "BEGIN IMMEDIATE;");
   }
   ~Transaction() {
     try {
@@ -33,24 +35,32 @@ class Transaction {
 
   bool begun() const { return begun_; }
 
-  // True also if there is nothing to commit: it never began, or SQLite rolled it back by itself
-  // after an error, which was reported then.
+  // SQLite rolled everything back by itself after an error, for lack of room for example.
+  bool wasEnded() const { return begun_ && !isUnderWay(); }
+
+  // True if what was done stands, which it does too where no transaction could begin.
   bool commit() {
-    if (!isOpen() || (store_.*run_)("COMMIT;", nullptr, nullptr)) return true;
-    rollBack();
+    if (!begun_) return true;
+    if (!wasEnded() && execute(isPart_ ? "RELEASE zevooauth;" : "COMMIT;")) {
+      begun_ = false;
+      return true;
+    }
+    if (!wasEnded()) rollBack();
     return false;
   }
 
  private:
-  bool isOpen() const { return begun_ && sqlite3_get_autocommit(store_.db_) == 0; }
+  bool isUnderWay() const { return sqlite3_get_autocommit(store_.db_) == 0; }
+  bool execute(const char* sql) { return (store_.*run_)(sql, nullptr, nullptr); }
   void rollBack() {
-    if (isOpen()) (store_.*run_)("ROLLBACK;", nullptr, nullptr);
+    if (begun_ && isUnderWay())
+      execute(isPart_ ? "ROLLBACK TO zevooauth; RELEASE zevooauth;" : "ROLLBACK;");
     begun_ = false;
   }
 
   OAUTHDBBasic& store_;
   const Runner run_;
-  bool begun_;
+  bool isPart_ = false, begun_ = false;
 };
 
 }  // namespace ZEVOOAUTHSERVER

@@ -5,6 +5,7 @@
 #include <json/value.h>
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 #include <cstring>
 #include <initializer_list>
@@ -21,7 +22,8 @@ inline const char* textOrEmpty(const char* text) { return text == nullptr ? "" :
 // member, and the copies share the columns' names.
 class RowForm {
  public:
-  // The names must live as long as any row.
+  // The names must live as long as any row. Constants of the library do, since it is linked to stay
+  // in memory even after dlclose().
   RowForm(std::initializer_list<const char*> columns) : columns_(columns) {
     for (const char* const column : columns_) empty_[Json::StaticString(column)];
     for (const std::string& member : empty_.getMemberNames())
@@ -46,10 +48,11 @@ class RowForm {
   std::vector<std::ptrdiff_t> order_;  // for each member, which column it is
 };
 
-// The rows of our tables have forms; any other, such as a caller's own query, goes name by name.
+// Rows of known tables are copied from a form; others are built member by member.
 inline Json::Value makeRow(int columns, char** values, char** columnNames) {
   namespace column = names::column;
-  static const RowForm forms[] = {
+  // Constant, and never destroyed: programs read rows in exit handlers too.
+  static const auto& forms = *new const std::array<RowForm, 4>{{
       {column::kUserName, column::kClientId, column::kScope, column::kRefreshToken,
        column::kAccessToken, column::kExpiredTime, column::kFlowType, column::kState, column::kIp,
        column::kId},
@@ -58,7 +61,7 @@ inline Json::Value makeRow(int columns, char** values, char** columnNames) {
       {column::kEnable, column::kClientId, column::kClientSecret, column::kRedirectUri,
        column::kScope, column::kDisplayName, column::kId},
       {column::kTimestamp, column::kMsg, column::kId},
-  };
+  }};
   for (const RowForm& form : forms)
     if (form.fits(columns, columnNames)) return form.filled(values);
   Json::Value row;

@@ -21,19 +21,33 @@ inline bool isExpired(const Json::Value& row, std::int64_t now) {
   return now > decimalValue(row[names::column::kExpiredTime]);
 }
 
-// Deletes every expired row of the store; a failed delete makes the result 0 and does not stop
-// the sweep. A failed read deletes nothing and counts as success. One transaction, since a commit
-// for every row would make the disk write four times for each; where none can begin, row by row.
-template <class Store>
-int purgeExpired(Store& store) {
-  const std::int64_t now = unixNow();
-  Transaction transaction(store, &OAUTHDBBasic::DBCmd);
+// Deletes every expired row of the store until stopped; a failed delete makes the result 0 and
+// does not stop the sweep. A failed read deletes nothing and counts as success.
+template <class Store, class Stop>
+int deleteExpired(Store& store, std::int64_t now, Stop stop) {
   Json::Value rows(Json::arrayValue);
   if (!store.Get(&rows)) return 1;
   int result = 1;
-  for (const Json::Value& row : rows)
+  for (const Json::Value& row : rows) {
+    if (stop()) break;
     if (isExpired(row, now)) result &= store.Del(decimalValue(row[names::column::kId]));
-  return transaction.commit() ? result : 0;
+  }
+  return result;
+}
+
+// In one transaction, since a commit for every row would make the disk write four times for each.
+// SQLite ends the transaction by itself when the disk has no room for all of it. Then the sweep
+// starts again and commits row by row, which needs little room.
+template <class Store>
+int purgeExpired(Store& store) {
+  const std::int64_t now = unixNow();
+  {
+    Transaction transaction(store, &OAUTHDBBasic::DBCmd);
+    const int result = deleteExpired(store, now, [&] { return transaction.wasEnded(); });
+    if (transaction.commit()) return result;
+    if (!transaction.wasEnded()) return 0;  // Another process held the file for too long.
+  }
+  return deleteExpired(store, now, [] { return false; });
 }
 
 }  // namespace ZEVOOAUTHSERVER

@@ -1,21 +1,17 @@
 #include "oauth_utils.h"
 
-#include <json/reader.h>
 #include <json/value.h>
 #include <unistd.h>
 
-// The device and not the system call, which older kernels of the appliance lack.
-#define BOOST_UUID_RANDOM_PROVIDER_FORCE_POSIX
-#include <boost/uuid/random_generator.hpp>
-#include <cstdio>
 #include <cstring>
 #include <exception>
-#include <memory>
 #include <utility>
 
 #include "host_libraries.h"
 #include "oauth_names.h"
 #include "oauth_syslog.h"
+#include "random_bytes.h"
+#include "settings_file.h"
 #include "sqlite_text.h"
 
 namespace ZEVOOAUTHSERVER {
@@ -28,38 +24,11 @@ thread_local int levelMask = kUndecided;
 constexpr int kDefaultPeriod = 600;  // seconds
 constexpr int kDefaultRowMax = 1000, kLargestRowMax = 10000;
 
-struct CloseFile {
-  void operator()(std::FILE* file) const { std::fclose(file); }
-};
-
-// Reads the whole settings file; false where that fails, for example on a directory.
-bool loadSettings(std::string& text) {
-  const std::unique_ptr<std::FILE, CloseFile> file(std::fopen(names::path::kSettings, "re"));
-  if (!file) return false;
-  char block[4096];
-  while (const std::size_t count = std::fread(block, 1, sizeof block, file.get()))
-    text.append(block, count);
-  return std::ferror(file.get()) == 0;
-}
-
-// Parses a JSON document, comments allowed, a byte order mark passed over. By the older of the JSON
-// library's readers: the newer one is made from a document of options, which takes longer than
-// reading the settings does.
-bool parseDocument(const std::string& text, Json::Value& document) {
-  constexpr char kByteOrderMark[] = "\xEF\xBB\xBF";
-  const std::size_t start = text.rfind(kByteOrderMark, 0) == 0 ? std::strlen(kByteOrderMark) : 0;
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
-  return Json::Reader().parse(text.data() + start, text.data() + text.size(), document, false);
-#pragma GCC diagnostic pop
-}
-
 // The integer stored under the key in the settings file, or 0. Whatever is wrong with the file
-// reads as 0, including what makes the parser throw, such as very deep nesting.
+// reads as 0, memory that runs out included.
 int readSettingInt(const std::string& key) try {
-  std::string text;
   Json::Value settings;
-  if (!loadSettings(text) || !parseDocument(text, settings) || !settings.isObject()) return 0;
+  if (readSettingsFile(names::path::kSettings, settings) != SettingsState::kRead) return 0;
   const Json::Value& value = std::as_const(settings)[key];
   return value.isInt() ? value.asInt() : 0;
 } catch (const std::exception&) {
@@ -118,22 +87,24 @@ std::string getSQLFormatLikeStr(const std::string& column, const std::string& va
   return taken(SqliteText(sqlite3_mprintf("%s like '%%%q%%'", column.c_str(), value.c_str())));
 }
 
-std::string getRandomStr(unsigned int length) try {
+std::string getRandomStr(unsigned int length) {
   constexpr char kHexDigits[] = "0123456789abcdef";
   std::string result;
   while (result.size() < length) {
-    // Reads the operating system's entropy for every UUID; no generator is kept between calls.
+    // A version-4 UUID. No generator is kept between calls: each asks the operating system.
+    unsigned char bytes[16];
+    if (!fillWithRandomBytes(bytes, sizeof bytes)) return {};
+    bytes[6] = static_cast<unsigned char>((bytes[6] & 0x0F) | 0x40);  // version 4
+    bytes[8] = static_cast<unsigned char>((bytes[8] & 0x3F) | 0x80);  // variant of RFC 4122
     char digits[32];
     char* digit = digits;
-    for (const unsigned byte : boost::uuids::random_generator()()) {
+    for (const unsigned byte : bytes) {
       *digit++ = kHexDigits[byte >> 4];
       *digit++ = kHexDigits[byte & 15];
     }
     result.append(digits, sizeof digits);
   }
   return result;
-} catch (const boost::uuids::entropy_error&) {
-  return {};
 }
 
 }  // namespace ZEVOOAUTHSERVER

@@ -204,14 +204,14 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   request["modified"] = anyDocument(input, ofColumns);
   const std::string separator = input.ConsumeRandomLengthString(5);
 
-  compared([&] { return OAUTHDBBasic::ConcateParam(record, separator); },
+  compared([&] { return store().ConcateParam(record, separator); },
            [&] { return pairs(record, separator); });
-  const auto inserted = compared([&] { return OAUTHDBBasic::GetInsertParam(record); },
+  const auto inserted = compared([&] { return store().GetInsertParam(record); },
                                  [&] { return insertion(record); });
-  const auto condition = compared([&] { return OAUTHDBBasic::GetConditionParam(record); },
+  const auto condition = compared([&] { return store().GetConditionParam(record); },
                                   [&] { return where(record); });
   const auto update = compared(
-      [&] { return OAUTHDBBasic::GetUpdateParam(request); },
+      [&] { return store().GetUpdateParam(request); },
       [&] { return " SET " + pairs(request["modified"], ", ") + where(request["condition"]); });
 
   if (!ofColumns || !inserted || !update || !record.isObject() || record.empty() ||

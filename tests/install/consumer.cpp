@@ -4,8 +4,11 @@
 #include "oauth_utils.h"
 
 int main() {  // touches no file: the library's are the machine's own
-  Json::Value condition;
-  condition["username"] = "alice";
-  std::cout << ZEVOOAUTHSERVER::OAUTHDBToken::GetConditionParam(condition) << ' '
+  char column[] = "username", value[] = "alice";
+  char* columns[] = {column};
+  char* values[] = {value};
+  Json::Value rows;
+  ZEVOOAUTHSERVER::OAUTHDBToken::TabGetCallback(&rows, 1, values, columns);
+  std::cout << rows[0U]["username"].asString() << ' '
             << ZEVOOAUTHSERVER::getRandomStr(64).size() << '\n';
 }

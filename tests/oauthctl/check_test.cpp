@@ -262,6 +262,29 @@ TEST_F(CheckTest, FindsASettingsFileThatIsNoJson) {
   EXPECT_THAT(findings(), ElementsAre(files_.settings() + " is not JSON, every default applies"));
 }
 
+// The library refuses such a file whole, so its value must not be shown as the one in force.
+TEST_F(CheckTest, ReadsTheSettingsAsTheLibraryDoes) {
+  writeSettings(R"({"token_max": 50,})");
+  chmod(files_.settings().c_str(), 0600);
+  EXPECT_THAT(findings(), ElementsAre(files_.settings() + " is not JSON, every default applies"));
+  const Json::Value value = json({"status", "--json"})["settings"]["values"]["token_max"];
+  EXPECT_EQ(1000, value["value"].asInt());
+  EXPECT_EQ("default", value["from"].asString());
+}
+
+TEST_F(CheckTest, FindsAPipeInPlaceOfTheSettings) {
+  ASSERT_EQ(0, mkfifo(files_.settings().c_str(), 0600));
+  EXPECT_THAT(findings(),
+              ElementsAre(files_.settings() + " is not a regular file, every default applies"));
+}
+
+TEST_F(CheckTest, FindsSettingsThatAreTooLarge) {
+  writeSettings("{" + times(1024 * 1024, ' ') + "}");
+  chmod(files_.settings().c_str(), 0600);
+  EXPECT_THAT(findings(), ElementsAre(files_.settings() +
+                                      " is larger than 1048576 bytes, every default applies"));
+}
+
 TEST_F(CheckTest, FindsSettingsThatOthersMayWrite) {
   writeSettings("{}");
   chmod(files_.settings().c_str(), 0666);

@@ -11,7 +11,6 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdarg>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
@@ -61,10 +60,6 @@ Function* next(const char* name, Function*) {
 extern "C" int sqlite3_open(const char* path, sqlite3** db) {
   return sqlite3_open_v2(redirected(path).c_str(), db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE,
                          nullptr);
-}
-
-extern "C" FILE* fopen64(const char* path, const char* mode) {
-  return next("fopen64", fopen64)(redirected(path).c_str(), mode);
 }
 
 extern "C" int open64(const char* path, int flags, ...) {

@@ -15,6 +15,7 @@ struct Plan {
   int failAfter = -1, code = SQLITE_OK;
   int fullAfter = -1;
   int killAfter = -1;
+  int journalRoom = -1;
   bool came = false;
 };
 Plan plan;
@@ -40,6 +41,7 @@ sqlite3_vfs* disk() {
 // SQLite's object of an open file, with the real one's right behind it.
 struct alignas(std::max_align_t) File {
   sqlite3_file base;
+  bool isJournal;
 };
 sqlite3_file* real(sqlite3_file* file) {
   return reinterpret_cast<sqlite3_file*>(reinterpret_cast<File*>(file) + 1);
@@ -60,7 +62,9 @@ int writeFile(sqlite3_file* file, const void* data, int size, sqlite3_int64 offs
   }
   const int code = answer(Call::kWrite);
   if (code != SQLITE_OK) return code;
-  if (plan.fullAfter == 0) {
+  const bool isJournal = reinterpret_cast<File*>(file)->isJournal;
+  const bool fits = plan.journalRoom < 0 || offset + size <= plan.journalRoom;
+  if (plan.fullAfter == 0 || (isJournal && !fits)) {
     plan.came = true;
     return SQLITE_FULL;
   }
@@ -110,6 +114,7 @@ const sqlite3_io_methods ioMethods = {
 
 int openFile(sqlite3_vfs* /*vfs*/, const char* path, sqlite3_file* file, int flags, int* flagsOut) {
   file->pMethods = nullptr;
+  reinterpret_cast<File*>(file)->isJournal = (flags & SQLITE_OPEN_MAIN_JOURNAL) != 0;
   int code = answer(Call::kOpen);
   if (code == SQLITE_OK) code = disk()->xOpen(disk(), path, real(file), flags, flagsOut);
   if (code == SQLITE_OK) file->pMethods = &ioMethods;
@@ -151,6 +156,10 @@ void FaultyDisk::fail(Call call, int nth, int code) {
 void FaultyDisk::fillAfter(int writes) {
   plan = Plan();
   plan.fullAfter = writes;
+}
+void FaultyDisk::limitJournal(int bytes) {
+  plan = Plan();
+  plan.journalRoom = bytes;
 }
 void FaultyDisk::killAt(int nth) {
   plan = Plan();

@@ -3,11 +3,12 @@
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sqlite3.h>
+#include <sys/random.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdarg>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
@@ -26,7 +27,10 @@ struct State {
   bool temporary = true;
   bool readOnly = false, waitForLocks = false;
   int openCode = SQLITE_OK, closeCode = SQLITE_OK;
-  bool failFormatting = false, failEntropy = false;
+  bool failFormatting = false;
+  int lookError = 0;
+  int randomError = 0;
+  bool trickle = false, interrupt = false, randomDevice = true;
   std::vector<std::string> calls;
 };
 State state;
@@ -92,10 +96,13 @@ std::string RedirectedFiles::settings() const { return redirected(kSettings); }
 std::string RedirectedFiles::debugMarker() const { return redirected(kDebugMarker); }
 void RedirectedFiles::removeDirectory() { std::filesystem::remove_all(state.directory); }
 void RedirectedFiles::openReadOnly() { state.readOnly = true; }
+void RedirectedFiles::failNextLook(int error) { state.lookError = error; }
 void RedirectedFiles::openWithoutHandle(int code) { state.openCode = code; }
 void RedirectedFiles::waitForLocks() { state.waitForLocks = true; }
 void RedirectedFiles::failClose(int code) { state.closeCode = code; }
-void RedirectedFiles::failEntropy() { state.failEntropy = true; }
+void RedirectedFiles::failRandomCall(int error) { state.randomError = error; }
+void RedirectedFiles::trickleRandomBytes() { state.trickle = true; }
+void RedirectedFiles::removeRandomDevice() { state.randomDevice = false; }
 void RedirectedFiles::failFormatting() { state.failFormatting = true; }
 const std::vector<std::string>& RedirectedFiles::calls() const { return state.calls; }
 
@@ -135,23 +142,51 @@ extern "C" char* sqlite3_mprintf(const char* format, ...) {
   return text;
 }
 
-extern "C" FILE* fopen64(const char* path, const char* mode) {
+extern "C" ssize_t getrandom(void* buffer, size_t size, unsigned flags) {
   const OwnWork seam;
-  return next("fopen64", fopen64)(redirected(path).c_str(), mode);
+  state.interrupt = state.trickle && !state.interrupt;
+  if (state.randomError != 0 || state.interrupt) {
+    errno = state.interrupt ? EINTR : state.randomError;
+    return -1;
+  }
+  return next("getrandom", getrandom)(buffer, state.trickle ? std::min<size_t>(size, 5) : size,
+                                      flags);
 }
 
 extern "C" int open64(const char* path, int flags, ...) {
   const OwnWork seam;
-  if (state.failEntropy && std::strcmp(path, "/dev/urandom") == 0) {
+  if (!state.randomDevice && std::strcmp(path, "/dev/urandom") == 0) {
     errno = EMFILE;
+    return -1;
+  }
+  if (state.readOnly && (flags & O_CREAT) != 0 && std::strcmp(path, kDatabase) == 0) {
+    errno = EACCES;
     return -1;
   }
   va_list arguments;
   va_start(arguments, flags);
   const auto mode = va_arg(arguments, unsigned);  // unused by a call that gives none
   va_end(arguments);
-  return next("open64", open64)(path, flags, mode);
+  return next("open64", open64)(redirected(path).c_str(), flags, mode);
 }
+
+// lstat() by the names that it has in binaries: with 64-bit offsets, and with 64-bit times on a
+// 32-bit machine.
+template <class Function>
+static int look(Function* system, const char* path, void* out) {
+  const OwnWork seam;
+  if (state.lookError == 0) return system(redirected(path).c_str(), out);
+  errno = state.lookError;
+  state.lookError = 0;
+  return -1;
+}
+#define REPLACE_LSTAT(function, symbol)                                 \
+  extern "C" int function(const char* path, void* out) __asm__(symbol); \
+  extern "C" int function(const char* path, void* out) {                \
+    return look(next(symbol, function), path, out);                     \
+  }
+REPLACE_LSTAT(lstat64Seam, "lstat64")
+REPLACE_LSTAT(lstat64Time64Seam, "__lstat64_time64")
 
 extern "C" int access(const char* path, int mode) noexcept {
   const OwnWork seam;

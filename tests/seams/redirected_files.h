@@ -1,7 +1,7 @@
-// The fixed paths of the library, redirected to a fresh directory. Linking this seam replaces
-// sqlite3_open(), fopen64() and access() for those paths, and open64() for the device of entropy,
-// in the whole program; a program that makes no object of this class gets a directory of its own at
-// first use.
+// The fixed paths of the library, redirected to a fresh directory, and the system's random bytes.
+// Linking this seam replaces sqlite3_open(), open(), lstat() and access() for those paths, and
+// getrandom(), in the whole program; a program that makes no object of this class gets a directory
+// of its own at first use.
 
 #pragma once
 
@@ -25,16 +25,22 @@ class RedirectedFiles {
 
   // Makes opening the database fail as in a missing directory.
   void removeDirectory();
-  // Opens the database for reading only.
+  // Opens the database for reading only, and does not make it.
   void openReadOnly();
+  // The next lstat() fails with this errno.
+  void failNextLook(int error);
   // sqlite3_open() answers this code and hands out no handle, as it does without memory.
   void openWithoutHandle(int code);
   // Locks of other processes are waited for, as long as the library asks.
   void waitForLocks();
   // sqlite3_close() closes, and answers this code.
   void failClose(int code);
-  // The device of the operating system's entropy cannot be opened.
-  void failEntropy();
+  // getrandom() fails with this errno: ENOSYS is a kernel without the call.
+  void failRandomCall(int error);
+  // getrandom() is interrupted every other time, and delivers 5 bytes at most.
+  void trickleRandomBytes();
+  // The device of random bytes cannot be opened.
+  void removeRandomDevice();
   // sqlite3_mprintf() finds no memory.
   void failFormatting();
 

@@ -109,6 +109,16 @@ constexpr CipherColumn kCipherColumns[] = {{"oauth_clientInfo", "client_id"},
                                            {"oauth_grantCode", "client_id"},
                                            {"oauth_token", "client_id"}};
 
+// The library delivers a value that it cannot decrypt as it is stored.
+bool decrypts(const char* column, std::string stored) {
+  Json::Value rows(Json::arrayValue);
+  char* value = stored.data();
+  std::string name = column;
+  char* columnName = name.data();
+  ZEVOOAUTHSERVER::OAUTHDBBasic::TabGetCallback(&rows, 1, &value, &columnName);
+  return rows.size() == 1 && rows[0U][column].asString() != stored;
+}
+
 // A table that is missing or different has been found already.
 bool hasColumn(SqliteConnection& database, const std::string& table, const std::string& column) {
   return !database
@@ -144,9 +154,7 @@ Findings checkCiphers(SqliteConnection& database, CipherCount& count) {
     Progress progress(std::string("decrypting ") + table + "." + column, rows.size());
     std::vector<std::string> unreadable;
     for (std::size_t i = 0; i < rows.size(); ++i) {
-      Json::Value document;
-      document[column] = rows[i][1];
-      if (!ZEVOOAUTHSERVER::OAUTHDBBasic::ParamDecrypt(document)) unreadable.push_back(rows[i][0]);
+      if (!decrypts(column, rows[i][1])) unreadable.push_back(rows[i][0]);
       progress.update(i + 1);
     }
     count.values += static_cast<int>(rows.size());

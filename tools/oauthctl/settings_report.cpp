@@ -1,20 +1,19 @@
 #include "settings_report.h"
 
-#include <json/reader.h>
 #include <json/value.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
-#include <exception>
-#include <memory>
 
 #include "fixed_paths.h"
 #include "oauth_utils.h"
+#include "settings_file.h"
 
 namespace oauthctl {
 namespace {
+
+using ZEVOOAUTHSERVER::SettingsState;
 
 constexpr int kLargestCeiling = 10000;
 
@@ -35,31 +34,25 @@ constexpr Known kKnown[] = {
     {"log_level", Range::kAny, [](const std::string&) { return getLogLevel(); }},
 };
 
-// The file's text; false with errno set if it cannot be read.
-bool load(std::string& text) {
-  struct Close {
-    void operator()(std::FILE* file) const { std::fclose(file); }
-  };
-  const std::unique_ptr<std::FILE, Close> file(std::fopen(fixed_paths::settings().c_str(), "re"));
-  if (!file) return false;
-  char block[4096];
-  while (const std::size_t count = std::fread(block, 1, sizeof block, file.get()))
-    text.append(block, count);
-  return std::ferror(file.get()) == 0;
-}
-
-// Null, and the problem named, if there is no object to be had.
-Json::Value parsed(const std::string& text, std::string& problem) try {
-  Json::Value document;
-  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-  std::string errors;
-  if (!reader->parse(text.data(), text.data() + text.size(), &document, &errors))
-    problem = "is not JSON, every default applies";
-  else if (!document.isObject())
-    problem = "is not a JSON object, every default applies";
-  return problem.empty() ? document : Json::Value();
-} catch (const std::exception&) {
-  problem = "is not JSON, every default applies";
+// What is wrong with the file as a whole, "" if nothing is.
+std::string problemOf(SettingsState state) {
+  switch (state) {
+    case SettingsState::kRead:
+    case SettingsState::kAbsent:
+      return {};
+    case SettingsState::kUnreadable:
+      return std::string("cannot be read (") + std::strerror(errno) +
+             "), what follows are defaults";
+    case SettingsState::kNotAFile:
+      return "is not a regular file, every default applies";
+    case SettingsState::kTooLarge:
+      return "is larger than " + std::to_string(ZEVOOAUTHSERVER::kLargestSettings) +
+             " bytes, every default applies";
+    case SettingsState::kNotJson:
+      return "is not JSON, every default applies";
+    case SettingsState::kNotAnObject:
+      return "is not a JSON object, every default applies";
+  }
   return {};
 }
 
@@ -77,13 +70,10 @@ std::string origin(const Known& known, const Json::Value& file) {
 
 SettingsReport readSettings() {
   SettingsReport report;
-  std::string text;
   Json::Value file;
-  if (load(text))
-    file = parsed(text, report.problem);
-  else if (errno != ENOENT)
-    report.problem =
-        std::string("cannot be read (") + std::strerror(errno) + "), what follows are defaults";
+  const SettingsState state = ZEVOOAUTHSERVER::readSettingsFile(fixed_paths::settings(), file);
+  report.problem = problemOf(state);
+  if (state != SettingsState::kRead) file = Json::Value();
   for (const Known& known : kKnown) {
     const std::string from = origin(known, file);
     report.settings.push_back(
