@@ -88,6 +88,21 @@ TEST_F(BackupTest, SaysWhenItCannotWrite) {
             complaint(run({"backup", "/nonexistent/copy.db"})));
 }
 
+// Its memory, and the restore, would not take such a copy.
+TEST_F(BackupTest, RefusesADatabaseThatIsTooLarge) {
+  addClient('c');
+  std::fstream file(files_.database(), std::ios::in | std::ios::out | std::ios::binary);
+  file.seekp(28);  // the number of pages: one more than 512 MiB hold
+  file.write("\x00\x02\x00\x01", 4);
+  file.close();
+  ASSERT_EQ(0, truncate(files_.database().c_str(), 131073LL * 4096));
+  EXPECT_EQ(
+      "3 cannot read the database (it is too large for a database of the server), no backup "
+      "was made: see 'oauthctl check'",
+      complaint(run({"backup", copy_})));
+  EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
+}
+
 TEST_F(BackupTest, RefusesToCopyDamage) {
   addClient('c');
   execute("DROP TABLE oauth_log");
@@ -202,11 +217,12 @@ TEST_F(IssuingTest, RestoresLoseNothing) {
 }
 
 // Ctrl-C when the file is written and has no name yet.
-class InterruptedTest : public BackupTest, public testing::WithParamInterface<bool> {
+// The parameter is what the machine lacks.
+class InterruptedTest : public BackupTest, public testing::WithParamInterface<Lines> {
  protected:
   InterruptedTest() {
     addClient('c');
-    if (GetParam()) environment_ = {"OAUTHCTL_NO_TMPFILE=1"};
+    environment_ = GetParam();
   }
 };
 
@@ -229,7 +245,9 @@ TEST_P(InterruptedTest, IsWholeWithoutThat) {
               ElementsAre("copy.db", "oauth.db", "oauth.db.before-restore-20231114-221320"));
 }
 
-INSTANTIATE_TEST_SUITE_P(WithATemporaryName, InterruptedTest, testing::Bool());
+INSTANTIATE_TEST_SUITE_P(Machines, InterruptedTest,
+                         testing::Values(Lines{}, Lines{"OAUTHCTL_NO_TMPFILE=1"},
+                                         Lines{"OAUTHCTL_NO_TMPFILE=1", "OAUTHCTL_NO_PROC=1"}));
 
 // Ctrl-C while it waits for the database.
 TEST_F(BackupTest, LeavesNothingWhenItIsInterruptedWhileItWaits) {

@@ -93,6 +93,15 @@ extern "C" int openat64(int folder, const char* path, int flags, ...) {
   return next("openat64", openat64)(folder, path, flags, mode);
 }
 
+// With OAUTHCTL_NO_PROC, as where /proc is not mounted.
+extern "C" int linkat(int from, const char* path, int to, const char* name, int flags) noexcept {
+  if (std::getenv("OAUTHCTL_NO_PROC") != nullptr && std::strncmp(path, "/proc/", 6) == 0) {
+    errno = ENOENT;
+    return -1;
+  }
+  return next("linkat", linkat)(from, path, to, name, flags);
+}
+
 // Between the writing of a file and its naming: waits for a file with the name OAUTHCTL_HOLD, and
 // interrupts the program if OAUTHCTL_INTERRUPT is set.
 extern "C" int fsync(int descriptor) {

@@ -234,6 +234,18 @@ TEST_F(HostileFolderTest, KeepsWhatBelongsToItsOwner) {
     EXPECT_EQ("65534:65534 0600", ownerOf(path(name))) << name;
 }
 
+// A user without a name has the group of the folder.
+TEST_F(HostileFolderTest, KeepsWhatBelongsToAUserWithoutAName) {
+  fillDatabase();
+  for (const std::string& file : {files_.directory(), files_.database()})
+    if (chown(file.c_str(), 123456, 123457) != 0) GTEST_SKIP() << "there is no such user here";
+  const std::string copy = rootsFolder_ + "/copy.db";
+  ASSERT_EQ(0, run({"backup", copy}).code);
+  EXPECT_EQ(0, run({"restore", copy, "--yes"}).code);
+  for (const std::string& name : fileNames())
+    EXPECT_EQ("123456:123457 0600", ownerOf(path(name))) << name;
+}
+
 // A backup is the operator's, wherever it lies.
 TEST_F(HostileFolderTest, HoldsABackupThatItsOwnerCannotRead) {
   fillDatabase();
@@ -306,6 +318,14 @@ TEST_F(SwappedNameTest, PutsNothingIntoABackup) {
   EXPECT_EQ(0, outcome.code) << outcome.err;
   EXPECT_EQ("0:0 0600", ownerOf(path("copy.db")));
   EXPECT_EQ(rowsIn(files_.database()), rowsIn(path("copy.db")));
+  expectNothingGivenAway();
+}
+
+// Where a file can be named by its temporary name only, what got the name is looked at.
+TEST_F(SwappedNameTest, IsFoundOutWithoutProc) {
+  environment_.emplace_back("OAUTHCTL_NO_PROC=1");
+  EXPECT_EQ("1 somebody put another file in the place of " + path("copy.db"),
+            complaint(runWhileSwapping({"backup", path("copy.db")}, "copy.db.")));
   expectNothingGivenAway();
 }
 

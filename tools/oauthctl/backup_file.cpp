@@ -5,14 +5,12 @@
 #include <cerrno>
 #include <cstring>
 
+#include "database_image.h"
 #include "descriptor.h"
 #include "exit_code.h"
 
 namespace oauthctl {
 namespace {
-
-// Four tables at their ceiling of 10000 rows, with the longest values, take less.
-constexpr off_t kLargest = 512L * 1024 * 1024;
 
 [[noreturn]] void cannotRead(const std::string& path) {
   throw Failure(ExitCode::kAttention, "cannot read " + path + ": " + std::strerror(errno));
@@ -57,7 +55,7 @@ BackupFile readBackupFile(const std::string& path) {
   BackupFile backup;
   if (!file.isOpen() || fstat(file.value(), &backup.status) != 0) cannotRead(path);
   if (!S_ISREG(backup.status.st_mode)) refuseBackup(path, "it is not a file");
-  if (backup.status.st_size > kLargest) refuseBackup(path, "it is too large for a backup");
+  if (backup.status.st_size > kLargestDatabase) refuseBackup(path, "it is too large for a backup");
   requireNoJournal(path);
   backup.bytes = readWhole(file, static_cast<std::size_t>(backup.status.st_size), path);
   return backup;

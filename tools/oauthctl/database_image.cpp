@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "human_time.h"
 #include "terminal.h"
 
 namespace oauthctl {
@@ -14,6 +15,13 @@ void chooseRollbackJournal(std::string& bytes) {
   constexpr char kRollback = 1, kWriteAhead = 2;
   for (const std::size_t at : {kWriteVersion, kReadVersion})
     if (at < bytes.size() && bytes[at] == kWriteAhead) bytes[at] = kRollback;
+}
+
+void requireFittingSize(SqliteConnection& source) {
+  const std::string bytes =
+      source.value("SELECT page_count * page_size FROM pragma_page_count, pragma_page_size");
+  if (number(bytes).value_or(0) > kLargestDatabase)
+    throw SqliteError(SQLITE_TOOBIG, "it is too large for a database of the server");
 }
 
 }  // namespace
@@ -52,6 +60,7 @@ DatabaseImage DatabaseImage::ofFile(const std::string& path) {
   DatabaseImage image;
   SqliteConnection source(path, SQLITE_OPEN_READONLY);
   source.run("BEGIN; SELECT 1 FROM sqlite_master;");
+  requireFittingSize(source);
   DatabaseCopy(source, image.memory_).finish();
   return image;
 }

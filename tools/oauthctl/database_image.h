@@ -10,6 +10,9 @@
 
 namespace oauthctl {
 
+// In bytes. Four tables at their ceiling of 10000 rows, with the longest values, take less.
+constexpr long long kLargestDatabase = 512LL * 1024 * 1024;
+
 class DatabaseImage {
  public:
   // Reads the file at one moment, other programs may go on writing. Throws a SqliteError.

@@ -141,10 +141,13 @@ bool NewFile::name() const {
                 AT_SYMLINK_FOLLOW) == 0;
 }
 
-// For a file system where no file has two names. What was named is looked at afterwards.
+// For a file system where no file has two names, and where there is no /proc. What was named is
+// looked at afterwards.
 bool NewFile::nameTemporary() {
-  if (temporary_.empty() || renameat2(folder_.value(), temporary_.c_str(), folder_.value(),
-                                      name_.c_str(), RENAME_NOREPLACE) != 0)
+  const int folder = folder_.value();
+  const char *const from = temporary_.c_str(), *const to = name_.c_str();
+  if (temporary_.empty() || (renameat2(folder, from, folder, to, RENAME_NOREPLACE) != 0 &&
+                             linkat(folder, from, folder, to, 0) != 0))
     return false;
   struct stat named, made;
   if (fstatat(folder_.value(), name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) == 0 &&
