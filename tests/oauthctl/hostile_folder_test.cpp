@@ -20,10 +20,8 @@
 
 #include "oauthctl_test.h"
 
-using testing::Contains;
 using testing::ElementsAre;
 using testing::HasSubstr;
-using testing::IsEmpty;
 using testing::Not;
 using testing::StartsWith;
 
@@ -433,12 +431,12 @@ TEST_F(HostileFolderTest, DatabaseOfRootIsNotReadForItsOwner) {
   ASSERT_EQ(0, chown(files_.database().c_str(), 0, 0));
   for (const Words& words : kEveryCommand)
     EXPECT_EQ("3 user 65534, who owns the folder, may not read " + files_.database() +
-                  ": run 'chown 65534 " + files_.database() + "', it belongs to user 0",
+                  ": run 'chown -h 65534 " + files_.database() + "', it belongs to user 0",
               complaint(run(words)));
   chmod(files_.database().c_str(), 0644);
   EXPECT_EQ(0, run({"token", "list"}).code);
   EXPECT_EQ("3 user 65534, who owns the folder, may not write " + files_.database() +
-                ": run 'chown 65534 " + files_.database() + "', it belongs to user 0",
+                ": run 'chown -h 65534 " + files_.database() + "', it belongs to user 0",
             complaint(run({"token", "purge", "--yes"})));
 }
 

@@ -93,19 +93,22 @@ class HostileIdsTest : public HostileValuesTest {
     execute("UPDATE oauth_token SET access_token = '" + times(64, 'a') + "', expired_time = '" +
             std::to_string(kNow + 600) + "'");
     for (const char* const table :
-         {"oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"}) {
-      const std::string name = table;
-      execute("CREATE TABLE copy AS SELECT * FROM " + name + "; DROP TABLE " + name +
-              "; ALTER TABLE copy RENAME TO " + name);
-      plant(name, "id", kHostile);
-    }
+         {"oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log", "oauth_meta"})
+      forgetTypes(table);
+    for (const char* const table :
+         {"oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"})
+      plant(table, "id", kHostile);
     plant("oauth_log", "timestamp", kHostile);
     plant("oauth_clientInfo", "enable", kHostile);
-    execute(
-        "CREATE TABLE meta(tab_name, version); INSERT INTO meta SELECT * FROM oauth_meta;"
-        "DROP TABLE oauth_meta; ALTER TABLE meta RENAME TO oauth_meta");
     plant("oauth_meta", "tab_name", kHostile);
     plant("oauth_meta", "version", kHostile);
+  }
+
+  // The same rows in a table without types and keys.
+  void forgetTypes(const std::string& table) const {
+    std::string sql = "CREATE TABLE copy AS SELECT * FROM ";
+    sql.append(table).append("; DROP TABLE ").append(table);
+    execute(sql.append("; ALTER TABLE copy RENAME TO ").append(table));
   }
 
   // Nothing in the text, line ends aside, but what a terminal prints.

@@ -37,11 +37,11 @@ void requireFile(const struct stat& status, int mode, const char* what) {
   const std::string path = fixed_paths::database();
   const DatabaseFolder& folder = DatabaseFolder::enter();
   if (folder.may(nameOf(path), mode)) return;
-  const std::string remedy = status.st_nlink > 1 ? "it has other names too, find out who made it"
-                             : status.st_uid == folder.owner()
-                                 ? "run 'chmod u+rw " + path + "'"
-                                 : "run 'chown " + std::to_string(folder.owner()) + " " + path +
-                                       "', it belongs to user " + std::to_string(status.st_uid);
+  // Nothing that would give away a file behind a link, or behind another name.
+  std::string remedy = "run 'chown -h " + std::to_string(folder.owner()) + " " + path +
+                       "', it belongs to user " + std::to_string(status.st_uid);
+  if (status.st_uid == folder.owner()) remedy = "run 'chmod u+rw " + path + "'";
+  if (status.st_nlink > 1) remedy = "it has other names too, find out who made it";
   mayNot(std::string(what) + " " + path, remedy);
 }
 

@@ -24,9 +24,9 @@ namespace {
 int folder() { return DatabaseFolder::enter().descriptor(); }
 std::string liveName() { return nameOf(fixed_paths::database()); }
 
-Descriptor openLive(int flags) {
+Descriptor openLive() {
   return Descriptor(
-      openat(folder(), liveName().c_str(), flags | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+      openat(folder(), liveName().c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
 }
 
 [[noreturn]] void cannotKeep(const std::string& path) {
@@ -70,7 +70,7 @@ bool moveTo(const std::string& kept, const std::string& suffix) {
 
 // A file that no SQLite can open any more, and its journal, which must not reach the new one.
 std::string moveAside() {
-  const Descriptor ruined = openLive(O_RDONLY);
+  const Descriptor ruined = openLive();
   std::string kept = freeName();
   if (!ruined.isOpen()) cannotKeep(kept);
   fchmod(ruined.value(), S_IRUSR | S_IWUSR);
@@ -98,13 +98,13 @@ std::string keep(const Descriptor& bytes) {
 // descriptor was opened before the connection and is closed after it: closing any descriptor of a
 // file gives up all locks that the process has on it.
 std::string replaceContents(DatabaseImage& image) {
-  const Descriptor bytes = openLive(O_RDONLY);
+  const Descriptor bytes = openLive();
   SqliteConnection live(fixed_paths::database(), SQLITE_OPEN_READWRITE);
   DatabaseCopy copy(image.connection(), live);
   copy.lockTarget();
   struct stat status;
   if (!bytes.isOpen() || fstat(bytes.value(), &status) != 0) cannotKeep(fixed_paths::database());
-  const std::string kept = status.st_size == 0 ? "" : keep(bytes);
+  std::string kept = status.st_size == 0 ? "" : keep(bytes);
   try {
     copy.finish();
   } catch (const SqliteError&) {
