@@ -11,6 +11,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <csignal>
@@ -338,6 +339,56 @@ TEST_F(SwappedNameTest, PutsNothingIntoWhatARestoreKeeps) {
   EXPECT_EQ(0, outcome.code) << outcome.err;
   EXPECT_EQ("65534:65534 0600", ownerOf(path(kKept)));
   EXPECT_EQ(before, rowsIn(path(kKept)));
+  expectNothingGivenAway();
+}
+
+// The owner puts a link to a database of root's in the place of the database and takes it away
+// again, all the time.
+class SwappedDatabaseTest : public HostileFolderTest {
+ protected:
+  void SetUp() override {
+    HostileFolderTest::SetUp();
+    if (IsSkipped()) return;
+    fillDatabase();
+    fs::copy(files_.database(), secret());
+    ASSERT_EQ(0, chmod(secret().c_str(), 0600));
+    ASSERT_EQ(SQLITE_OK, sqlite3_open(secret().c_str(), &db_));
+    const std::string sql = "UPDATE oauth_token SET username = '" + kPrecious + "'";
+    ASSERT_EQ(SQLITE_OK, sqlite3_exec(db_, sql.c_str(), nullptr, nullptr, nullptr));
+    sqlite3_close(db_);
+  }
+  std::string secret() const { return rootsFolder_ + "/secret.db"; }
+  void swap() const {
+    const std::string database = files_.database(), real = path("real.db");
+    rename(database.c_str(), real.c_str());
+    symlink(secret().c_str(), database.c_str());
+    unlink(database.c_str());
+    rename(real.c_str(), database.c_str());
+  }
+
+  sqlite3* db_ = nullptr;
+};
+
+TEST_F(SwappedDatabaseTest, NeverGivesADatabaseOfRootAway) {
+  const std::string before = bytesOf(secret()), copy = rootsFolder_ + "/copy.db";
+  ASSERT_EQ(0, run({"backup", copy}).code);
+  std::atomic<bool> done{false};
+  std::thread owner([&] {
+    while (!done) swap();
+  });
+  for (int round = 0; round < 10; ++round)
+    for (const Words& words :
+         {Words{"restore", copy, "--yes"},
+          {"status"},
+          {"check"},
+          {"token", "purge", "--grace", "0", "--yes"},
+          {"backup", rootsFolder_ + "/copy-" + std::to_string(round)},
+          {"client", "add", "--name", "n", "--redirect-uri", "a.example", "--scope", "r"}})
+      EXPECT_GT(4, run(words).code);
+  done = true;
+  owner.join();
+  EXPECT_EQ(before, bytesOf(secret()));
+  EXPECT_EQ("0:0 0600", ownerOf(secret()));
   expectNothingGivenAway();
 }
 
