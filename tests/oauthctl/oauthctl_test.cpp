@@ -56,7 +56,7 @@ struct Pipe {
   int ends[2];
 };
 
-// A program that becomes the owner of its folder cannot be traced, by the leak checker neither.
+// The leak checker traces its program, and cannot where the program takes the ids of another user.
 void skipLeakCheck(const std::string& folder) {
   struct stat status = {};
   if (getuid() != 0 || stat(folder.c_str(), &status) != 0 || status.st_uid == 0) return;

@@ -1,6 +1,6 @@
-// The folder of the database. It belongs to the server's user, who can put any file there under any
-// name: journals that name other files, links, pipes. So root works in it with that user's ids, in
-// whose hands they do no more than he could do himself, and by a descriptor of the folder.
+// The folder of the database. It belongs to the server's user, who can put any file there: a
+// journal that names other files for deletion, a link, a pipe. Root would follow them. So root
+// works in the folder with that user's ids, and can do no more there than that user can.
 
 #pragma once
 
@@ -13,9 +13,9 @@ namespace oauthctl {
 
 class DatabaseFolder {
  public:
-  // Opens the folder and, if root runs this program, becomes its owner for the rest of the
-  // program. The first call comes before anything in the folder is touched, and after the
-  // operator's own files are opened. Throws what stands in the way.
+  // Opens the folder. If root runs this program, it becomes the folder's owner until the program
+  // ends. Make the first call after the operator's own files are open, and before anything in the
+  // folder is touched. Throws what stands in the way.
   static const DatabaseFolder& enter();
 
   int descriptor() const { return descriptor_; }

@@ -1,4 +1,4 @@
-// An open file, closed by its owner.
+// An open file, closed with the object.
 
 #pragma once
 

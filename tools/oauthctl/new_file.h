@@ -1,7 +1,7 @@
 // A file that appears under its name only when it is whole, and never in another one's place.
 //
 // It is written and read through the descriptor that made it, and named relative to a folder that
-// stays open: whoever else writes to that folder can neither read it nor put another file in.
+// stays open. So nobody who can write to that folder can put another file in its place.
 
 #pragma once
 
@@ -20,8 +20,7 @@ class NewFile {
   explicit NewFile(const std::string& path);
   // The same in a folder that is open already; the path is for messages, its last part the name.
   NewFile(int folder, const std::string& path);
-  // Removes it, unless it was published. Nothing is left behind either where a signal ends the
-  // program.
+  // Removes it, unless it was published. A signal that ends the program leaves nothing either.
   ~NewFile();
   NewFile(const NewFile&) = delete;
   NewFile& operator=(const NewFile&) = delete;
