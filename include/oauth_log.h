@@ -17,8 +17,8 @@ class OAUTHDBLog : public OAUTHDBBasic {
   /// Opens the database; tabName is "oauth_log".
   explicit OAUTHDBLog(const std::string& tabName);
 
-  /// Writes a message of any length, up to its first NUL byte, then trims the table to the setting "log_max". The result is
-  /// that of the insert; a trim that failed leaves its error all the same.
+  /// Writes a message of any length, up to its first NUL byte, then trims the table to the setting
+  /// "log_max". The result is that of the insert; a trim that failed leaves its error all the same.
   ///
   /// The trim goes by time and not by row: every message that shares the second of the first one
   /// beyond the ceiling goes with it, so that fewer rows than the ceiling may be left.

@@ -326,7 +326,7 @@ TEST_F(GrantCodeAddTest, AcceptsAddressesOfBothFamilies) {
   OAUTHDBGrantCode codes("oauth_grantCode");
   for (const std::string ip :
        {"192.168.1.20", "0.0.0.0", "255.255.255.255", "::", "::1", "2001:DB8::7",
-        "::ffff:192.0.2.7", "fe80::1%1", "fe80::1%lo", "2001:db8::7%4294967295"}) {
+        "::ffff:192.0.2.7", "fe80::1%1", "fe80::1%lo", "2001:db8::7%4294967295", "::1%\x1b[2J"}) {
     SCOPED_TRACE(ip);
     emptyTable();
     EXPECT_EQ(1, add(codes, grantWith(&Grant::ip, ip)));

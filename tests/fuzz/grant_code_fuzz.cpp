@@ -69,6 +69,8 @@ class GrantCodeFuzz {
     if (!ip.empty() && !isAddress(ip)) return 0;
     if (!grant.good() || !fits(code, 64, 64) || !fits(expiry, 1, 128)) return 0;
     result["code"] = code;
+    if (const std::string refusal = refusalOf({expiry, ip}); !refusal.empty())
+      return world_.fail(1, refusal);
     for (const auto& [id, row] : rows)
       if (row.at("code") == doubled(code))
         return world_.fail(19, "UNIQUE constraint failed: oauth_grantCode.code");
@@ -76,9 +78,9 @@ class GrantCodeFuzz {
                         {"client_id", FakeHost::sealed(doubled(grant.client))},
                         {"scope", doubled(grant.scope)},
                         {"code", doubled(code)},
-                        {"expired_time", untilNul(expiry)},
+                        {"expired_time", expiry},
                         {"state", doubled(grant.state)},
-                        {"ip", untilNul(ip)}});
+                        {"ip", ip}});
     return 1;
   }
 
@@ -113,12 +115,16 @@ class GrantCodeFuzz {
     const std::int64_t id = world_.anyId(kTable);
     const Grant grant(input_);
     const int success = codes_.Edit(id, grant.user, grant.client, grant.scope, grant.state);
+    if (!grant.good()) return world_.expect(codes_, success, 0);
+    if (const std::string refusal = refusalOf({grant.scope, grant.state, grant.user});
+        !refusal.empty())
+      return world_.expect(codes_, success, world_.fail(1, refusal));
     const auto row = world_.rows(kTable).find(id);
-    if (!grant.good() || row == world_.rows(kTable).end()) return world_.expect(codes_, success, 0);
-    row->second["username"] = untilNul(grant.user);
+    if (row == world_.rows(kTable).end()) return world_.expect(codes_, success, 0);
+    row->second["username"] = grant.user;
     row->second["client_id"] = FakeHost::sealed(untilNul(grant.client));
-    row->second["scope"] = untilNul(grant.scope);
-    row->second["state"] = untilNul(grant.state);
+    row->second["scope"] = grant.scope;
+    row->second["state"] = grant.state;
     world_.expect(codes_, success, 1);
   }
   void editLong() {
@@ -126,14 +132,16 @@ class GrantCodeFuzz {
     const Grant grant(input_);
     const std::string expiry = expiryOf(input_);
     const int success = codes_.Edit(id, grant.user, grant.client, grant.scope, expiry, grant.state);
+    if (!grant.good() || !fits(expiry, 1, 128)) return world_.expect(codes_, success, 0);
+    if (const std::string refusal = refusalOf({expiry}); !refusal.empty())
+      return world_.expect(codes_, success, world_.fail(1, refusal));
     const auto row = world_.rows(kTable).find(id);
-    if (!grant.good() || !fits(expiry, 1, 128) || row == world_.rows(kTable).end())
-      return world_.expect(codes_, success, 0);
+    if (row == world_.rows(kTable).end()) return world_.expect(codes_, success, 0);
     row->second["username"] = doubled(grant.user);
     row->second["client_id"] = FakeHost::sealed(doubled(grant.client));
     row->second["scope"] = doubled(grant.scope);
     row->second["state"] = doubled(grant.state);
-    row->second["expired_time"] = untilNul(expiry);
+    row->second["expired_time"] = expiry;
     world_.expect(codes_, success, 1);
   }
 
@@ -165,10 +173,14 @@ class GrantCodeFuzz {
       require(index == 0, "a bad code has no row id");
       return world_.expect(codes_, success, world_.fail(-2, "Bad parameters"));
     }
+    if (const std::string refusal = refusalOf({code}); !refusal.empty()) {
+      require(index == 0, "a refused code has no row id");
+      return world_.expect(codes_, success, world_.fail(1, refusal));
+    }
     world_.expect(codes_, success, 1);
     std::int64_t found = 0;
     world_.expectRows(kTable, rows, [&](const Row& row) {
-      if (row.at("code") != untilNul(code)) return false;
+      if (row.at("code") != code) return false;
       found = number(row.at("id"));
       return true;
     });

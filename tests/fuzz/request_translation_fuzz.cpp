@@ -12,8 +12,8 @@
 
 #include "fuzz_input.h"
 #include "oauth_db_basic.h"
+#include "redirected_files.h"
 #include "require.h"
-#include "rules.h"
 
 using ZEVOOAUTHSERVER::OAUTHDBBasic;
 
@@ -73,8 +73,15 @@ Json::Value anyDocument(FuzzedDataProvider& input, bool& ofColumns) {
 
 // --- The rules ---
 
+// The value between single quotes, those inside doubled and every other byte as it is.
+std::string literal(const Json::Value& value) {
+  std::string result = "'";
+  for (const char c : value.asString()) result.append(c == '\'' ? 2 : 1, c);
+  return result + "'";
+}
+
 std::string pair(const std::string& name, const Json::Value& value) {
-  return name + "='" + doubled(value.asString()) + "'";
+  return name + "=" + literal(value);
 }
 
 std::string pairs(const Json::Value& values, const std::string& separator) {
@@ -103,7 +110,7 @@ std::string insertion(const Json::Value& record) {
     if (value.isNull())
       values += name == "timestamp" ? "strftime('%s','now')" : "NULL";
     else
-      values += "'" + doubled(value.asString()) + "'";
+      values += literal(value);
   };
   if (record.isObject())
     for (const std::string& name : record.getMemberNames()) add(name, record[name]);
@@ -149,6 +156,13 @@ class Scratch {
     step(sql, [](sqlite3_stmt*) {});
     return sqlite3_changes(db_);
   }
+  // Whether SQLite takes the text for no statement at all.
+  bool refuses(const std::string& sql) {
+    sqlite3_stmt* statement = nullptr;
+    const int code = sqlite3_prepare_v2(db_, sql.c_str(), -1, &statement, nullptr);
+    sqlite3_finalize(statement);
+    return code == SQLITE_ERROR;
+  }
   int count(const std::string& condition) {
     int rows = 0;
     step("SELECT 1 FROM t" + condition, [&rows](sqlite3_stmt*) { ++rows; });
@@ -174,7 +188,7 @@ class Scratch {
     const auto* const bytes = static_cast<const char*>(sqlite3_column_blob(row, column));
     const std::string text(bytes == nullptr ? "" : bytes,
                            static_cast<std::size_t>(sqlite3_column_bytes(row, column)));
-    if (type != SQLITE_TEXT || text != untilNul(value.asString()))
+    if (type != SQLITE_TEXT || text != value.asString())
       finding("SQLite reads " + text + " instead of " + value.asString());
   }
 
@@ -198,26 +212,35 @@ class Scratch {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   FuzzedDataProvider input(data, size);
   bool ofColumns = true;
+  static const RedirectedFiles files;
+  static OAUTHDBBasic store;  // of which only the translation is used
   const Json::Value record = anyDocument(input, ofColumns);
   Json::Value request;
   request["condition"] = record;
   request["modified"] = anyDocument(input, ofColumns);
   const std::string separator = input.ConsumeRandomLengthString(5);
 
-  compared([&] { return store().ConcateParam(record, separator); },
+  compared([&] { return store.ConcateParam(record, separator); },
            [&] { return pairs(record, separator); });
-  const auto inserted = compared([&] { return store().GetInsertParam(record); },
-                                 [&] { return insertion(record); });
-  const auto condition = compared([&] { return store().GetConditionParam(record); },
-                                  [&] { return where(record); });
+  const auto inserted =
+      compared([&] { return store.GetInsertParam(record); }, [&] { return insertion(record); });
+  const auto condition =
+      compared([&] { return store.GetConditionParam(record); }, [&] { return where(record); });
   const auto update = compared(
-      [&] { return store().GetUpdateParam(request); },
+      [&] { return store.GetUpdateParam(request); },
       [&] { return " SET " + pairs(request["modified"], ", ") + where(request["condition"]); });
 
   if (!ofColumns || !inserted || !update || !record.isObject() || record.empty() ||
       !request["modified"].isObject() || request["modified"].empty())
     return 0;
   static Scratch scratch;
+  bool isCut = false;
+  for (const std::string& sql : {"INSERT INTO t" + *inserted, "UPDATE t" + *update}) {
+    if (sql.find('\0') == std::string::npos) continue;
+    require(scratch.refuses(sql), "a NUL byte ends a statement inside its literal");
+    isCut = true;
+  }
+  if (isCut) return 0;
   scratch.run("DELETE FROM t");
   scratch.run("INSERT INTO t" + *inserted);
   scratch.requireValues(record, false);

@@ -12,6 +12,13 @@ std::string doubled(const std::string& value) {
   return result;
 }
 
+std::string refusalOf(const std::vector<std::string>& values) {
+  for (const std::string& value : values)
+    if (value.find('\0') != std::string::npos)
+      return "unrecognized token: \"'" + doubled(value) + "\"";
+  return {};
+}
+
 bool fits(const std::string& text, std::size_t min, std::size_t max) {
   return text.size() >= min && text.size() <= max;
 }

@@ -5,11 +5,15 @@
 #include <cstddef>
 #include <cstdint>
 #include <string>
+#include <vector>
 
-// The value as SQLite takes it, up to its first NUL byte.
+// The value up to its first NUL byte.
 std::string untilNul(const std::string& value);
-// The same with every single quote doubled: what a store keeps of a value.
+// The same with every single quote doubled: what a store keeps of a value that it quotes.
 std::string doubled(const std::string& value);
+// What SQLite says of a statement with these values taken as given, in this order: of the first
+// one with a NUL byte, where the statement ends; "" if there is none.
+std::string refusalOf(const std::vector<std::string>& values);
 // Whether the text is min to max bytes long.
 bool fits(const std::string& text, std::size_t min, std::size_t max);
 // An address of either family, as the C library reads them.

@@ -127,13 +127,16 @@ class TokenFuzz {
     const int success =
         tokens_.Edit(id, grant.user, grant.client, grant.scope, grant.flow, grant.state);
     if (!grant.good()) return world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+    if (const std::string refusal = refusalOf({grant.flow, grant.scope, grant.state, grant.user});
+        !refusal.empty())
+      return world_.expect(tokens_, success, world_.fail(1, refusal));
     const auto row = world_.rows(kTable).find(id);
     if (row == world_.rows(kTable).end()) return world_.expect(tokens_, success, 0);
-    row->second["username"] = untilNul(grant.user);
+    row->second["username"] = grant.user;
     row->second["client_id"] = FakeHost::sealed(untilNul(grant.client));
-    row->second["scope"] = untilNul(grant.scope);
-    row->second["flow_type"] = untilNul(grant.flow);
-    row->second["state"] = untilNul(grant.state);
+    row->second["scope"] = grant.scope;
+    row->second["flow_type"] = grant.flow;
+    row->second["state"] = grant.state;
     world_.expect(tokens_, success, 1);
   }
   void editLong() {
@@ -144,6 +147,8 @@ class TokenFuzz {
         tokens_.Edit(id, grant.user, grant.client, grant.scope, expiry, grant.flow, grant.state);
     if (!grant.good() || !fits(expiry, 1, 128))
       return world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+    if (const std::string refusal = refusalOf({expiry}); !refusal.empty())
+      return world_.expect(tokens_, success, world_.fail(1, refusal));
     const auto row = world_.rows(kTable).find(id);
     if (row == world_.rows(kTable).end()) return world_.expect(tokens_, success, 0);
     row->second["username"] = doubled(grant.user);
@@ -151,7 +156,7 @@ class TokenFuzz {
     row->second["scope"] = doubled(grant.scope);
     row->second["flow_type"] = doubled(grant.flow);
     row->second["state"] = doubled(grant.state);
-    row->second["expired_time"] = untilNul(expiry);
+    row->second["expired_time"] = expiry;
     world_.expect(tokens_, success, 1);
   }
 

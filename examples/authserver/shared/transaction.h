@@ -12,7 +12,7 @@ namespace authserver {
 // new one. Without the lock a program that found a code, and was overtaken by another that spent
 // it, could delete the code of somebody else and take its own for spent by itself.
 //
-// Nothing but this store may write meanwhile, Purge() included, which begins a transaction too.
+// Nothing but this store may write meanwhile. Its Purge() becomes a part of the transaction.
 class Transaction {
  public:
   explicit Transaction(ZEVOOAUTHSERVER::OAUTHDBBasic& store) : store_(store) {
