@@ -88,6 +88,21 @@ TEST_F(BackupTest, SaysWhenItCannotWrite) {
             complaint(run({"backup", "/nonexistent/copy.db"})));
 }
 
+// Its memory, and the restore, would not take such a copy.
+TEST_F(BackupTest, RefusesADatabaseThatIsTooLarge) {
+  addClient('c');
+  std::fstream file(files_.database(), std::ios::in | std::ios::out | std::ios::binary);
+  file.seekp(28);  // the number of pages: one more than 512 MiB hold
+  file.write("\x00\x02\x00\x01", 4);
+  file.close();
+  ASSERT_EQ(0, truncate(files_.database().c_str(), 131073LL * 4096));
+  EXPECT_EQ(
+      "3 cannot read the database (it is too large for a database of the server), no backup "
+      "was made: see 'oauthctl check'",
+      complaint(run({"backup", copy_})));
+  EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
+}
+
 TEST_F(BackupTest, RefusesToCopyDamage) {
   addClient('c');
   execute("DROP TABLE oauth_log");
@@ -201,16 +216,46 @@ TEST_F(IssuingTest, RestoresLoseNothing) {
   expectAll(acknowledged(), found);
 }
 
+// Ctrl-C when the file is written and has no name yet.
+// The parameter is what the machine lacks.
+class InterruptedTest : public BackupTest, public testing::WithParamInterface<Lines> {
+ protected:
+  InterruptedTest() {
+    addClient('c');
+    environment_ = GetParam();
+  }
+};
+
+TEST_P(InterruptedTest, LeavesNothing) {
+  environment_.emplace_back("OAUTHCTL_INTERRUPT=1");
+  const Outcome outcome = run({"backup", copy_});
+  EXPECT_EQ(128 + SIGINT, outcome.code);
+  EXPECT_EQ("", outcome.out);
+  EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
+}
+
+// What the tests above interrupt does come to its end otherwise.
+TEST_P(InterruptedTest, IsWholeWithoutThat) {
+  EXPECT_EQ(0, run({"backup", copy_}).code);
+  EXPECT_EQ(rowsIn(files_.database()), rowsIn(copy_));
+  EXPECT_EQ(0600U, modeOf(copy_));
+  EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+  EXPECT_THAT(fileNames(),
+              ElementsAre("copy.db", "oauth.db", "oauth.db.before-restore-20231114-221320"));
+}
+
+INSTANTIATE_TEST_SUITE_P(Machines, InterruptedTest,
+                         testing::Values(Lines{}, Lines{"OAUTHCTL_NO_TMPFILE=1"},
+                                         Lines{"OAUTHCTL_NO_TMPFILE=1", "OAUTHCTL_NO_PROC=1"}));
+
 // Ctrl-C while it waits for the database.
-TEST_F(BackupTest, LeavesNothingWhenItIsInterrupted) {
+TEST_F(BackupTest, LeavesNothingWhenItIsInterruptedWhileItWaits) {
   addClient('c');
   sqlite3* db = nullptr;
   sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
   sqlite3_exec(db, "BEGIN EXCLUSIVE", nullptr, nullptr, nullptr);
-  beforeTyping_ = [this] {
-    while (fileNames().size() < 2) {
-    }  // Without a pause: the first moment is the dangerous one.
-  };
+  beforeTyping_ = [] { usleep(300'000); };
   const Outcome outcome = runOnTerminal({"backup", copy_}, "\x03");
   sqlite3_close_v2(db);
   EXPECT_EQ(128 + SIGINT, outcome.code);
@@ -341,6 +386,41 @@ TEST_F(RestoreTest, RefusesWhatIsNoFile) {
             complaint(run({"restore", files_.directory(), "--yes"})));
   EXPECT_EQ("2 " + files_.database() + " is the database itself",
             complaint(run({"restore", files_.database(), "--yes"})));
+}
+
+TEST_F(RestoreTest, WaitsForNoPipe) {
+  std::filesystem::remove(copy_);
+  ASSERT_EQ(0, mkfifo(copy_.c_str(), 0600));
+  expectRefused("it is not a file");
+}
+
+TEST_F(RestoreTest, RefusesALink) {
+  std::filesystem::rename(copy_, path("real.db"));
+  ASSERT_EQ(0, symlink("real.db", copy_.c_str()));
+  EXPECT_EQ("1 " + copy_ + " is refused, nothing changed: it is a link, name the file itself",
+            complaint(run({"restore", copy_, "--yes"})));
+}
+
+// No room is asked for it either.
+TEST_F(RestoreTest, RefusesAFileThatIsTooLarge) {
+  ASSERT_EQ(0, truncate(copy_.c_str(), 512L * 1024 * 1024 + 1));
+  expectRefused("it is too large for a backup");
+}
+
+// Half a database: SQLite would take the other half from there.
+TEST_F(RestoreTest, RefusesAFileWithAJournal) {
+  for (const std::string& journal : {copy_ + "-journal", copy_ + "-wal"}) {
+    std::ofstream(journal, std::ios::binary) << "\xd9\xd5\x05\xf9";
+    const std::string before = databaseBytes();
+    EXPECT_EQ("1 " + copy_ +
+                  " is refused, nothing changed: it is half of a database, the other "
+                  "half is " +
+                  journal,
+              complaint(run({"restore", copy_, "--yes"})));
+    EXPECT_EQ(before, databaseBytes());
+    ASSERT_EQ(0, truncate(journal.c_str(), 0));
+  }
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
 }
 
 TEST_F(RestoreTest, MakesADatabaseWhereThereIsNone) {

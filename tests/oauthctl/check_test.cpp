@@ -189,6 +189,7 @@ TEST_F(CheckTest, FindsAFileOpenToOthers) {
 }
 
 TEST_F(CheckTest, FindsAFolderOpenToOthers) {
+  giveToNobody();  // in a folder of its own root does not go on
   for (const mode_t mode : {0777, 0770, 0702}) {
     chmod(files_.directory().c_str(), mode);
     EXPECT_THAT(findings(), ElementsAre(HasSubstr("others can replace the database")));
@@ -200,12 +201,6 @@ TEST_F(CheckTest, FindsAFileOfSomebodyElse) {
   ASSERT_EQ(0, chown(files_.database().c_str(), 1234, 1234));
   EXPECT_THAT(findings(),
               ElementsAre(files_.database() + " belongs to user 1234 and its folder to user 0"));
-}
-
-TEST_F(CheckTest, FindsALink) {
-  rename(files_.database().c_str(), path("real.db").c_str());
-  ASSERT_EQ(0, symlink("real.db", files_.database().c_str()));
-  EXPECT_THAT(findings(), ElementsAre(files_.database() + " is a link"));
 }
 
 TEST_F(CheckTest, FindsAnotherName) {

@@ -128,6 +128,11 @@ TEST_F(ClientTest, TakesASecretFromStandardInput) {
                      "--secret-from-stdin"};
   EXPECT_EQ("2 a client secret has 64 bytes, not 5", complaint(run(add, "short\n")));
   EXPECT_EQ("2 standard input holds no client secret", complaint(run(add)));
+  EXPECT_EQ("2 the client secret on standard input holds a NUL byte",
+            complaint(run(add, times(64, 'z') + '\0' + "\n")));
+  EXPECT_EQ("2 the client secret on standard input holds a NUL byte",
+            complaint(run(add, times(31, 'z') + '\0' + times(32, 'z'))));
+  EXPECT_EQ("", databaseBytes());
   EXPECT_EQ(0, run(add, times(64, 'z') + "\n").code);
   EXPECT_EQ(times(64, 'z'),
             json({"client", "show", "1", "--show-secrets"})["client_secret"].asString());

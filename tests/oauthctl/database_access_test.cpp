@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <filesystem>
+#include <set>
 
 #include "oauthctl_test.h"
 
@@ -39,9 +40,11 @@ const std::vector<Words> kEveryUse = {
 };
 
 std::string listOf(const std::string& folder) {
-  std::string names;
+  std::set<std::string> sorted;
   for (const auto& entry : std::filesystem::directory_iterator(folder))
-    names += entry.path().filename().string() + " ";
+    sorted.insert(entry.path().filename());
+  std::string names;
+  for (const std::string& name : sorted) names += name + " ";
   return names;
 }
 
@@ -76,6 +79,18 @@ TEST_F(DatabaseAccessTest, IsNotFilledByLookingAtIt) {
 TEST_F(DatabaseAccessTest, IsNotADirectory) {
   mkdir(files_.database().c_str(), 0700);
   EXPECT_EQ("3 " + files_.database() + " is not a regular file", complaint(run({"status"})));
+}
+
+TEST_F(DatabaseAccessTest, IsNotALink) {
+  addClient('c');
+  rename(files_.database().c_str(), path("real.db").c_str());
+  ASSERT_EQ(0, symlink("real.db", files_.database().c_str()));
+  const std::string before = bytesOf(path("real.db"));
+  for (const Words& words : kEveryUse)
+    EXPECT_EQ("3 " + files_.database() + " is a link: put the database itself there",
+              complaint(run(words)));
+  EXPECT_EQ(before, bytesOf(path("real.db")));
+  EXPECT_EQ("oauth.db real.db ", listOf(files_.directory()));
 }
 
 TEST_F(DatabaseAccessTest, IsOverwrittenNowhereWhenItIsNoDatabase) {

@@ -10,6 +10,8 @@
 #include <sys/time.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <csignal>
 #include <cstdarg>
 #include <cstdlib>
 #include <cstring>
@@ -90,6 +92,37 @@ extern "C" int open64(const char* path, int flags, ...) {
   }
 REPLACE_LSTAT(lstat64Seam, "lstat64")
 REPLACE_LSTAT(lstat64Time64Seam, "__lstat64_time64")
+
+// With OAUTHCTL_NO_TMPFILE, as on a file system that has no files without a name.
+extern "C" int openat64(int folder, const char* path, int flags, ...) {
+  va_list arguments;
+  va_start(arguments, flags);
+  const auto mode = va_arg(arguments, unsigned);
+  va_end(arguments);
+  if ((flags & O_TMPFILE) == O_TMPFILE && std::getenv("OAUTHCTL_NO_TMPFILE") != nullptr) {
+    errno = EOPNOTSUPP;
+    return -1;
+  }
+  return next("openat64", openat64)(folder, path, flags, mode);
+}
+
+// With OAUTHCTL_NO_PROC, as where /proc is not mounted.
+extern "C" int linkat(int from, const char* path, int to, const char* name, int flags) noexcept {
+  if (std::getenv("OAUTHCTL_NO_PROC") != nullptr && std::strncmp(path, "/proc/", 6) == 0) {
+    errno = ENOENT;
+    return -1;
+  }
+  return next("linkat", linkat)(from, path, to, name, flags);
+}
+
+// Between the writing of a file and its naming: waits for a file with the name OAUTHCTL_HOLD, and
+// interrupts the program if OAUTHCTL_INTERRUPT is set.
+extern "C" int fsync(int descriptor) {
+  const char* const hold = std::getenv("OAUTHCTL_HOLD");
+  while (hold != nullptr && faccessat(AT_FDCWD, hold, F_OK, 0) != 0) usleep(1000);
+  if (std::getenv("OAUTHCTL_INTERRUPT") != nullptr) raise(SIGINT);
+  return next("fsync", fsync)(descriptor);
+}
 
 extern "C" int access(const char* path, int mode) noexcept {
   return next("access", access)(redirected(path).c_str(), mode);

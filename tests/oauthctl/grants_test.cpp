@@ -150,6 +150,8 @@ TEST_F(GrantsTest, TellsExpiredFromUnknown) {
             complaint(run({"token", "verify"}, times(64, 'b') + "\n")));
   EXPECT_EQ("1 not valid: no such access token", complaint(run({"token", "verify"}, "short\n")));
   EXPECT_EQ("2 standard input holds no access token", complaint(run({"token", "verify"})));
+  EXPECT_EQ("2 the access token on standard input holds a NUL byte",
+            complaint(run({"token", "verify"}, times(64, 'a') + '\0' + "\n")));
 }
 
 TEST_F(GrantsTest, RevokesByUser) {

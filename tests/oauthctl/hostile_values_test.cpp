@@ -85,6 +85,114 @@ TEST_F(HostileValuesTest, AreMaskedAsSecrets) {
   EXPECT_GE(8U, json({"token", "list"})[0U]["access_token"].asString().size());
 }
 
+// Tables that somebody made anew, whose ids are texts. The library takes them as they are.
+class HostileIdsTest : public HostileValuesTest {
+ protected:
+  HostileIdsTest() {
+    execute("UPDATE oauth_clientInfo SET client_id = '" + FakeHost::sealed(times(64, 'c')) + "'");
+    execute("UPDATE oauth_token SET access_token = '" + times(64, 'a') + "', expired_time = '" +
+            std::to_string(kNow + 600) + "'");
+    for (const char* const table :
+         {"oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log", "oauth_meta"})
+      forgetTypes(table);
+    for (const char* const table :
+         {"oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"})
+      plant(table, "id", kHostile);
+    plant("oauth_log", "timestamp", kHostile);
+    plant("oauth_clientInfo", "enable", kHostile);
+    plant("oauth_meta", "tab_name", kHostile);
+    plant("oauth_meta", "version", kHostile);
+  }
+
+  // The same rows in a table without types and keys.
+  void forgetTypes(const std::string& table) const {
+    std::string sql = "CREATE TABLE copy AS SELECT * FROM ";
+    sql.append(table).append("; DROP TABLE ").append(table);
+    execute(sql.append("; ALTER TABLE copy RENAME TO ").append(table));
+  }
+
+  // Nothing in the text, line ends aside, but what a terminal prints.
+  static void expectPrintable(const std::string& text) {
+    for (const char* const bytes : {"\x1b", "\x01", "\x7f", "\r", "\t", "\xC2\x9B", "\xFF",
+                                    "\xED\xA0", "\xF4\x90", kOverride.c_str()})
+      EXPECT_THAT(text, Not(HasSubstr(bytes)));
+  }
+};
+
+std::vector<Words> everyCommand() {
+  const std::string client = times(64, 'c');
+  std::vector<Words> all = {
+      {"client", "show", client},
+      {"client", "edit", client, "--name", "x"},
+      {"client", "enable", client},
+      {"client", "disable", client},
+      {"client", "delete", client, "--yes"},
+      {"client", "delete", client, "--with-tokens", "--yes"},
+      {"client", "add", "--name", "n", "--redirect-uri", "a.example", "--scope", "r"},
+      {"client", "add", "--name", "n", "--redirect-uri", "a.example", "--scope", "r", "--json"},
+      {"code", "list"},
+      {"code", "list", "--user", kHostile},
+      {"code", "revoke", "--user", kHostile, "--yes"},
+      {"code", "purge", "--yes"},
+      {"token", "list"},
+      {"token", "list", "--user", kHostile},
+      {"token", "show", "1"},
+      {"token", "verify"},
+      {"token", "verify", "--json"},
+      {"token", "revoke", "--user", kHostile, "--yes"},
+      {"token", "purge", "--grace", "0", "--yes"},
+      {"log"},
+      {"log", "--match", "31m"},
+      {"backup", "/nonexistent/" + kHostile},
+      {"restore", "/nonexistent/" + kHostile, "--yes"},
+      {"status"},
+      {"check"},
+      {"client", "list"},
+      {"log", "clear", "--yes"}};
+  for (const char* const name : {"client", "code", "token"})
+    for (const char* const form : {"--show-secrets", "--json"}) all.push_back({name, "list", form});
+  for (const Words& words : {Words{"status", "--json"}, {"check", "--json"}, {"log", "--json"}})
+    all.push_back(words);
+  return all;
+}
+
+TEST_F(HostileIdsTest, AreSpeltOutByEveryCommand) {
+  for (const Words& words : everyCommand()) {
+    SCOPED_TRACE(words[0] + " " + (words.size() > 1 ? words[1] : ""));
+    const Outcome outcome = run(words, times(64, 'a') + "\n");
+    EXPECT_NE("", outcome.out + outcome.err);
+    EXPECT_GT(4, outcome.code);
+    expectPrintable(outcome.out);
+    expectPrintable(outcome.err);
+  }
+}
+
+TEST_F(HostileIdsTest, AreSpeltOutInQuestions) {
+  for (const Words& words :
+       {Words{"client", "delete", times(64, 'c')}, Words{"token", "revoke", "--user", kHostile},
+        Words{"token", "purge", "--grace", "0"}}) {
+    const std::string shown = runOnTerminal(words, "n\n").out;
+    EXPECT_THAT(shown, Not(HasSubstr("\x1b[31m")));
+    EXPECT_THAT(shown, Not(HasSubstr(kOverride)));
+  }
+}
+
+// The number that stands for such an id belongs to another row.
+TEST_F(HostileIdsTest, ChangeNoOtherRow) {
+  execute(
+      "INSERT INTO oauth_clientInfo SELECT 'x', 'other', client_secret, redirect_uri, scope, "
+      "display_name, 0 FROM oauth_clientInfo");
+  const Lines before = everyRow();
+  for (const char* const verb : {"enable", "disable", "delete"}) {
+    Words words = {"client", verb, times(64, 'c')};
+    if (words[1] == "delete") words.emplace_back("--yes");
+    const std::string line = complaint(run(words));
+    EXPECT_THAT(line, testing::StartsWith("1 nothing changed, the row's id '"));
+    EXPECT_THAT(line, HasSubstr("is no number: see 'oauthctl check'"));
+  }
+  EXPECT_EQ(before, everyRow());
+}
+
 struct Text {
   std::string given, ascii, utf8;
 };

@@ -38,6 +38,8 @@ class OauthctlTest : public StoreTest {
                         const std::string& prompt = "") const;
   // run() as user 65534, if the tests run as root.
   Outcome runAsNobody(const Words& words) const;
+  // The folder and all it holds now belong to user 65534, if the tests run as root.
+  void giveToNobody() const;
   // The document that a run with "--json" printed.
   Json::Value json(const Words& words) const;
 
@@ -60,9 +62,15 @@ class OauthctlTest : public StoreTest {
   // Every row of the file, of whatever table.
   static Lines rowsIn(const std::string& file);
 
+  // The program encrypts with a key in the folder, as it does where it is installed.
+  void useRealCipher();
+
   std::vector<std::string> environment_;  // more of it, as "NAME=value"
   std::function<void()> beforeTyping_;    // while the program runs already
+  std::function<void()> beforeExec_;      // in the process that becomes the program
 
  private:
   pid_t start(const Words& words, int in, int out, int err, bool asNobody) const;
+
+  std::string program_;  // runs behind an emulator where the machine needs one
 };

@@ -1,12 +1,9 @@
-#include <sys/stat.h>
-#include <unistd.h>
+#include <utility>
 
-#include <cerrno>
-#include <cstdlib>
-#include <cstring>
-
+#include "backup_file.h"
 #include "commands.h"
 #include "database_access.h"
+#include "database_folder.h"
 #include "database_image.h"
 #include "exit_code.h"
 #include "fixed_paths.h"
@@ -17,16 +14,10 @@
 namespace oauthctl {
 namespace {
 
-// SQLite takes some names for something else than a file, all of them relative.
-std::string absolutePath(const std::string& path) {
+std::string operand(const Invocation& invocation) {
+  std::string path = invocation.value("FILE");
   if (path.empty()) throw Failure(ExitCode::kUsage, "FILE is empty");
-  if (path.front() == '/') return path;
-  char* const folder = getcwd(nullptr, 0);
-  if (folder == nullptr)
-    throw Failure(ExitCode::kAttention, "cannot tell the folder we are in: give a path from /");
-  std::string result = std::string(folder) + "/" + path;
-  free(folder);
-  return result;
+  return path;
 }
 
 std::string firstOf(const Findings& findings) {
@@ -36,7 +27,7 @@ std::string firstOf(const Findings& findings) {
 }
 
 DatabaseImage readLive() try {
-  return DatabaseImage(fixed_paths::database());
+  return DatabaseImage::ofFile(fixed_paths::database());
 } catch (const SqliteError& error) {
   if (error.isDamage())
     throw Failure(ExitCode::kAttention, fixed_paths::database() + " is damaged (" + error.what() +
@@ -47,10 +38,11 @@ DatabaseImage readLive() try {
                                      "), no backup was made: see 'oauthctl check'");
 }
 
-void requireSound(const std::string& path) {
+// What a reader will find in the file is a database, too.
+void requireSound(const NewFile& file) {
   Findings problems;
   try {
-    problems = DatabaseImage(path).problems();
+    problems = DatabaseImage::ofBytes(file.contents()).problems();
   } catch (const SqliteError& error) {
     problems = {{error.what(), ""}};
   }
@@ -59,68 +51,57 @@ void requireSound(const std::string& path) {
                   "the copy is not sound, no backup was made: " + firstOf(problems));
 }
 
-[[noreturn]] void refuse(const std::string& path, const std::string& why) {
-  throw Failure(ExitCode::kAttention, path + " is refused, nothing changed: " + why);
-}
-
-void requireReadableBackup(const std::string& path) {
-  struct stat file, live;
-  if (stat(path.c_str(), &file) != 0)
-    throw Failure(ExitCode::kAttention, "cannot read " + path + ": " + std::strerror(errno));
-  if (!S_ISREG(file.st_mode)) refuse(path, "it is not a file");
-  if (access(path.c_str(), R_OK) != 0)
-    throw Failure(ExitCode::kAttention, "cannot read " + path + ": " + std::strerror(errno));
-  if (stat(fixed_paths::database().c_str(), &live) == 0 && live.st_dev == file.st_dev &&
-      live.st_ino == file.st_ino)
+void refuseTheDatabaseItself(const BackupFile& backup, const std::string& path) {
+  const auto live = DatabaseFolder::enter().look(nameOf(fixed_paths::database()));
+  if (live && live->st_dev == backup.status.st_dev && live->st_ino == backup.status.st_ino)
     throw Failure(ExitCode::kUsage, path + " is the database itself");
 }
 
-// The backup, if it is one of this machine.
-DatabaseImage readBackup(const std::string& path) try {
-  requireReadableBackup(path);
-  DatabaseImage image(path);
+// The image of the backup, if it is one of this machine.
+DatabaseImage imageOf(BackupFile backup, const std::string& path) try {
+  DatabaseImage image = DatabaseImage::ofBytes(std::move(backup.bytes));
   const Findings problems = image.problems();
-  if (!problems.empty()) refuse(path, firstOf(problems));
+  if (!problems.empty()) refuseBackup(path, firstOf(problems));
   const CipherCount ciphers = image.countCiphers();
   if (ciphers.values > 0 && ciphers.unreadable == ciphers.values)
-    refuse(path, "it was encrypted on another machine, or this one has lost its key");
+    refuseBackup(path, "it was encrypted on another machine, or this one has lost its key");
   image.compact();
   return image;
 } catch (const SqliteError& error) {
-  if (error.isBusy())
-    throw Failure(ExitCode::kUnavailable, path + " is busy, nothing changed: try again");
-  refuse(path, error.what());
+  refuseBackup(path, error.what());
+}
+
+DatabaseImage liveImage(bool withoutTokens) {
+  DatabaseImage image = readLive();
+  if (const Findings problems = image.problems(); !problems.empty())
+    throw Failure(ExitCode::kAttention, "the database is not sound, no backup was made: " +
+                                            firstOf(problems) + "; see 'oauthctl check'");
+  image.compact();
+  if (withoutTokens) image.dropGrants();
+  return image;
 }
 
 }  // namespace
 
+// The file is the operator's: it is made before root becomes the owner of the database's folder.
 void backUp(const Invocation& invocation) {
-  const std::string target = absolutePath(invocation.value("FILE"));
-  requireFreeName(target);
-  requireDatabase(Access::kRead);
+  const std::string target = operand(invocation);
   NewFile file(target);
-  std::string summary;
-  try {
-    DatabaseImage image = readLive();
-    if (const Findings problems = image.problems(); !problems.empty())
-      throw Failure(ExitCode::kAttention, "the database is not sound, no backup was made: " +
-                                              firstOf(problems) + "; see 'oauthctl check'");
-    image.compact();
-    if (invocation.has("--without-tokens")) image.dropGrants();
-    summary = image.summary();
-    image.writeTo(file.path());
-  } catch (const SqliteError& error) {
-    throw Failure(ExitCode::kAttention, "cannot write " + target + ": " + error.what());
-  }
-  requireSound(file.path());
+  requireDatabase(Access::kRead);
+  DatabaseImage image = liveImage(invocation.has("--without-tokens"));
+  file.append(image.bytes());
+  requireSound(file);
   file.publish();
-  say("wrote " + invocation.value("FILE") + ": " + summary);
+  say("wrote " + target + ": " + image.summary());
 }
 
+// The backup is the operator's too.
 void restore(const Invocation& invocation) {
-  const std::string source = absolutePath(invocation.value("FILE"));
+  const std::string source = operand(invocation);
+  BackupFile backup = readBackupFile(source);
   requireDatabase(Access::kMake);
-  DatabaseImage image = readBackup(source);
+  refuseTheDatabaseItself(backup, source);
+  DatabaseImage image = imageOf(std::move(backup), source);
   if (invocation.has("--without-tokens")) image.dropGrants();
   confirm(invocation, "Replace everything in the database by " + image.summary() + "?");
   const std::string kept = replaceLiveDatabase(image);

@@ -1,7 +1,6 @@
 #include "commands.h"
 #include "content_checks.h"
 #include "database_access.h"
-#include "escaping.h"
 #include "exit_code.h"
 #include "file_checks.h"
 #include "fixed_paths.h"
@@ -51,8 +50,7 @@ void print(const Findings& findings, bool asJson) {
     printJson(documents);
     return;
   }
-  for (const Finding& finding : findings)
-    say(escaped(finding.problem) + ". To do: " + escaped(finding.advice) + ".");
+  for (const Finding& finding : findings) say(finding.problem + ". To do: " + finding.advice + ".");
   if (findings.empty()) say("sound: " + fixed_paths::database());
 }
 

@@ -2,8 +2,8 @@
 
 #include "commands.h"
 #include "exit_code.h"
-#include "fixed_paths.h"
 #include "grants.h"
+#include "human_time.h"
 #include "oauth_clientInfo.h"
 #include "oauth_utils.h"
 #include "registry.h"
@@ -90,10 +90,11 @@ std::string callersSecret(const Invocation& invocation) {
 void setEnabled(const Invocation& invocation, bool enabled) {
   Database database(Access::kWrite);
   const Json::Value row = findClient(database, invocation.value("CLIENT"));
+  const long long id = idForChange(row);
   OAUTHDBClientInfo clients(kClientTable);
   requireReady(clients);
   const bool changed = attempt(clients, "change the client", [&] {
-    return (enabled ? clients.Enable(idOf(row)) : clients.Disable(idOf(row))) != 0;
+    return (enabled ? clients.Enable(id) : clients.Disable(id)) != 0;
   });
   if (!changed) throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
   say("client " + row["id"].asString() + (enabled ? " is enabled" : " is disabled"));
@@ -154,14 +155,12 @@ void addClient(const Invocation& invocation) {
   for (const Field& field : {kName, kRedirectUri, kScope}) fieldValue(invocation, field);
   requireDatabase(Access::kMake);
   const std::string secret = callersSecret(invocation);
-  const bool isNew = !databaseExists();
   const Made made = registerClient(invocation, secret);
-  if (isNew) giveToFolderOwner(fixed_paths::database());
   Database database(Access::kRead);
   const Json::Value id = findClient(database, made.identifier)["id"];
   if (invocation.has("--json")) {
     Json::Value document;
-    document["id"] = static_cast<Json::Int64>(std::stoll(id.asString()));
+    document["id"] = static_cast<Json::Int64>(number(id.asString()).value_or(0));
     document["client_id"] = made.identifier;
     document["client_secret"] = made.secret;
     printJson(document);
@@ -181,7 +180,7 @@ void editClient(const Invocation& invocation) {
     throw Failure(ExitCode::kUsage, "nothing to change: give --name, --redirect-uri or --scope");
   Database database(Access::kWrite);
   const Json::Value row = findClient(database, invocation.value("CLIENT"));
-  if (!database.edit(kClientTable, idOf(row), modified))
+  if (!database.edit(kClientTable, idForChange(row), modified))
     throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
   say("client " + row["id"].asString() + " is changed");
 }
@@ -192,6 +191,7 @@ void disableClient(const Invocation& invocation) { setEnabled(invocation, false)
 void deleteClient(const Invocation& invocation) {
   Database database(Access::kWrite);
   const Json::Value row = findClient(database, invocation.value("CLIENT"));
+  const long long id = idForChange(row);
   const std::string identifier = row["client_id"].asString();
   const bool withTokens = invocation.has("--with-tokens");
   const auto grants = [&](int codes, int tokens) {
@@ -205,7 +205,7 @@ void deleteClient(const Invocation& invocation) {
                           "?");
   int codes = 0, tokens = 0;
   database.inTransaction([&] {
-    if (!database.remove(kClientTable, idOf(row)))
+    if (!database.remove(kClientTable, id))
       throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
     if (!withTokens) return;
     codes = removeOfClient(database, kCodes, identifier);

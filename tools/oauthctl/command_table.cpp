@@ -69,7 +69,8 @@ const std::vector<Command> kOverview = {
      {kWithoutTokens, kYes},
      "Checks the file first and refuses one that is damaged, foreign, or encrypted for another "
      "machine. What was there is kept beside the database, in a file whose name is told. The "
-     "server may run: it sees either the old contents or the new ones.\n"
+     "server may run: it sees either the old contents or the new ones. FILE must be a regular file "
+     "of at most 512 MiB, without a journal beside it, and not a link.\n"
      "Codes and refresh tokens spent since the backup become valid again. Use --without-tokens, "
      "which makes every user log in anew, unless you must keep the logins.",
      {{"oauthctl restore /var/backups/oauth-2026-11-21.db", "ask, then put it back"},

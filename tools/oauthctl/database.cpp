@@ -98,4 +98,13 @@ std::string asGiven(const std::string& stored) {
 
 long long idOf(const Json::Value& row) { return number(row["id"].asString()).value_or(0); }
 
+long long idForChange(const Json::Value& row) {
+  const std::string id = row["id"].asString();
+  const auto result = number(id);
+  if (!result)
+    throw Failure(ExitCode::kAttention,
+                  "nothing changed, the row's id '" + id + "' is no number: see 'oauthctl check'");
+  return *result;
+}
+
 }  // namespace oauthctl

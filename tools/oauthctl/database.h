@@ -55,7 +55,10 @@ class Database {
 // A stored text as it was given: the library keeps every single quote doubled.
 std::string asGiven(const std::string& stored);
 
-// Row ids and other numbers come as decimal text.
+// A row's id, which comes as decimal text; 0 if it is no number.
 long long idOf(const Json::Value& row);
+// The id of a row that is to be changed or deleted. Throws if it is no number, since what stands
+// for it would be another row's.
+long long idForChange(const Json::Value& row);
 
 }  // namespace oauthctl

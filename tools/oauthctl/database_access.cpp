@@ -7,6 +7,7 @@
 #include <cerrno>
 #include <cstring>
 
+#include "database_folder.h"
 #include "exit_code.h"
 #include "fixed_paths.h"
 
@@ -17,54 +18,55 @@ namespace {
   throw Failure(ExitCode::kUnavailable, line);
 }
 
-// By the effective user, as every later open.
-bool may(const std::string& path, int mode) {
-  return faccessat(AT_FDCWD, path.c_str(), mode, AT_EACCESS) == 0;
+// Root who works with the owner's ids is told how to help the owner.
+[[noreturn]] void mayNot(const std::string& what, const std::string& remedy) {
+  const DatabaseFolder& folder = DatabaseFolder::enter();
+  if (!folder.isOwnersView())
+    unavailable("you may not " + what + ": run oauthctl as root or as the server's user");
+  unavailable("user " + std::to_string(folder.owner()) + ", who owns the folder, may not " + what +
+              ": " + remedy);
 }
 
-void requireFolder() {
-  const std::string folder = fixed_paths::folder();
-  struct stat status;
-  if (stat(folder.c_str(), &status) != 0 && errno != EACCES)
-    unavailable("there is no folder " + folder + " for the database: is the server installed?");
-  if (!may(folder, X_OK)) unavailable(mayNot("look into " + folder));
+void requireFolder(int mode, const std::string& what) {
+  const std::string path = fixed_paths::folder();
+  if (!DatabaseFolder::enter().may(".", mode))
+    mayNot(what + " " + path, "run 'chmod u+rwx " + path + "'");
 }
 
-void requireWritableFolder() {
-  const std::string folder = fixed_paths::folder();
-  if (!may(folder, W_OK | X_OK)) unavailable(mayNot("write to " + folder));
+void requireFile(const struct stat& status, int mode, const char* what) {
+  const std::string path = fixed_paths::database();
+  const DatabaseFolder& folder = DatabaseFolder::enter();
+  if (folder.may(nameOf(path), mode)) return;
+  // Nothing that would give away a file behind a link, or behind another name.
+  std::string remedy = "run 'chown -h " + std::to_string(folder.owner()) + " " + path +
+                       "', it belongs to user " + std::to_string(status.st_uid);
+  if (status.st_uid == folder.owner()) remedy = "run 'chmod u+rw " + path + "'";
+  if (status.st_nlink > 1) remedy = "it has other names too, find out who made it";
+  mayNot(std::string(what) + " " + path, remedy);
 }
 
 }  // namespace
 
-std::string mayNot(const std::string& what) {
-  return "you may not " + what + ": run oauthctl as root or as the server's user";
-}
-
 void requireDatabase(Access access) {
   const std::string path = fixed_paths::database();
-  requireFolder();
-  if (access != Access::kRead) requireWritableFolder();
-  struct stat status;
-  if (stat(path.c_str(), &status) != 0) {
+  requireFolder(X_OK, "look into");
+  if (access != Access::kRead) requireFolder(W_OK | X_OK, "write to");
+  const std::optional<struct stat> status = DatabaseFolder::enter().look(nameOf(path));
+  if (!status) {
     if (errno != ENOENT) unavailable("cannot look at " + path + ": " + std::strerror(errno));
     if (access == Access::kMake) return;
     unavailable("there is no database " + path + ": 'oauthctl client add' or the server makes it");
   }
-  if (!S_ISREG(status.st_mode)) unavailable(path + " is not a regular file");
-  if (!may(path, R_OK)) unavailable(mayNot("read " + path));
-  if (access != Access::kRead && !may(path, W_OK)) unavailable(mayNot("write " + path));
-  if (status.st_size == 0 && access != Access::kMake)
+  if (S_ISLNK(status->st_mode)) unavailable(path + " is a link: put the database itself there");
+  if (!S_ISREG(status->st_mode)) unavailable(path + " is not a regular file");
+  requireFile(*status, R_OK, "read");
+  if (access != Access::kRead) requireFile(*status, W_OK, "write");
+  if (status->st_size == 0 && access != Access::kMake)
     unavailable(path + " is empty: 'oauthctl client add' or the server fills it");
 }
 
-bool databaseExists() { return may(fixed_paths::database(), F_OK); }
-
-void giveToFolderOwner(const std::string& path) {
-  struct stat status;
-  if (geteuid() != 0 || stat(fixed_paths::folder().c_str(), &status) != 0) return;
-  // Where this is refused the file stays root's, which the library can use just as well.
-  static_cast<void>(!lchown(path.c_str(), status.st_uid, status.st_gid));
+bool databaseExists() {
+  return DatabaseFolder::enter().look(nameOf(fixed_paths::database())).has_value();
 }
 
 }  // namespace oauthctl

@@ -1,8 +1,30 @@
 #include "database_image.h"
 
+#include <memory>
+
+#include "human_time.h"
 #include "terminal.h"
 
 namespace oauthctl {
+namespace {
+
+// The two bytes of the header that tell the journal mode. In memory there is no other mode, and
+// what somebody did to a backup must not change how the server's journal works.
+void chooseRollbackJournal(std::string& bytes) {
+  constexpr std::size_t kWriteVersion = 18, kReadVersion = 19;
+  constexpr char kRollback = 1, kWriteAhead = 2;
+  for (const std::size_t at : {kWriteVersion, kReadVersion})
+    if (at < bytes.size() && bytes[at] == kWriteAhead) bytes[at] = kRollback;
+}
+
+void requireFittingSize(SqliteConnection& source) {
+  const std::string bytes =
+      source.value("SELECT page_count * page_size FROM pragma_page_count, pragma_page_size");
+  if (number(bytes).value_or(0) > kLargestDatabase)
+    throw SqliteError(SQLITE_TOOBIG, "it is too large for a database of the server");
+}
+
+}  // namespace
 
 DatabaseCopy::DatabaseCopy(SqliteConnection& from, SqliteConnection& to)
     : backup_(sqlite3_backup_init(to.handle(), "main", from.handle(), "main")) {
@@ -30,13 +52,31 @@ void DatabaseCopy::finish() {
   }
 }
 
+DatabaseImage::DatabaseImage() : memory_(":memory:", SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE) {}
+
 // The source stays in one read transaction: otherwise every commit of another program between two
 // steps would start the copy anew.
-DatabaseImage::DatabaseImage(const std::string& path)
-    : memory_(":memory:", SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE) {
+DatabaseImage DatabaseImage::ofFile(const std::string& path) {
+  DatabaseImage image;
   SqliteConnection source(path, SQLITE_OPEN_READONLY);
   source.run("BEGIN; SELECT 1 FROM sqlite_master;");
-  DatabaseCopy(source, memory_).finish();
+  requireFittingSize(source);
+  DatabaseCopy(source, image.memory_).finish();
+  return image;
+}
+
+DatabaseImage DatabaseImage::ofBytes(std::string bytes) {
+  DatabaseImage image;
+  if (bytes.empty()) return image;
+  chooseRollbackJournal(bytes);
+  SqliteConnection source(":memory:", SQLITE_OPEN_READWRITE);
+  const auto size = static_cast<sqlite3_int64>(bytes.size());
+  const int code =
+      sqlite3_deserialize(source.handle(), "main", reinterpret_cast<unsigned char*>(bytes.data()),
+                          size, size, SQLITE_DESERIALIZE_READONLY);
+  if (code != SQLITE_OK) source.fail(code);
+  DatabaseCopy(source, image.memory_).finish();
+  return image;
 }
 
 void DatabaseImage::dropGrants() {
@@ -61,11 +101,18 @@ std::string DatabaseImage::summary() {
          counted("oauth_token", "token") + ", " + counted("oauth_log", "log line");
 }
 
-void DatabaseImage::writeTo(const std::string& path) {
-  SqliteConnection target(path, SQLITE_OPEN_READWRITE);
-  // Nobody else knows the file yet: no journal is needed, and it is synchronised when it is whole.
-  target.run("PRAGMA journal_mode = MEMORY; PRAGMA synchronous = OFF;");
-  DatabaseCopy(memory_, target).finish();
+std::string DatabaseImage::bytes() const {
+  struct Free {
+    void operator()(unsigned char* bytes) const { sqlite3_free(bytes); }
+  };
+  sqlite3_int64 size = 0;
+  const std::unique_ptr<unsigned char, Free> serialized(
+      sqlite3_serialize(memory_.handle(), "main", &size, 0));
+  if (!serialized) memory_.fail(SQLITE_NOMEM);
+  std::string result(reinterpret_cast<const char*>(serialized.get()),
+                     static_cast<std::size_t>(size));
+  chooseRollbackJournal(result);
+  return result;
 }
 
 }  // namespace oauthctl

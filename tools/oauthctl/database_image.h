@@ -10,10 +10,15 @@
 
 namespace oauthctl {
 
+// In bytes. Four tables at their ceiling of 10000 rows, with the longest values, take less.
+constexpr long long kLargestDatabase = 512LL * 1024 * 1024;
+
 class DatabaseImage {
  public:
   // Reads the file at one moment, other programs may go on writing. Throws a SqliteError.
-  explicit DatabaseImage(const std::string& path);
+  static DatabaseImage ofFile(const std::string& path);
+  // Takes the bytes of a whole file, which no program is writing. Throws a SqliteError.
+  static DatabaseImage ofBytes(std::string bytes);
 
   // No code or token is left in any of its pages.
   void dropGrants();
@@ -26,12 +31,14 @@ class DatabaseImage {
   // "2 clients, 1 code, 40 tokens, 33 log lines"
   std::string summary();
 
-  // Writes it into a file that holds nothing yet.
-  void writeTo(const std::string& path);
+  // What a file with these contents holds.
+  std::string bytes() const;
 
   SqliteConnection& connection() { return memory_; }
 
  private:
+  DatabaseImage();
+
   SqliteConnection memory_;
 };
 

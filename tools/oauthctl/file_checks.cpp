@@ -26,7 +26,7 @@ std::optional<struct stat> look(const std::string& path) {
 
 void checkOwner(const std::string& path, const struct stat& status, const struct stat& folder,
                 Findings& findings) {
-  if (status.st_uid == 0 || status.st_uid == folder.st_uid) return;
+  if (status.st_uid == folder.st_uid) return;
   findings.push_back({path + " belongs to user " + std::to_string(status.st_uid) +
                           " and its folder to user " + std::to_string(folder.st_uid),
                       "chown both to the server's user"});
@@ -35,7 +35,7 @@ void checkOwner(const std::string& path, const struct stat& status, const struct
 // SQLite's locks for writing: one byte that says "pending", one that says "reserved", and the range
 // that readers share and a committing writer has alone.
 bool somebodyWrites(const std::string& database) {
-  const int descriptor = open(database.c_str(), O_RDONLY | O_CLOEXEC);
+  const int descriptor = open(database.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
   if (descriptor < 0) return false;
   struct flock lock = {};
   lock.l_type = F_RDLCK;
@@ -49,7 +49,7 @@ bool somebodyWrites(const std::string& database) {
 
 // SQLite takes an empty journal, or one whose first byte is 0, for no journal.
 bool holdsSomething(const std::string& journal) {
-  const int descriptor = open(journal.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+  const int descriptor = open(journal.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
   if (descriptor < 0) return true;  // not for us to read: suspect it
   char first = 0;
   const bool read = ::read(descriptor, &first, 1) == 1;
@@ -70,10 +70,6 @@ Findings checkFiles() {
   const std::optional<struct stat> file = look(path);
   struct stat folder;
   if (!file || stat(directory.c_str(), &folder) != 0) return findings;
-  if (!S_ISREG(file->st_mode)) {
-    findings.push_back({path + " is a link", "put the database itself there"});
-    return findings;
-  }
   if (file->st_nlink > 1)
     findings.push_back({path + " has other names too (" + std::to_string(file->st_nlink - 1) + ")",
                         "remove the other links, copies are made by 'oauthctl backup'"});
@@ -97,7 +93,8 @@ Findings checkJournal() {
     return {};
   return {{journal + " is left over, of user " + std::to_string(found->st_uid) + " and mode " +
                octal(found->st_mode) + ": a program died while it wrote. Contents not checked",
-           "never delete it: run 'oauthctl status' as root, which rolls it back, and check again"}};
+           "never delete it: give it to the folder's owner, run 'oauthctl status', which rolls it "
+           "back, and check again"}};
 }
 
 Findings checkSettings() {
@@ -108,7 +105,8 @@ Findings checkSettings() {
   if (file && (file->st_mode & (S_IWGRP | S_IWOTH)) != 0)
     findings.push_back(
         {path + " has mode " + octal(file->st_mode) + ", others may write it", "chmod go-w"});
-  if (file && stat(fixed_paths::folder().c_str(), &folder) == 0)
+  // Root may keep the settings to himself.
+  if (file && file->st_uid != 0 && stat(fixed_paths::folder().c_str(), &folder) == 0)
     checkOwner(path, *file, folder, findings);
   const SettingsReport report = readSettings();
   if (!report.problem.empty())
@@ -122,7 +120,7 @@ Findings checkSettings() {
   for (const std::string& name : report.unknownNames)
     findings.push_back({"setting " + name + " is unknown", "correct its name in " + path});
   const Setting& logLevel = report.settings.back();
-  if (logLevel.value != 0 && access(fixed_paths::debugMarker().c_str(), F_OK) == 0)
+  if (logLevel.value != 0 && look(fixed_paths::debugMarker()))
     findings.push_back({"diagnostics are on and write secrets to the system log",
                         "set log_level to 0 and delete " + fixed_paths::debugMarker()});
   return findings;

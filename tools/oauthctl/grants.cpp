@@ -58,7 +58,7 @@ int removeMatching(Database& database, const GrantKind& kind, const RowTest& tes
     const Json::Value doomed = matching(database.rows(kind.table), test);
     Progress progress(std::string("deleting ") + kind.plural, doomed.size());
     for (const Json::Value& row : doomed) {
-      removed += database.remove(kind.table, idOf(row)) ? 1 : 0;
+      removed += database.remove(kind.table, idForChange(row)) ? 1 : 0;
       progress.update(static_cast<std::size_t>(removed));
     }
   });
@@ -212,7 +212,7 @@ int countOfClient(Database& database, const GrantKind& kind, const std::string& 
 int removeOfClient(Database& database, const GrantKind& kind, const std::string& identifier) {
   int removed = 0;
   for (const Json::Value& row : matching(database.rows(kind.table), ofClient(identifier)))
-    removed += database.remove(kind.table, idOf(row)) ? 1 : 0;
+    removed += database.remove(kind.table, idForChange(row)) ? 1 : 0;
   return removed;
 }
 

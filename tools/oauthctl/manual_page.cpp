@@ -60,7 +60,10 @@ constexpr char kDescription[] =
     "oauthctl is for the people who look after the server: it tells what is in the database and "
     "whether it is nearly full, registers clients, ends logins, cleans up, checks, backs up and "
     "restores. It works on the database file itself, while the server runs or not.\n"
-    "Run it as root or as the server's user. Any other user is told what may not be read.\n"
+    "Run it as the server's user or as root. Any other user is told what may not be read. Root "
+    "takes the ids of the user who owns the folder of the database before it looks into the "
+    "folder: new files there belong to that user, and a database closed to that user is not read. "
+    "The FILE of backup and restore is opened before that, with root's rights.\n"
     "Reading commands print a table, or with --json a document. Secrets, codes and tokens show "
     "their first four characters only, unless --show-secrets is given, and are never taken from "
     "the command line. Characters that are no printable text are spelt out, such as \\x1b.\n"
@@ -86,9 +89,9 @@ constexpr char kSession5[] =
     "oauthctl backup /var/backups/oauth.db\n"
     "oauthctl restore /var/backups/oauth.db";
 constexpr char kCron[] =
-    "10 * * * *  root  oauthctl code purge --yes >/dev/null\n"
-    "20 3 * * *  root  oauthctl token purge --grace 30d --yes >/dev/null\n"
-    "30 3 * * *  root  oauthctl backup /var/backups/oauth-$(date +\\%F).db >/dev/null";
+    "10 * * * *  oauth  oauthctl code purge --yes >/dev/null\n"
+    "20 3 * * *  oauth  oauthctl token purge --grace 30d --yes >/dev/null\n"
+    "30 3 * * *  oauth  oauthctl backup /var/backups/oauth/$(date +\\%F).db >/dev/null";
 
 std::string firstSession() {
   return ".SH A FIRST SESSION\nRegister a client. It prints the identifier and the secret for the "
@@ -102,7 +105,9 @@ std::string firstSession() {
          "clients refresh them, so that only those which expired 30 days ago or more go:\n" +
          literal(kSession4) +
          ".PP\nMake a backup while the server runs, and put it back one day:\n" +
-         literal(kSession5) + ".PP\nThe same from cron, which mails what goes wrong:\n" +
+         literal(kSession5) +
+         ".PP\nThe same from cron, which mails what goes wrong; oauth stands for the server\\(aqs "
+         "user:\n" +
          literal(kCron);
 }
 

@@ -2,67 +2,24 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <cerrno>
-#include <csignal>
-#include <cstdio>
-#include <cstdlib>
 #include <cstring>
+#include <utility>
 
+#include "database_folder.h"
 #include "exit_code.h"
+#include "oauth_utils.h"
 
 namespace oauthctl {
 namespace {
 
+constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC;
+constexpr mode_t kMode = S_IRUSR | S_IWUSR;
+
 [[noreturn]] void cannot(const std::string& what) {
   throw Failure(ExitCode::kAttention, "cannot " + what + ": " + std::strerror(errno));
 }
-
-// What the signal handler removes; it may hold secrets.
-char unfinished[4096];
-
-void removeUnfinished(int signal) {
-  unlink(unfinished);
-  std::signal(signal, SIG_DFL);
-  raise(signal);
-}
-
-void removeOnSignals(const std::string& path) {
-  if (path.size() >= sizeof unfinished) return;
-  unfinished[path.copy(unfinished, path.size())] = '\0';
-  for (const int signal : {SIGINT, SIGTERM, SIGHUP}) std::signal(signal, removeUnfinished);
-}
-
-// Makes a file like mkostemp. No signal finds it made and not yet known to the handler.
-bool makeRemovable(std::string& path) {
-  sigset_t held, before;
-  sigemptyset(&held);
-  for (const int signal : {SIGINT, SIGTERM, SIGHUP}) sigaddset(&held, signal);
-  sigprocmask(SIG_BLOCK, &held, &before);
-  const int descriptor = mkostemp(path.data(), O_CLOEXEC);
-  if (descriptor >= 0) {
-    close(descriptor);
-    removeOnSignals(path);
-  }
-  const int error = errno;
-  sigprocmask(SIG_SETMASK, &before, nullptr);
-  errno = error;
-  return descriptor >= 0;
-}
-
-void restoreSignals() {
-  for (const int signal : {SIGINT, SIGTERM, SIGHUP}) std::signal(signal, SIG_DFL);
-}
-
-void synchronize(const std::string& path, int flags) {
-  const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC | flags);
-  const bool done = descriptor >= 0 && fsync(descriptor) == 0;
-  if (!done) cannot("bring " + path + " to the disk");
-  close(descriptor);
-}
-
-}  // namespace
 
 std::string folderOf(const std::string& path) {
   const std::size_t slash = path.rfind('/');
@@ -70,36 +27,134 @@ std::string folderOf(const std::string& path) {
   return slash == 0 ? "/" : path.substr(0, slash);
 }
 
-void requireFreeName(const std::string& path) {
-  struct stat status;
-  if (lstat(path.c_str(), &status) == 0)
-    throw Failure(ExitCode::kUsage, path + " exists, and no file is ever replaced");
+// Where the kernel shows a file that has no name.
+std::string shownAs(const Descriptor& file) {
+  return "/proc/self/fd/" + std::to_string(file.value());
 }
 
-NewFile::NewFile(const std::string& target) : target_(target), path_(target + ".XXXXXX") {
-  requireFreeName(target);
-  if (!makeRemovable(path_)) cannot("make a file beside " + target);
+std::string temporaryName(const std::string& name) {
+  return name + "." + getRandomStr(64).substr(0, 16);
+}
+
+sigset_t endingSignals() {
+  sigset_t set;
+  sigemptyset(&set);
+  for (const int signal : {SIGINT, SIGTERM, SIGHUP}) sigaddset(&set, signal);
+  return set;
+}
+
+bool isInterrupted() {
+  sigset_t pending;
+  sigpending(&pending);
+  return sigismember(&pending, SIGINT) == 1 || sigismember(&pending, SIGTERM) == 1 ||
+         sigismember(&pending, SIGHUP) == 1;
+}
+
+}  // namespace
+
+NewFile::NewFile(const std::string& path)
+    : NewFile(path, Descriptor(open(folderOf(path).c_str(), kFolderFlags))) {}
+
+NewFile::NewFile(int folder, const std::string& path)
+    : NewFile(path, Descriptor(openat(folder, ".", kFolderFlags))) {}
+
+NewFile::NewFile(const std::string& path, Descriptor folder)
+    : path_(path), name_(nameOf(path)), maker_(effectiveIds()), folder_(std::move(folder)) {
+  if (!folder_.isOpen()) cannot("make a file beside " + path_);
+  requireFreeName();
+  makeUnnamed();
 }
 
 NewFile::~NewFile() {
-  if (path_.empty()) return;
-  unlink(path_.c_str());
-  restoreSignals();
+  if (temporary_.empty()) return;
+  {
+    const ActingAs maker(maker_);
+    unlinkat(folder_.value(), temporary_.c_str(), 0);
+  }
+  sigprocmask(SIG_SETMASK, &signalsBefore_, nullptr);
+}
+
+void NewFile::requireFreeName() const {
+  struct stat status;
+  if (fstatat(folder_.value(), name_.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0)
+    throw Failure(ExitCode::kUsage, path_ + " exists, and no file is ever replaced");
+}
+
+// Such a file is gone with this process, however that ends. It gets its name through /proc.
+void NewFile::makeUnnamed() {
+  Descriptor file(openat(folder_.value(), ".", O_TMPFILE | O_RDWR | O_CLOEXEC, kMode));
+  struct stat status;
+  if (file.isOpen() && stat(shownAs(file).c_str(), &status) == 0)
+    file_ = std::move(file);
+  else if (!file.isOpen() && errno != EOPNOTSUPP && errno != EISDIR && errno != EINVAL)
+    cannot("make a file beside " + path_);
+}
+
+void NewFile::makeNamed() {
+  const sigset_t ending = endingSignals();
+  sigprocmask(SIG_BLOCK, &ending, &signalsBefore_);
+  temporary_ = temporaryName(name_);
+  const ActingAs maker(maker_);
+  file_ = Descriptor(openat(folder_.value(), temporary_.c_str(),
+                            O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kMode));
+  if (!file_.isOpen()) cannot("make a file beside " + path_);
+}
+
+void NewFile::append(const char* bytes, std::size_t count) {
+  if (!file_.isOpen()) makeNamed();
+  while (count > 0) {
+    const ssize_t written = write(file_.value(), bytes, count);
+    if (written < 0 && errno == EINTR) continue;
+    if (written <= 0) cannot("write " + path_);
+    bytes += written;
+    count -= static_cast<std::size_t>(written);
+  }
+}
+
+std::string NewFile::contents() const {
+  std::string bytes;
+  char block[65536];
+  ssize_t count = 0;
+  while ((count = pread(file_.value(), block, sizeof block, static_cast<off_t>(bytes.size()))) > 0)
+    bytes.append(block, static_cast<std::size_t>(count));
+  if (count < 0) cannot("read " + path_ + " again");
+  return bytes;
 }
 
 void NewFile::publish() {
-  synchronize(path_, 0);
-  bool named = renameat2(AT_FDCWD, path_.c_str(), AT_FDCWD, target_.c_str(), RENAME_NOREPLACE) == 0;
-  if (!named && (errno == EINVAL || errno == ENOSYS)) {
-    // An older kernel or file system: a second name does the same.
-    named = link(path_.c_str(), target_.c_str()) == 0;
-    if (named) unlink(path_.c_str());
+  if (fsync(file_.value()) != 0) cannot("bring " + path_ + " to the disk");
+  if (!temporary_.empty() && isInterrupted())
+    throw Failure(ExitCode::kAttention, "interrupted, " + path_ + " was not made");
+  {
+    const ActingAs maker(maker_);
+    if (!name() && (errno == EEXIST || !nameTemporary())) {
+      if (errno == EEXIST) requireFreeName();
+      cannot("name the file " + path_);
+    }
   }
-  if (!named && errno == EEXIST) requireFreeName(target_);
-  if (!named) cannot("name the file " + target_);
-  restoreSignals();
-  path_.clear();
-  synchronize(folderOf(target_), O_DIRECTORY);
+  if (fsync(folder_.value()) != 0) cannot("bring " + path_ + " to the disk");
+}
+
+// By the descriptor: a temporary name may be somebody else's file by now.
+bool NewFile::name() const {
+  return linkat(AT_FDCWD, shownAs(file_).c_str(), folder_.value(), name_.c_str(),
+                AT_SYMLINK_FOLLOW) == 0;
+}
+
+// For a file system where no file has two names, and where there is no /proc. What was named is
+// looked at afterwards.
+bool NewFile::nameTemporary() {
+  const int folder = folder_.value();
+  const char *const from = temporary_.c_str(), *const to = name_.c_str();
+  if (temporary_.empty() || (renameat2(folder, from, folder, to, RENAME_NOREPLACE) != 0 &&
+                             linkat(folder, from, folder, to, 0) != 0))
+    return false;
+  struct stat named, made;
+  if (fstatat(folder_.value(), name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) == 0 &&
+      fstat(file_.value(), &made) == 0 && named.st_dev == made.st_dev &&
+      named.st_ino == made.st_ino)
+    return true;
+  throw Failure(ExitCode::kAttention, "somebody put another file in the place of " + path_);
 }
 
 }  // namespace oauthctl

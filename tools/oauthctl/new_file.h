@@ -1,34 +1,53 @@
 // A file that appears under its name only when it is whole, and never in another one's place.
+//
+// It is written and read through the descriptor that made it, and named relative to a folder that
+// stays open. So nobody who can write to that folder can put another file in its place.
 
 #pragma once
 
+#include <csignal>
 #include <string>
+
+#include "descriptor.h"
+#include "effective_ids.h"
 
 namespace oauthctl {
 
 class NewFile {
  public:
-  // Makes an empty file of mode 0600 beside the target.
-  explicit NewFile(const std::string& target);
-  // Removes it, unless it was published. So do signals that end the program.
+  // A file of mode 0600, made and named with the ids that the process has now. Throws if the name
+  // is taken.
+  explicit NewFile(const std::string& path);
+  // The same in a folder that is open already; the path is for messages, its last part the name.
+  NewFile(int folder, const std::string& path);
+  // Removes it, unless it was published. A signal that ends the program leaves nothing either.
   ~NewFile();
   NewFile(const NewFile&) = delete;
   NewFile& operator=(const NewFile&) = delete;
 
-  // Where it is for now.
-  const std::string& path() const { return path_; }
+  void append(const char* bytes, std::size_t count);
+  void append(const std::string& bytes) { append(bytes.data(), bytes.size()); }
+  // What a reader will find in it.
+  std::string contents() const;
   // Brings its contents to the disk and gives it its name. Throws if the name has been taken.
   void publish();
 
  private:
-  const std::string target_;
-  std::string path_;
+  NewFile(const std::string& path, Descriptor folder);
+  void requireFreeName() const;
+  void makeUnnamed();
+  void makeNamed();
+  bool name() const;
+  bool nameTemporary();
+
+  const std::string path_, name_;
+  const Ids maker_;
+  const Descriptor folder_;
+  Descriptor file_;
+  // Its name for now, where the file system has no files without one. Made late, and the signals
+  // that end the program wait until it is gone.
+  std::string temporary_;
+  sigset_t signalsBefore_ = {};
 };
-
-// Throws unless the name is free.
-void requireFreeName(const std::string& path);
-
-// The folder part of a path, "." if it has none.
-std::string folderOf(const std::string& path);
 
 }  // namespace oauthctl

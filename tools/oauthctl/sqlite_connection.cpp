@@ -26,6 +26,9 @@ SqliteConnection::SqliteConnection(const std::string& path, int flags) {
   const int code = sqlite3_open_v2(path.c_str(), &handle, flags, nullptr);
   handle_.reset(handle);
   if (code != SQLITE_OK) fail(code);
+  // Whoever made the file also wrote its schema.
+  sqlite3_db_config(handle, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
+  sqlite3_db_config(handle, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
   sqlite3_busy_handler(handle, waitForLock, nullptr);
 }
 

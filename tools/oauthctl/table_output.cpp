@@ -73,7 +73,11 @@ void printJson(const Json::Value& document) {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "  ";
   builder["enableYAMLCompatibility"] = true;  // "key": value
-  say(Json::writeString(builder, document));
+  std::string text = Json::writeString(builder, document);
+  // The one control character that the writer leaves as it is.
+  for (std::size_t at = 0; (at = text.find('\x7f', at)) != std::string::npos;)
+    text.replace(at, 1, "\\u007f");
+  std::printf("%s\n", text.c_str());
 }
 
 }  // namespace oauthctl

@@ -39,7 +39,7 @@ class Table {
 // Pairs of a name and a value, one on each line.
 void printPairs(const std::vector<std::pair<std::string, std::string>>& pairs);
 
-// The document in pure ASCII: whatever bytes a value has, what comes out is valid JSON.
+// The document in printable ASCII: whatever bytes a value has, what comes out is valid JSON.
 void printJson(const Json::Value& document);
 
 }  // namespace oauthctl

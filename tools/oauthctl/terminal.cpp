@@ -53,7 +53,7 @@ bool wantsColour() {
   return isatty(STDOUT_FILENO) != 0 && (no == nullptr || *no == '\0');
 }
 
-void say(const std::string& line) { std::printf("%s\n", line.c_str()); }
+void say(const std::string& line) { std::printf("%s\n", escaped(line).c_str()); }
 
 void confirm(const Invocation& invocation, const std::string& question) {
   if (invocation.has("--yes")) return;
@@ -77,6 +77,9 @@ std::string readSecret(const std::string& prompt) {
     std::fputc('\n', stderr);
   }
   if (secret.empty()) throw Failure(ExitCode::kUsage, "standard input holds no " + prompt);
+  // The library takes a text to end there.
+  if (secret.find('\0') != std::string::npos)
+    throw Failure(ExitCode::kUsage, "the " + prompt + " on standard input holds a NUL byte");
   return secret;
 }
 

@@ -13,14 +13,15 @@ namespace oauthctl {
 // Standard output is a terminal that wants colour: NO_COLOR is unset or empty.
 bool wantsColour();
 
-// Writes one line, or one document, to standard output.
+// Writes one line to standard output, escaped.
 void say(const std::string& line);
 
 // Returns if the operator agrees to what is about to happen, given as a question: by --yes, or by
 // answering on the terminal. Throws otherwise, and where there is nobody to ask.
 void confirm(const Invocation& invocation, const std::string& question);
 
-// A secret from standard input, its line end removed: typed unseen on a terminal, or piped.
+// A secret from standard input, its line end removed: typed unseen on a terminal, or piped. Throws
+// if there is none, or if it holds a NUL byte.
 std::string readSecret(const std::string& prompt);
 
 // How far long work has come, on standard error while that is a terminal; gone when it is done.

@@ -1,0 +1,57 @@
+#include "effective_ids.h"
+
+#include <grp.h>
+#include <pwd.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <string>
+
+#include "exit_code.h"
+
+namespace oauthctl {
+namespace {
+
+constexpr uid_t kRoot = 0, kKeep = static_cast<uid_t>(-1);
+
+// The group comes while the process is root, which alone may change it.
+bool take(Ids ids) {
+  const Ids now = effectiveIds();
+  if (now.user == ids.user && now.group == ids.group) return true;
+  return (now.user == kRoot || setresuid(kKeep, kRoot, kKeep) == 0) &&
+         setresgid(kKeep, ids.group, kKeep) == 0 && setresuid(kKeep, ids.user, kKeep) == 0;
+}
+
+}  // namespace
+
+Ids effectiveIds() { return {geteuid(), getegid()}; }
+
+void becomeUser(uid_t user, gid_t fallback) {
+  const passwd* const known = getpwuid(user);
+  const gid_t group = known == nullptr ? fallback : known->pw_gid;
+  const bool joined =
+      known == nullptr ? setgroups(1, &group) == 0 : initgroups(known->pw_name, group) == 0;
+  if (!joined || !take({user, group}))
+    throw Failure(ExitCode::kUnavailable, "cannot take the ids of user " + std::to_string(user) +
+                                              ": " + std::strerror(errno));
+}
+
+ActingAs::ActingAs(Ids ids) : before_(effectiveIds()) {
+  if (!take(ids))
+    throw Failure(
+        ExitCode::kUnavailable,
+        "cannot take the ids of user " + std::to_string(ids.user) + ": " + std::strerror(errno));
+}
+
+ActingAs::~ActingAs() {
+  const int error = errno;
+  if (!take(before_)) {
+    constexpr char kLine[] = "oauthctl: cannot give up the ids of root\n";
+    static_cast<void>(!write(STDERR_FILENO, kLine, sizeof kLine - 1));
+    _exit(static_cast<int>(ExitCode::kUnavailable));
+  }
+  errno = error;
+}
+
+}  // namespace oauthctl
