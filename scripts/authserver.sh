@@ -16,7 +16,14 @@ elif [ $# -ne 0 ]; then
   exit 2
 fi
 
-answers() { (: <"/dev/tcp/127.0.0.1/$AUTHSERVER_PORT") 2>/dev/null; }
+answers() { (: <"/dev/tcp/127.0.0.1/$port") 2>/dev/null; }
+
+need_free_port() {
+  if answers; then
+    echo "authserver: something else uses port $port" >&2
+    exit 1
+  fi
+}
 
 serve() {
   local password verifier challenge client id secret server
@@ -34,12 +41,13 @@ serve() {
   id=$(grep -oP '"client_id" : "\K\w+' <<<"$client")
   secret=$(grep -oP '"client_secret" : "\K\w+' <<<"$client")
 
+  need_free_port
   lighttpd -D -f "$AUTHSERVER_SOURCE/lighttpd.conf" &
   server=$!
   trap 'kill "$server" 2>/dev/null || true' INT TERM
   until answers; do
     if ! kill -0 "$server" 2>/dev/null; then
-      echo "authserver: the web server did not start on port $AUTHSERVER_PORT" >&2
+      echo "authserver: the web server did not start on port $port" >&2
       exit 1
     fi
     sleep 0.1
@@ -71,6 +79,7 @@ TEXT
 }
 
 if [ "${AUTHSERVER_FOLDER-}" = /var/authserver ]; then # inside, see below
+  port=$AUTHSERVER_PORT
   serve
   exit
 fi
@@ -80,10 +89,7 @@ if [ "$port" -gt 65535 ] || [ "$port" -lt "$([ "$(id -u)" -eq 0 ] && echo 1 || e
   echo "authserver: you cannot use port $port" >&2
   exit 1
 fi
-if AUTHSERVER_PORT=$port answers; then
-  echo "authserver: something else uses port $port" >&2
-  exit 1
-fi
+need_free_port
 scripts/authserver-namespace.sh true
 scripts/packages.sh build authserver
 build=$(scripts/build.sh release authserver -DZEVOOAUTH_BUILD_AUTHSERVER=ON \

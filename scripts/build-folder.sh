@@ -14,10 +14,10 @@ usable() { # ROOT NAME
 
 checkout=$(cksum <<<"$PWD" | cut -d ' ' -f 1)
 cache=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth-$checkout
-for root in "$PWD/build" "$cache" "/tmp/zevooauth-$(id -u)-$checkout"; do
-  root=$(realpath --canonicalize-missing "$root")
+own=$(realpath --canonicalize-missing build)
+for root in "$own" "$(realpath --canonicalize-missing "$cache")" "/tmp/zevooauth-$(id -u)-$checkout"; do
   # What others may have made is no place to run programs from.
-  if usable "$root" "$1" && { [ "$root" = "$PWD/build" ] || [ -O "$root" ]; }; then
+  if usable "$root" "$1" && { [ "$root" = "$own" ] || { [ -O "$root" ] && [ ! -L "$root" ]; }; }; then
     mkdir -p "$root/$1"
     echo "$root/$1"
     exit
