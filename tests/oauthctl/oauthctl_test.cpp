@@ -97,8 +97,8 @@ pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asN
   for (const std::string& variable : environment_)
     putenv(strdup(variable.c_str()));  // the program that follows takes it along
   if (asNobody) setenv("OAUTHCTL_USER", std::to_string(kNobody).c_str(), 1);
-  if (beforeExec_) beforeExec_();
   alarm(120);  // rather than wait for an answer that never comes
+  if (beforeExec_) beforeExec_();
   execvp(arguments.front(), arguments.data());
   _exit(98);
 }
