@@ -508,12 +508,27 @@ TEST_F(HostileFolderTest, FolderOfRootThatOthersMayWriteIsRefused) {
   addClient('c');
   for (const mode_t mode : {0770, 0777, 0702}) {
     chmod(files_.directory().c_str(), mode);
-    for (const Words& words : kEveryCommand)
+    for (const Words& words : kEveryCommand) {
+      if (words.front() == "check") continue;
       EXPECT_EQ("3 " + files_.directory() +
                     " belongs to root and others may write to it, which makes root do what they "
                     "want: chown it to the server's user, or chmod go-w",
                 complaint(run(words)));
+    }
   }
+}
+
+TEST_F(HostileFolderTest, FolderOfRootThatOthersMayWriteIsTheOnlyFinding) {
+  const std::string contents = "no database";
+  std::ofstream(files_.database()) << contents;
+  chmod(files_.directory().c_str(), 0777);
+  const Outcome outcome = run({"check"});
+  EXPECT_EQ(1, outcome.code);
+  EXPECT_EQ("oauthctl: 1 finding\n", outcome.err);
+  EXPECT_EQ(
+      files_.directory() + " has mode 0777: others can replace the database. To do: chmod go-w.\n",
+      outcome.out);
+  EXPECT_EQ(contents, databaseBytes());
 }
 
 // The files of a first registration, encryption key included.

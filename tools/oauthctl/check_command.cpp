@@ -1,6 +1,7 @@
 #include "commands.h"
 #include "content_checks.h"
 #include "database_access.h"
+#include "database_folder.h"
 #include "exit_code.h"
 #include "file_checks.h"
 #include "fixed_paths.h"
@@ -54,15 +55,22 @@ void print(const Findings& findings, bool asJson) {
   if (findings.empty()) say("sound: " + fixed_paths::database());
 }
 
-}  // namespace
-
-void checkSoundness(const Invocation& invocation) {
+Findings findAll() {
+  // There is no further look at what others may have put there.
+  if (DatabaseFolder::enter().isUnsafe()) return checkFolder();
   requireDatabase(Access::kRead);
   Findings findings = checkFiles();
   const Findings journal = checkJournal();
   append(findings, journal);
   append(findings, checkSettings());
   if (journal.empty()) checkContents(findings);
+  return findings;
+}
+
+}  // namespace
+
+void checkSoundness(const Invocation& invocation) {
+  const Findings findings = findAll();
   print(findings, invocation.has("--json"));
   if (findings.empty()) return;
   throw Failure(ExitCode::kAttention, std::to_string(findings.size()) +

@@ -49,6 +49,10 @@ void requireFile(const struct stat& status, int mode, const char* what) {
 
 void requireDatabase(Access access) {
   const std::string path = fixed_paths::database();
+  if (DatabaseFolder::enter().isUnsafe())
+    unavailable(fixed_paths::folder() +
+                " belongs to root and others may write to it, which makes root do what they want: "
+                "chown it to the server's user, or chmod go-w");
   requireFolder(X_OK, "look into");
   if (access != Access::kRead) requireFolder(W_OK | X_OK, "write to");
   const std::optional<struct stat> status = DatabaseFolder::enter().look(nameOf(path));

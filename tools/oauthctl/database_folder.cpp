@@ -32,18 +32,13 @@ int openFolder(const std::string& path) {
 DatabaseFolder::DatabaseFolder() : descriptor_(openFolder(fixed_paths::folder())) {
   if (fstat(descriptor_, &status_) != 0)
     unavailable("cannot look at " + fixed_paths::folder() + ": " + std::strerror(errno));
-  if (geteuid() == 0) becomeOwner();
+  if (geteuid() != 0 || status_.st_uid == 0) return;
+  becomeUser(status_.st_uid, status_.st_gid);
+  isOwnersView_ = true;
 }
 
-void DatabaseFolder::becomeOwner() {
-  if (status_.st_uid != 0) {
-    becomeUser(status_.st_uid, status_.st_gid);
-    isOwnersView_ = true;
-  } else if ((status_.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
-    unavailable(fixed_paths::folder() +
-                " belongs to root and others may write to it, which makes root do what they want: "
-                "chown it to the server's user, or chmod go-w");
-  }
+bool DatabaseFolder::isUnsafe() const {
+  return geteuid() == 0 && (status_.st_mode & (S_IWGRP | S_IWOTH)) != 0;
 }
 
 const DatabaseFolder& DatabaseFolder::enter() {

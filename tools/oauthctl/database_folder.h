@@ -21,6 +21,9 @@ class DatabaseFolder {
   int descriptor() const { return descriptor_; }
   // Root has become the owner.
   bool isOwnersView() const { return isOwnersView_; }
+  // Root runs this program in a folder of root's that others may write to: there is no other owner
+  // to become, and others decide what a program of root's does there.
+  bool isUnsafe() const;
   uid_t owner() const { return status_.st_uid; }
 
   // The entry itself, not what a link names; nothing, with errno set, if it cannot be had.
@@ -30,7 +33,6 @@ class DatabaseFolder {
 
  private:
   DatabaseFolder();
-  void becomeOwner();
 
   const int descriptor_;  // as long as the program runs
   struct stat status_ = {};

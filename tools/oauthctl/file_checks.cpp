@@ -64,6 +64,14 @@ bool sameFile(const std::optional<struct stat>& a, const std::optional<struct st
 
 }  // namespace
 
+Findings checkFolder() {
+  const std::string path = fixed_paths::folder();
+  struct stat folder;
+  if (stat(path.c_str(), &folder) != 0 || (folder.st_mode & (S_IWGRP | S_IWOTH)) == 0) return {};
+  return {{path + " has mode " + octal(folder.st_mode) + ": others can replace the database",
+           "chmod go-w"}};
+}
+
 Findings checkFiles() {
   Findings findings;
   const std::string path = fixed_paths::database(), directory = fixed_paths::folder();
@@ -76,10 +84,7 @@ Findings checkFiles() {
   if ((file->st_mode & (S_IRWXO | S_IWGRP | S_IXGRP)) != 0)
     findings.push_back({path + " has mode " + octal(file->st_mode) + ", open to other users",
                         "chmod 600, and set the programs' umask to 077"});
-  if ((folder.st_mode & (S_IWGRP | S_IWOTH)) != 0)
-    findings.push_back(
-        {directory + " has mode " + octal(folder.st_mode) + ": others can replace the database",
-         "chmod go-w"});
+  for (const Finding& finding : checkFolder()) findings.push_back(finding);
   checkOwner(path, *file, folder, findings);
   return findings;
 }

@@ -6,6 +6,9 @@
 
 namespace oauthctl {
 
+// The mode of the database's folder.
+Findings checkFolder();
+
 // Kind, owner and mode of the database and its folder.
 Findings checkFiles();
 
