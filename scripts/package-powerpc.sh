@@ -142,11 +142,7 @@ powerpc-linux-gnu-g++ -std=c++17 "$source/tests/install/consumer.cpp" "${options
   "-Wl,-rpath-link,$root/lib" -o "$root/consumer"
 
 cp "$(command -v qemu-ppc-static)" "$root/qemu"
-mkdir "$root/dev"
-touch "$root/dev/urandom"
-# shellcheck disable=SC2016 # for the inner shell
-enter=(unshare "${user[@]}" --mount
-  sh -c 'mount --bind /dev/urandom "$0/dev/urandom" && exec chroot "$0" "$@"' "$root")
+enter=(unshare "${user[@]}" --mount chroot "$root") # which has no device of random bytes
 
 # STATUS TEXT PROGRAM ARGUMENT...: what the program says is TEXT, a regular expression, no more.
 expect() {
@@ -179,7 +175,7 @@ expect 0 'wrote /backup.db: 1 client, 0 codes, 0 tokens, 1 log line' $oauthctl b
 for file in "$root$data/oauth.db" "$root/backup.db"; do
   [ "$(head --bytes 15 "$file")" = 'SQLite format 3' ] || fail "$file is no database"
 done
-expect 0 " WHERE username='alice' 64" /consumer
+expect 0 'alice 64' /consumer
 
 cd "$(dirname "$build")"
 cp "$work/$archive" .
