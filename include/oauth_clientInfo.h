@@ -14,8 +14,8 @@ namespace ZEVOOAUTHSERVER {
 /// "display_name", "id". Identifier and secret are encrypted in the file and plain in results.
 ///
 /// Lengths in bytes: client_id and client_secret 64; redirect_uri 3 to 2048; scope 1 to 2048;
-/// display_name 1 to 64. Anything else is kErrBadParameters. Refuse texts with a NUL byte before you
-/// call: they are cut there.
+/// display_name 1 to 64. Anything else is kErrBadParameters. Refuse texts with a NUL byte before
+/// you call: they are cut there.
 class OAUTHDBClientInfo : public OAUTHDBBasic {
  public:
   /// Opens the database; tabName is "oauth_clientInfo".

@@ -9,6 +9,6 @@ int main() {  // touches no file: the library's are the machine's own
   char* values[] = {value};
   Json::Value rows;
   ZEVOOAUTHSERVER::OAUTHDBToken::TabGetCallback(&rows, 1, values, columns);
-  std::cout << rows[0U]["username"].asString() << ' '
-            << ZEVOOAUTHSERVER::getRandomStr(64).size() << '\n';
+  std::cout << rows[0U]["username"].asString() << ' ' << ZEVOOAUTHSERVER::getRandomStr(64).size()
+            << '\n';
 }
