@@ -59,8 +59,7 @@ inline constexpr int kErrTableFull = -5;      ///< "... Table is full", with the
 ///
 /// "condition_like" and "option" enter the statement as they are, and so do names of columns and
 /// tables: never pass on a user's text. A value that holds a NUL byte makes SQLite refuse the
-/// statement (code 1, "unrecognized token"); "client_id" and "client_secret" end at it instead,
-/// because the host's encryption takes texts that end there.
+/// statement (code 1, "unrecognized token"); in "client_id" and "client_secret" it is kErrCrypt.
 class OAUTHDBBasic {
  public:
   /// Row callback, as sqlite3_exec() calls it; context is the result document.
@@ -192,7 +191,7 @@ class OAUTHDBBasic {
   /// the rest as it was (log only).
   /// \{
 
-  /// Replaces them by their encrypted forms. A value ends at its first NUL byte.
+  /// Replaces them by their encrypted forms. Fails for a value that holds a NUL byte.
   bool ParamEncrypt(Json::Value& doc);
   /// Replaces them by their plain forms.
   bool ParamDecrypt(Json::Value& doc);

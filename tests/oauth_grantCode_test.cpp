@@ -653,6 +653,8 @@ TEST_F(GrantCodeEditTest, RefusesANulInAValueTakenAsGiven) {
   log_.clear();
   EXPECT_EQ(0, longEdit(codes, 1, grantWith(&Grant::expired_time, "17" + nul + "'00")));
   expectUnclosedLiteral("Edit failed[oauth_grantCode]");
+  EXPECT_EQ(0, shortEdit(codes, 1, grantWith(&Grant::client_id, "c" + nul + times(62, 'x'))));
+  expectError(codes, -4, "Data Encrypt failed");
   EXPECT_EQ(before, rows());
 }
 

@@ -754,6 +754,8 @@ TEST_F(TokenEditTest, RefusesANulInAValueTakenAsGiven) {
   refused(shortEdit(tokens, 1, grantWith(&Grant::flow_type, "co" + nul + "'de")));
   refused(shortEdit(tokens, 1, grantWith(&Grant::state, "xyz" + nul)));
   refused(longEdit(tokens, 1, grantWith(&Grant::expired_time, "17" + nul + "00")));
+  EXPECT_EQ(0, shortEdit(tokens, 1, grantWith(&Grant::client_id, "c" + nul + times(62, 'x'))));
+  expectError(tokens, -4, "Data Encrypt failed");
   EXPECT_EQ(before, rows());
 }
 

@@ -249,6 +249,44 @@ TYPED_TEST(SweepTest, NeedsLittleRoomOnTheDisk) {
                           "3 oauth_db_basic.cpp Delete failed[" + this->table_ + "]"));
 }
 
+// SQLite then undoes the last statement alone and leaves the transaction open.
+TYPED_TEST(SweepTest, NeedsLittleRoomOnTheDiskBesideATrigger) {
+  const FaultyDisk disk;
+  this->insertExpired(200);
+  this->execute("UPDATE " + this->table_ + " SET state = hex(zeroblob(1000))");
+  this->onDeleteOf(0, "ABORT, 'never'");
+  TypeParam store(this->table_);
+  FaultyDisk::limitJournal(128 * 1024);
+  EXPECT_EQ(1, store.Purge());
+  EXPECT_TRUE(FaultyDisk::mend());
+  EXPECT_THAT(this->ids(), IsEmpty());
+  this->expectError(store, 13, "database or disk is full");
+}
+
+// The first sweep was rolled back and the second one cannot begin: every row is still there.
+TYPED_TEST(SweepTest, FailsWhenTheRowsCannotBeReadAgain) {
+  const FaultyDisk disk;
+  const std::string unread = "3 oauth_db_basic.cpp Get failed[" + this->table_ + "]";
+  int secondReads = 0;
+  for (int nth = 1; nth < 20; ++nth) {
+    SCOPED_TRACE(nth);
+    this->execute("DROP TRIGGER IF EXISTS t; DELETE FROM " + this->table_);
+    this->insertExpired(3);
+    this->onDeleteOf(2, "ROLLBACK, 'all back'");
+    TypeParam store(this->table_);
+    this->log_.clear();
+    FaultyDisk::fail(FaultyDisk::Call::kLock, nth, SQLITE_IOERR_LOCK);
+    const int result = store.Purge();
+    FaultyDisk::mend();
+    const Lines lines = this->log_.lines();
+    if (lines.size() < 3 || lines.back() != unread) continue;
+    ++secondReads;
+    EXPECT_EQ(0, result);
+    EXPECT_THAT(this->ids(), ElementsAre("1", "2", "3"));
+  }
+  EXPECT_GT(secondReads, 0);
+}
+
 // Wherever the one fault is: in a delete or in the commit.
 TYPED_TEST(SweepTest, SurvivesAMomentWithoutRoom) {
   const FaultyDisk disk;

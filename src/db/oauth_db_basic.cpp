@@ -88,8 +88,10 @@ bool holdsNoDatabase(const char* path) {
 // Makes an empty file of mode 0600 that belongs to this user, if nothing has the name yet. SQLite
 // would make it as root, with a mode that the umask decides.
 void makeFile(const char* path, uid_t user, gid_t group) {
-  const int file = open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR);
+  constexpr mode_t kMode = S_IRUSR | S_IWUSR;
+  const int file = open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode);
   if (file < 0) return;  // It exists, or sqlite3_open() reports what is wrong.
+  fchmod(file, kMode);   // Whatever the umask took away.
   static_cast<void>(!fchown(file, user, group));  // The file may stay with whoever made it.
   close(file);
 }
@@ -98,6 +100,7 @@ int openDatabase(sqlite3** db) {
   const char* const path = names::path::kDatabase;
   const uid_t user = geteuid();
   const gid_t group = getegid();
+  errno = 0;
   if (!holdsNoDatabase(path)) {
     const RaisedPrivilege raised;
     const int error = errno;
@@ -107,7 +110,10 @@ int openDatabase(sqlite3** db) {
     errno = error;
     if (mayOpen) return sqlite3_open(path, db);
   }
-  return sqlite3_open(path, db);
+  const int error = errno;
+  const int result = sqlite3_open(path, db);
+  errno = error;
+  return result;
 }
 
 // The file may come from anybody who can write its folder. Refuse statements that change SQLite's
@@ -127,8 +133,10 @@ bool convert(HostCipher cipher, const std::string& text, std::string& out) {
   return true;
 }
 
+// The host takes texts that end at a NUL byte, so it could not give back one that holds a NUL.
 bool EncryptValue(const std::string& plain, std::string& out) {
-  if (convert(ZOCLCryptSzEncrypt, plain, out)) return true;
+  const bool isWhole = plain.find('\0') == std::string::npos;
+  if (isWhole && convert(ZOCLCryptSzEncrypt, plain, out)) return true;
   OAUTH_FAIL("Data Encrypt failed");
   return false;
 }
@@ -267,8 +275,8 @@ bool OAUTHDBBasic::DBInit() {
 }
 
 // All or nothing, and only once: the first of several processes creates the table. The others
-// look again under the write lock and find it. A look-up that fails there is a failure, not a
-// missing table.
+// look again under the write lock and find it. (In the caller's own transaction the lock comes with
+// the first change.) A look-up that fails there is a failure, not a missing table.
 bool OAUTHDBBasic::createMetaTable() {
   Transaction transaction(*this, &OAUTHDBBasic::DBCmdRun);
   bool exists = false;

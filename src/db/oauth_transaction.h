@@ -35,17 +35,22 @@ class Transaction {
 
   bool begun() const { return begun_; }
 
-  // SQLite rolled everything back by itself after an error, for lack of room for example.
-  bool wasEnded() const { return begun_ && !isUnderWay(); }
+  // It cannot be committed whole: SQLite rolled everything back by itself after an error, or the
+  // disk has no room for the last statement, which SQLite then undoes alone on a table with
+  // triggers.
+  bool isLost() const {
+    const bool isFull = !isPart_ && (sqlite3_errcode(store_.db_) & 0xFF) == SQLITE_FULL;
+    return begun_ && (isFull || !isUnderWay());
+  }
 
   // True if what was done stands, which it does too where no transaction could begin.
   bool commit() {
     if (!begun_) return true;
-    if (!wasEnded() && execute(isPart_ ? "RELEASE zevooauth;" : "COMMIT;")) {
+    if (!isLost() && execute(isPart_ ? "RELEASE zevooauth;" : "COMMIT;")) {
       begun_ = false;
       return true;
     }
-    if (!wasEnded()) rollBack();
+    if (!isLost()) rollBack();
     return false;
   }
 

@@ -21,12 +21,12 @@ inline bool isExpired(const Json::Value& row, std::int64_t now) {
   return now > decimalValue(row[names::column::kExpiredTime]);
 }
 
-// Deletes every expired row of the store until stopped; a failed delete makes the result 0 and
-// does not stop the sweep. A failed read deletes nothing and counts as success.
+// Deletes every expired row of the store until stopped. A failed delete makes the result 0 and does
+// not stop the sweep. Where the rows cannot be read, unread is the result.
 template <class Store, class Stop>
-int deleteExpired(Store& store, std::int64_t now, Stop stop) {
+int deleteExpired(Store& store, std::int64_t now, int unread, Stop stop) {
   Json::Value rows(Json::arrayValue);
-  if (!store.Get(&rows)) return 1;
+  if (!store.Get(&rows)) return unread;
   int result = 1;
   for (const Json::Value& row : rows) {
     if (stop()) break;
@@ -36,18 +36,18 @@ int deleteExpired(Store& store, std::int64_t now, Stop stop) {
 }
 
 // In one transaction, since a commit for every row would make the disk write four times for each.
-// SQLite ends the transaction by itself when the disk has no room for all of it. Then the sweep
-// starts again and commits row by row, which needs little room.
+// Where the disk has no room for all of it, the sweep starts again and commits row by row, which
+// needs little room. A failed first read deletes nothing and counts as success.
 template <class Store>
 int purgeExpired(Store& store) {
   const std::int64_t now = unixNow();
   {
     Transaction transaction(store, &OAUTHDBBasic::DBCmd);
-    const int result = deleteExpired(store, now, [&] { return transaction.wasEnded(); });
+    const int result = deleteExpired(store, now, 1, [&] { return transaction.isLost(); });
     if (transaction.commit()) return result;
-    if (!transaction.wasEnded()) return 0;  // Another process held the file for too long.
+    if (!transaction.isLost()) return 0;  // Another process held the file for too long.
   }
-  return deleteExpired(store, now, [] { return false; });
+  return deleteExpired(store, now, 0, [] { return false; });
 }
 
 }  // namespace ZEVOOAUTHSERVER

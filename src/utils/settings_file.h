@@ -19,7 +19,7 @@ enum class SettingsState {
   kNotAnObject,
 };
 
-inline constexpr std::size_t kLargestSettings = 1024 * 1024;
+inline constexpr std::size_t kLargestSettings = 1'048'576;
 
 // Reads the settings file at the path. The document is an object after kRead, and null or of no use
 // after anything else. Never waits, whatever lies at the path.

@@ -116,13 +116,15 @@ class GrantCodeFuzz {
     const Grant grant(input_);
     const int success = codes_.Edit(id, grant.user, grant.client, grant.scope, grant.state);
     if (!grant.good()) return world_.expect(codes_, success, 0);
+    if (hasNul(grant.client))
+      return world_.expect(codes_, success, world_.fail(-4, "Data Encrypt failed"));
     if (const std::string refusal = refusalOf({grant.scope, grant.state, grant.user});
         !refusal.empty())
       return world_.expect(codes_, success, world_.fail(1, refusal));
     const auto row = world_.rows(kTable).find(id);
     if (row == world_.rows(kTable).end()) return world_.expect(codes_, success, 0);
     row->second["username"] = grant.user;
-    row->second["client_id"] = FakeHost::sealed(untilNul(grant.client));
+    row->second["client_id"] = FakeHost::sealed(grant.client);
     row->second["scope"] = grant.scope;
     row->second["state"] = grant.state;
     world_.expect(codes_, success, 1);

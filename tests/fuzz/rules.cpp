@@ -4,6 +4,8 @@
 
 #include <limits>
 
+bool hasNul(const std::string& value) { return value.find('\0') != std::string::npos; }
+
 std::string untilNul(const std::string& value) { return value.substr(0, value.find('\0')); }
 
 std::string doubled(const std::string& value) {
@@ -14,8 +16,7 @@ std::string doubled(const std::string& value) {
 
 std::string refusalOf(const std::vector<std::string>& values) {
   for (const std::string& value : values)
-    if (value.find('\0') != std::string::npos)
-      return "unrecognized token: \"'" + doubled(value) + "\"";
+    if (hasNul(value)) return "unrecognized token: \"'" + doubled(value) + "\"";
   return {};
 }
 

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+bool hasNul(const std::string& value);
 // The value up to its first NUL byte.
 std::string untilNul(const std::string& value);
 // The same with every single quote doubled: what a store keeps of a value that it quotes.

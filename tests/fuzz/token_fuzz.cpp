@@ -127,13 +127,15 @@ class TokenFuzz {
     const int success =
         tokens_.Edit(id, grant.user, grant.client, grant.scope, grant.flow, grant.state);
     if (!grant.good()) return world_.expect(tokens_, success, world_.fail(-2, "Bad parameters"));
+    if (hasNul(grant.client))
+      return world_.expect(tokens_, success, world_.fail(-4, "Data Encrypt failed"));
     if (const std::string refusal = refusalOf({grant.flow, grant.scope, grant.state, grant.user});
         !refusal.empty())
       return world_.expect(tokens_, success, world_.fail(1, refusal));
     const auto row = world_.rows(kTable).find(id);
     if (row == world_.rows(kTable).end()) return world_.expect(tokens_, success, 0);
     row->second["username"] = grant.user;
-    row->second["client_id"] = FakeHost::sealed(untilNul(grant.client));
+    row->second["client_id"] = FakeHost::sealed(grant.client);
     row->second["scope"] = grant.scope;
     row->second["flow_type"] = grant.flow;
     row->second["state"] = grant.state;
