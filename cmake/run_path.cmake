@@ -1,5 +1,4 @@
-# Where what will be installed looks for libraries: in the build's folders while it lies there,
-# nowhere of its own afterwards. CMake would end a run path that it changes on installing with an
+# A built program finds its libraries in the build's folders. An installed one has no run path. CMake would end a run path that it changes on installing with an
 # empty entry, which the loader reads as the current folder, where anybody may have put a library.
 
 function(set_run_path target)  # FOLDER...

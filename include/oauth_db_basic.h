@@ -34,8 +34,9 @@ inline constexpr int kErrTableFull = -5;      ///< "... Table is full", with the
 ///
 /// Opening and closing raise the effective user and group id of the whole process to root for the
 /// length of that one call: no other thread may depend on the ids meanwhile. Where a link or
-/// anything else that is not a regular file lies in the database's place, it is opened without.
-/// Compare geteuid() and getegid() afterwards if the system might refuse to restore the ids.
+/// anything else that is not a regular file lies in the database's place, it is opened without
+/// raised ids. Compare geteuid() and getegid() afterwards if the system might refuse to restore the
+/// ids.
 ///
 /// Many processes may use the file at once: each statement waits up to 5 seconds for the others
 /// and then fails with SQLite's code 5, "database is locked".
@@ -43,7 +44,8 @@ inline constexpr int kErrTableFull = -5;      ///< "... Table is full", with the
 /// Operations return true, or non-zero, on success. A failure leaves its reason in GetErrCode()
 /// and GetErrMsg(), unless its comment says "log only"; a success leaves the previous error there.
 /// Log only, for every operation: no row to change or delete, and a store that is not ready, whose
-/// error still tells why it is not.
+/// error still tells why it is not. (Add() of clients, codes and tokens then leaves kErrTableFull,
+/// since it cannot count the rows. So look at GetErrCode() after the construction.)
 ///
 /// Two document shapes come back throughout. Rows, numbers as decimal text, "client_id" and
 /// "client_secret" decrypted:

@@ -68,10 +68,11 @@ class OAUTHDBToken : public OAUTHDBBasic {
   /// Row id of the access token, its low 32 bits; 0 for an unknown token or a failed look-up.
   int GetIndex(const std::string& access_token);
 
-  /// Deletes every row whose access token has expired, refresh token included, in one transaction
-  /// or as a part of the caller's. Where the disk has no room for that, it commits row by row,
-  /// and the error of the first attempt stays. 0 only if a row could not be deleted: a failed read
-  /// deletes nothing and is a success, though it leaves its error.
+  /// Deletes every row whose access token has expired, refresh token included, in one transaction.
+  /// Where the disk has no room for that, it commits row by row, and the error of the first attempt
+  /// stays. Inside a transaction of the caller it is a part of that one, and fails if SQLite ends
+  /// it. 0 only if a row could not be deleted: a failed read deletes nothing and is a success,
+  /// though it leaves its error.
   int Purge();
 
   /// Checks a presented access token against the clock.

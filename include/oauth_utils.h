@@ -49,8 +49,8 @@ std::string getSQLFormatLikeStr(const std::string& column, const std::string& va
 
 /// Random lower-case hexadecimal digits for secrets: version-4 UUIDs (RFC 4122) without hyphens,
 /// from the operating system: getrandom(), or "/dev/urandom" where the kernel lacks or refuses that
-/// call. The length is rounded up to a multiple of 32: 40 gives 64 digits, 0 gives none. Empty if both sources fail,
-/// which the stores then refuse as too short: a guessable secret would be worse.
+/// call. The length is rounded up to a multiple of 32: 40 gives 64 digits, 0 gives none. Empty if
+/// both sources fail, which the stores then refuse as too short: a guessable secret would be worse.
 std::string getRandomStr(unsigned int length);
 
 }  // namespace ZEVOOAUTHSERVER

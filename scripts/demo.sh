@@ -11,6 +11,10 @@ if ! mkdir -p "$data" 2>/dev/null || [ ! -w "$data" ]; then
   echo "demo: cannot write to $data: run it as root, or as the owner of that folder" >&2
   exit 1
 fi
+if [ ! -O "$data" ]; then # what root makes there would be closed to the folder's owner
+  echo "demo: $data belongs to somebody else: run it as that user" >&2
+  exit 1
+fi
 scripts/packages.sh build
 folder=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=OFF |
   tail -n 1)

@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# scripts/test.sh, and what runs in a private /var, where they have most against them: in a copy of
+# scripts/test.sh, and what runs in a private /var, in the hardest place: in a copy of
 # the checkout below /var, in a home that is closed to others, at a path with a blank, entered
 # through a symbolic link. The copy, and what is built from it, is removed in the end.
 set -euo pipefail

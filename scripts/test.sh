@@ -6,6 +6,10 @@ set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
 trap '[ $? -eq 0 ] || echo "test: failed" >&2' EXIT
+if [ ! -e /dev/pts/ptmx ]; then
+  echo "test: /dev/pts is not mounted, which the tests of prompts need" >&2
+  exit 1
+fi
 scripts/packages.sh build test
 folder=$(scripts/build.sh tsan tsan -- threads_test | tail -n 1)
 ctest --test-dir "$folder" --output-on-failure --tests-regex '^ThreadsTest'

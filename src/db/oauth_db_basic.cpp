@@ -78,8 +78,8 @@ class RaisedPrivilege {
 
 constexpr int kBusyTimeout = 5000;  // milliseconds
 
-// True if the path holds something other than a regular file. Root must not open it: a link would
-// choose the file.
+// True if the path holds something other than a regular file. Root must not open it: whoever made a
+// link would choose the file.
 bool holdsNoDatabase(const char* path) {
   struct stat status;
   return lstat(path, &status) == 0 && !S_ISREG(status.st_mode);
@@ -92,7 +92,7 @@ void makeFile(const char* path, uid_t user, gid_t group) {
   const int file = open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode);
   if (file < 0) return;  // It exists, or sqlite3_open() reports what is wrong.
   fchmod(file, kMode);   // Whatever the umask took away.
-  static_cast<void>(!fchown(file, user, group));  // The file may stay with whoever made it.
+  static_cast<void>(!fchown(file, user, group));  // If this is refused, the file stays root's.
   close(file);
 }
 

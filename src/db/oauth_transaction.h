@@ -43,7 +43,10 @@ class Transaction {
     return begun_ && (isFull || !isUnderWay());
   }
 
-  // True if what was done stands, which it does too where no transaction could begin.
+  // The caller has begun it.
+  bool isPart() const { return isPart_; }
+
+  // True if the changes are kept. Where no transaction could begin, each was committed already.
   bool commit() {
     if (!begun_) return true;
     if (!isLost() && execute(isPart_ ? "RELEASE zevooauth;" : "COMMIT;")) {

@@ -45,7 +45,9 @@ int purgeExpired(Store& store) {
     Transaction transaction(store, &OAUTHDBBasic::DBCmd);
     const int result = deleteExpired(store, now, 1, [&] { return transaction.isLost(); });
     if (transaction.commit()) return result;
-    if (!transaction.isLost()) return 0;  // Another process held the file for too long.
+    // Another process held the file for too long, or the caller's transaction is gone: what was
+    // deleted came back.
+    if (!transaction.isLost() || transaction.isPart()) return 0;
   }
   return deleteExpired(store, now, 0, [] { return false; });
 }

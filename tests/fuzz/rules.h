@@ -12,8 +12,8 @@ bool hasNul(const std::string& value);
 std::string untilNul(const std::string& value);
 // The same with every single quote doubled: what a store keeps of a value that it quotes.
 std::string doubled(const std::string& value);
-// What SQLite says of a statement with these values taken as given, in this order: of the first
-// one with a NUL byte, where the statement ends; "" if there is none.
+// SQLite's error for the first of these values that holds a NUL byte; "" if none does. The values
+// stand in the statement as given and in this order.
 std::string refusalOf(const std::vector<std::string>& values);
 // Whether the text is min to max bytes long.
 bool fits(const std::string& text, std::size_t min, std::size_t max);

@@ -481,12 +481,12 @@ TEST_F(HostileFolderTest, DatabaseOfRootIsNotReadForItsOwner) {
   fillDatabase();
   ASSERT_EQ(0, chown(files_.database().c_str(), 0, 0));
   for (const Words& words : kEveryCommand)
-    EXPECT_EQ("3 user 65534, who owns the folder, may not read " + files_.database() +
+    EXPECT_EQ("3 user 65534, whose ids root takes here, may not read " + files_.database() +
                   ": run 'chown -h 65534 " + files_.database() + "', it belongs to user 0",
               complaint(run(words)));
   chmod(files_.database().c_str(), 0644);
   EXPECT_EQ(0, run({"token", "list"}).code);
-  EXPECT_EQ("3 user 65534, who owns the folder, may not write " + files_.database() +
+  EXPECT_EQ("3 user 65534, whose ids root takes here, may not write " + files_.database() +
                 ": run 'chown -h 65534 " + files_.database() + "', it belongs to user 0",
             complaint(run({"token", "purge", "--yes"})));
 }
@@ -497,7 +497,7 @@ TEST_F(HostileFolderTest, OtherNameOfAFileOfRootIsNotToBeGivenAway) {
   fs::create_hard_link(victim(), files_.database(), refused);
   ASSERT_FALSE(refused) << refused.message();
   ASSERT_EQ(0, chown(files_.directory().c_str(), kNobody, kNobody));
-  EXPECT_EQ("3 user 65534, who owns the folder, may not read " + files_.database() +
+  EXPECT_EQ("3 user 65534, whose ids root takes here, may not read " + files_.database() +
                 ": it has other names too, find out who made it",
             complaint(run({"status"})));
   expectVictimUntouched();
@@ -529,6 +529,54 @@ TEST_F(HostileFolderTest, FolderOfRootThatOthersMayWriteIsTheOnlyFinding) {
       files_.directory() + " has mode 0777: others can replace the database. To do: chmod go-w.\n",
       outcome.out);
   EXPECT_EQ(contents, databaseBytes());
+}
+
+// Its owner can put a link to any folder of root's in the place of the last one.
+TEST_F(HostileFolderTest, FolderAboveOfAnotherUserDecidesWhoRootBecomes) {
+  ASSERT_EQ(0, mkdir(path("target").c_str(), 0755));
+  ASSERT_EQ(0, chmod(files_.directory().c_str(), 0755));
+  ASSERT_EQ(0, symlink(rootsFolder_.c_str(), path("target/etc").c_str()));
+  ASSERT_EQ(0, lchown(path("target").c_str(), kNobody, kNobody));
+  environment_ = {"OAUTHCTL_FOLDER=" + path("target/etc")};
+  for (const Words& words : kEveryCommand)
+    EXPECT_EQ("3 user 65534, whose ids root takes here, may not look into " + path("target/etc") +
+                  ": it belongs to user 0, find out who put it there",
+              complaint(run(words)));
+  for (const auto& entry : fs::directory_iterator(rootsFolder_))
+    EXPECT_EQ(victim(), entry.path().string());
+  expectVictimUntouched();
+}
+
+TEST_F(HostileFolderTest, FolderAboveThatOthersMayWriteIsRefused) {
+  for (const char* const name : {"target", "target/etc"})
+    ASSERT_EQ(0, mkdir(path(name).c_str(), 0755));
+  ASSERT_EQ(0, chmod(path("target").c_str(), 0777));
+  environment_ = {"OAUTHCTL_FOLDER=" + path("target/etc")};
+  EXPECT_EQ("3 " + path("target") +
+                " belongs to root and others may write to it, which makes root do what they want: "
+                "chown it to the server's user, or chmod go-w",
+            complaint(run({"status"})));
+  EXPECT_EQ(
+      path("target") + " has mode 0777: others can replace the database. To do: chmod go-w.\n",
+      run({"check"}).out);
+}
+
+// SQLite would wait for ever to open a pipe, and would follow a link.
+TEST_F(HostileFolderTest, JournalThatIsNoFileIsRefused) {
+  fillDatabase();
+  for (const std::string name : {"oauth.db-journal", "oauth.db-wal", "oauth.db-shm"}) {
+    for (const bool isLink : {false, true}) {
+      if (isLink)
+        plantLink(victim(), name);
+      else
+        ASSERT_EQ(0, mkfifo(path(name).c_str(), 0666));
+      for (const Words& words : kEveryCommand)
+        EXPECT_EQ("3 " + path(name) + " is not a regular file: find out who made it, and remove it",
+                  complaint(run(words)));
+      fs::remove(path(name));
+    }
+  }
+  expectNothingGivenAway();
 }
 
 // The files of a first registration, encryption key included.

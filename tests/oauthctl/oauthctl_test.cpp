@@ -106,10 +106,10 @@ pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asN
 Outcome OauthctlTest::run(const Words& words, const std::string& input) const {
   Pipe in, out, err;
   const pid_t child = start(words, in.ends[0], out.ends[1], err.ends[1], false);
-  close(in.ends[0]);
   close(out.ends[1]);
   close(err.ends[1]);
-  writeAll(in.ends[1], input);
+  writeAll(in.ends[1], input);  // while an end to read from is open here, too: no SIGPIPE
+  close(in.ends[0]);
   close(in.ends[1]);
   Outcome outcome;
   std::thread errors([&] { outcome.err = readAll(err.ends[0]); });

@@ -18,7 +18,7 @@ class FaultyDisk {
   static void fail(Call call, int nth, int code);
   // Only so many more writes succeed; then the disk is full.
   static void fillAfter(int writes);
-  // A rollback journal has room for so many bytes; the disk is full beyond them.
+  // A rollback journal may grow to this many bytes; then the disk is full.
   static void limitJournal(int bytes);
   // The n-th call that changes a file (write, sync, truncate, delete) kills the process: a write
   // when half of it is done, the others before they begin.

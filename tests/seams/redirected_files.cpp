@@ -144,7 +144,7 @@ extern "C" char* sqlite3_mprintf(const char* format, ...) {
 
 extern "C" ssize_t getrandom(void* buffer, size_t size, unsigned flags) {
   const OwnWork seam;
-  state.interrupt = state.trickle && !state.interrupt;
+  if (state.trickle) state.interrupt = !state.interrupt;
   if (state.randomError != 0 || state.interrupt) {
     errno = state.interrupt ? EINTR : state.randomError;
     return -1;

@@ -38,7 +38,7 @@ DatabaseImage readLive() try {
                                      "), no backup was made: see 'oauthctl check'");
 }
 
-// What a reader will find in the file is a database, too.
+// Reads the new file back and checks that it is a sound database.
 void requireSound(const NewFile& file) {
   Findings problems;
   try {
@@ -95,7 +95,7 @@ void backUp(const Invocation& invocation) {
   say("wrote " + target + ": " + image.summary());
 }
 
-// The backup is the operator's too.
+// The backup is read before root takes the owner's ids: it is the operator's.
 void restore(const Invocation& invocation) {
   const std::string source = operand(invocation);
   BackupFile backup = readBackupFile(source);

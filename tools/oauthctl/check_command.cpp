@@ -56,8 +56,9 @@ void print(const Findings& findings, bool asJson) {
 }
 
 Findings findAll() {
-  // There is no further look at what others may have put there.
-  if (DatabaseFolder::enter().isUnsafe()) return checkFolder();
+  // Root looks no further: others may have put anything there.
+  if (const std::string unsafe = DatabaseFolder::enter().unsafeForRoot(); !unsafe.empty())
+    return checkFolder(unsafe);
   requireDatabase(Access::kRead);
   Findings findings = checkFiles();
   const Findings journal = checkJournal();

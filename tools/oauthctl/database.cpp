@@ -98,6 +98,11 @@ std::string asGiven(const std::string& stored) {
 
 long long idOf(const Json::Value& row) { return number(row["id"].asString()).value_or(0); }
 
+Json::Value idValue(const Json::Value& row) {
+  const auto result = number(row["id"].asString());
+  return result ? Json::Value(static_cast<Json::Int64>(*result)) : row["id"];
+}
+
 long long idForChange(const Json::Value& row) {
   const std::string id = row["id"].asString();
   const auto result = number(id);

@@ -57,8 +57,10 @@ std::string asGiven(const std::string& stored);
 
 // A row's id, which comes as decimal text; 0 if it is no number.
 long long idOf(const Json::Value& row);
-// The id of a row that is to be changed or deleted. Throws if it is no number, since what stands
-// for it would be another row's.
+// The id for a document: a number, or the text that somebody put there.
+Json::Value idValue(const Json::Value& row);
+// The id of a row that is to be changed or deleted. Throws if it is no number: idOf()
+// gives 0 then, which may be another row's id.
 long long idForChange(const Json::Value& row);
 
 }  // namespace oauthctl

@@ -21,36 +21,51 @@ namespace {
 // Root who works with the owner's ids is told how to help the owner.
 [[noreturn]] void mayNot(const std::string& what, const std::string& remedy) {
   const DatabaseFolder& folder = DatabaseFolder::enter();
-  if (!folder.isOwnersView())
+  if (!folder.user())
     unavailable("you may not " + what + ": run oauthctl as root or as the server's user");
-  unavailable("user " + std::to_string(folder.owner()) + ", who owns the folder, may not " + what +
-              ": " + remedy);
+  unavailable("user " + std::to_string(*folder.user()) + ", whose ids root takes here, may not " +
+              what + ": " + remedy);
 }
 
 void requireFolder(int mode, const std::string& what) {
   const std::string path = fixed_paths::folder();
-  if (!DatabaseFolder::enter().may(".", mode))
-    mayNot(what + " " + path, "run 'chmod u+rwx " + path + "'");
+  const DatabaseFolder& folder = DatabaseFolder::enter();
+  if (folder.may(".", mode)) return;
+  std::string remedy = "run 'chmod u+rwx " + path + "'";
+  if (folder.owner() != folder.user().value_or(geteuid()))
+    remedy = "it belongs to user " + std::to_string(folder.owner()) + ", find out who put it there";
+  mayNot(what + " " + path, remedy);
 }
 
 void requireFile(const struct stat& status, int mode, const char* what) {
   const std::string path = fixed_paths::database();
   const DatabaseFolder& folder = DatabaseFolder::enter();
   if (folder.may(nameOf(path), mode)) return;
-  // Nothing that would give away a file behind a link, or behind another name.
-  std::string remedy = "run 'chown -h " + std::to_string(folder.owner()) + " " + path +
+  // Name no command that would hand over another file: one behind a link or a second name.
+  const uid_t user = folder.user().value_or(geteuid());
+  std::string remedy = "run 'chown -h " + std::to_string(user) + " " + path +
                        "', it belongs to user " + std::to_string(status.st_uid);
-  if (status.st_uid == folder.owner()) remedy = "run 'chmod u+rw " + path + "'";
+  if (status.st_uid == user) remedy = "run 'chmod u+rw " + path + "'";
   if (status.st_nlink > 1) remedy = "it has other names too, find out who made it";
   mayNot(std::string(what) + " " + path, remedy);
+}
+
+// SQLite would wait for ever to open a pipe.
+void requireRegularNeighbours() {
+  for (const char* const suffix : {"-journal", "-wal", "-shm"}) {
+    const std::string path = fixed_paths::database() + suffix;
+    const std::optional<struct stat> status = DatabaseFolder::enter().look(nameOf(path));
+    if (status && !S_ISREG(status->st_mode))
+      unavailable(path + " is not a regular file: find out who made it, and remove it");
+  }
 }
 
 }  // namespace
 
 void requireDatabase(Access access) {
   const std::string path = fixed_paths::database();
-  if (DatabaseFolder::enter().isUnsafe())
-    unavailable(fixed_paths::folder() +
+  if (const std::string unsafe = DatabaseFolder::enter().unsafeForRoot(); !unsafe.empty())
+    unavailable(unsafe +
                 " belongs to root and others may write to it, which makes root do what they want: "
                 "chown it to the server's user, or chmod go-w");
   requireFolder(X_OK, "look into");
@@ -62,6 +77,7 @@ void requireDatabase(Access access) {
     unavailable("there is no database " + path + ": 'oauthctl client add' or the server makes it");
   }
   if (S_ISLNK(status->st_mode)) unavailable(path + " is a link: put the database itself there");
+  requireRegularNeighbours();
   if (!S_ISREG(status->st_mode)) unavailable(path + " is not a regular file");
   requireFile(*status, R_OK, "read");
   if (access != Access::kRead) requireFile(*status, W_OK, "write");

@@ -5,6 +5,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <sstream>
 
 #include "effective_ids.h"
 #include "exit_code.h"
@@ -17,9 +18,10 @@ namespace {
   throw Failure(ExitCode::kUnavailable, line);
 }
 
-int openFolder(const std::string& path) {
-  const int descriptor = open(path.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
+int openFolder(int parent, const std::string& name) {
+  const int descriptor = openat(parent, name.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
   if (descriptor >= 0) return descriptor;
+  const std::string path = fixed_paths::folder();
   if (errno == ENOENT || errno == ENOTDIR)
     unavailable("there is no folder " + path + " for the database: is the server installed?");
   if (errno == EACCES)
@@ -29,17 +31,35 @@ int openFolder(const std::string& path) {
 
 }  // namespace
 
-DatabaseFolder::DatabaseFolder() : descriptor_(openFolder(fixed_paths::folder())) {
-  if (fstat(descriptor_, &status_) != 0)
-    unavailable("cannot look at " + fixed_paths::folder() + ": " + std::strerror(errno));
-  if (geteuid() != 0 || status_.st_uid == 0) return;
-  becomeUser(status_.st_uid, status_.st_gid);
-  isOwnersView_ = true;
+// Step by step from the root folder: whoever owns a folder on the way can replace what is below.
+DatabaseFolder::DatabaseFolder() : descriptor_(openFolder(AT_FDCWD, "/")) {
+  std::istringstream names(fixed_paths::folder());
+  std::string path;
+  for (std::string name; std::getline(names, name, '/');) {
+    if (name.empty()) continue;
+    path += "/" + name;
+    descriptor_ = Descriptor(openFolder(descriptor_.value(), name));
+    enterFolder(path);
+  }
+  // Others can put files beside the database, whom the folder's sticky bit does not hinder.
+  if (isOpenToOthers()) unsafe_ = path;
 }
 
-bool DatabaseFolder::isUnsafe() const {
-  return geteuid() == 0 && (status_.st_mode & (S_IWGRP | S_IWOTH)) != 0;
+void DatabaseFolder::enterFolder(const std::string& path) {
+  if (fstat(descriptor_.value(), &status_) != 0)
+    unavailable("cannot look at " + path + ": " + std::strerror(errno));
+  if (geteuid() != 0) return;
+  if (status_.st_uid != 0) {
+    becomeUser(status_.st_uid, status_.st_gid);
+    user_ = status_.st_uid;
+  } else if (isOpenToOthers() && (status_.st_mode & S_ISVTX) == 0) {
+    unsafe_ = path;
+  }
 }
+
+bool DatabaseFolder::isOpenToOthers() const { return (status_.st_mode & (S_IWGRP | S_IWOTH)) != 0; }
+
+std::string DatabaseFolder::unsafeForRoot() const { return geteuid() == 0 ? unsafe_ : ""; }
 
 const DatabaseFolder& DatabaseFolder::enter() {
   static const DatabaseFolder folder;
@@ -48,12 +68,13 @@ const DatabaseFolder& DatabaseFolder::enter() {
 
 std::optional<struct stat> DatabaseFolder::look(const std::string& name) const {
   struct stat status;
-  if (fstatat(descriptor_, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return std::nullopt;
+  if (fstatat(descriptor_.value(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0)
+    return std::nullopt;
   return status;
 }
 
 bool DatabaseFolder::may(const std::string& name, int mode) const {
-  return faccessat(descriptor_, name.c_str(), mode, AT_EACCESS) == 0;
+  return faccessat(descriptor_.value(), name.c_str(), mode, AT_EACCESS) == 0;
 }
 
 std::string nameOf(const std::string& path) { return path.substr(path.rfind('/') + 1); }

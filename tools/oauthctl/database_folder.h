@@ -9,22 +9,26 @@
 #include <optional>
 #include <string>
 
+#include "descriptor.h"
+
 namespace oauthctl {
 
 class DatabaseFolder {
  public:
-  // Opens the folder. If root runs this program, it becomes the folder's owner until the program
-  // ends. Make the first call after the operator's own files are open, and before anything in the
-  // folder is touched. Throws what stands in the way.
+  // Opens the folder. If root runs this program, it becomes the user who owns the folder, or the
+  // first folder above that is not root's, until the program ends. Make the first call after the
+  // operator's own files are open, and before anything in the folder is touched. Throws what stands
+  // in the way.
   static const DatabaseFolder& enter();
 
-  int descriptor() const { return descriptor_; }
-  // Root has become the owner.
-  bool isOwnersView() const { return isOwnersView_; }
-  // Root runs this program in a folder of root's that others may write to: there is no other owner
-  // to become, and others decide what a program of root's does there.
-  bool isUnsafe() const;
+  int descriptor() const { return descriptor_.value(); }
   uid_t owner() const { return status_.st_uid; }
+  // The user whom root has become.
+  std::optional<uid_t> user() const { return user_; }
+  // The folder, or the one above it, that belongs to root and that others may write to, if root
+  // runs this program: there is no other user to become, and others decide what root does there.
+  // "" if there is none.
+  std::string unsafeForRoot() const;
 
   // The entry itself, not what a link names; nothing, with errno set, if it cannot be had.
   std::optional<struct stat> look(const std::string& name) const;
@@ -33,10 +37,13 @@ class DatabaseFolder {
 
  private:
   DatabaseFolder();
+  void enterFolder(const std::string& path);
+  bool isOpenToOthers() const;
 
-  const int descriptor_;  // as long as the program runs
+  Descriptor descriptor_;  // as long as the program runs
   struct stat status_ = {};
-  bool isOwnersView_ = false;
+  std::optional<uid_t> user_;
+  std::string unsafe_;
 };
 
 // The last part of a path.

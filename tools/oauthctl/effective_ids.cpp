@@ -15,7 +15,7 @@ namespace {
 
 constexpr uid_t kRoot = 0, kKeep = static_cast<uid_t>(-1);
 
-// The group comes while the process is root, which alone may change it.
+// Changes the group first, as root: only root may change it.
 bool take(Ids ids) {
   const Ids now = effectiveIds();
   if (now.user == ids.user && now.group == ids.group) return true;

@@ -29,7 +29,7 @@ void checkOwner(const std::string& path, const struct stat& status, const struct
   if (status.st_uid == folder.st_uid) return;
   findings.push_back({path + " belongs to user " + std::to_string(status.st_uid) +
                           " and its folder to user " + std::to_string(folder.st_uid),
-                      "chown both to the server's user"});
+                      "give both to the server's user by chown -h"});
 }
 
 // SQLite's locks for writing: one byte that says "pending", one that says "reserved", and the range
@@ -64,8 +64,7 @@ bool sameFile(const std::optional<struct stat>& a, const std::optional<struct st
 
 }  // namespace
 
-Findings checkFolder() {
-  const std::string path = fixed_paths::folder();
+Findings checkFolder(const std::string& path) {
   struct stat folder;
   if (stat(path.c_str(), &folder) != 0 || (folder.st_mode & (S_IWGRP | S_IWOTH)) == 0) return {};
   return {{path + " has mode " + octal(folder.st_mode) + ": others can replace the database",
@@ -82,9 +81,9 @@ Findings checkFiles() {
     findings.push_back({path + " has other names too (" + std::to_string(file->st_nlink - 1) + ")",
                         "remove the other links, copies are made by 'oauthctl backup'"});
   if ((file->st_mode & (S_IRWXO | S_IWGRP | S_IXGRP)) != 0)
-    findings.push_back({path + " has mode " + octal(file->st_mode) + ", open to other users",
-                        "chmod 600, and set the programs' umask to 077"});
-  for (const Finding& finding : checkFolder()) findings.push_back(finding);
+    findings.push_back(
+        {path + " has mode " + octal(file->st_mode) + ", open to other users", "chmod 600"});
+  for (const Finding& finding : checkFolder(directory)) findings.push_back(finding);
   checkOwner(path, *file, folder, findings);
   return findings;
 }
@@ -96,10 +95,11 @@ Findings checkJournal() {
   const std::optional<struct stat> found = look(journal);
   if (!found || !holdsSomething(journal) || somebodyWrites(path) || !sameFile(found, look(journal)))
     return {};
-  return {{journal + " is left over, of user " + std::to_string(found->st_uid) + " and mode " +
-               octal(found->st_mode) + ": a program died while it wrote. Contents not checked",
-           "never delete it: give it to the folder's owner, run 'oauthctl status', which rolls it "
-           "back, and check again"}};
+  return {
+      {journal + " is left over, of user " + std::to_string(found->st_uid) + " and mode " +
+           octal(found->st_mode) + ": a program died while it wrote. Contents not checked",
+       "never delete it: give it to the folder's owner by chown -h, run 'oauthctl status', which "
+       "rolls it back, and check again"}};
 }
 
 Findings checkSettings() {
@@ -107,11 +107,12 @@ Findings checkSettings() {
   const std::string path = fixed_paths::settings();
   const std::optional<struct stat> file = look(path);
   struct stat folder;
-  if (file && (file->st_mode & (S_IWGRP | S_IWOTH)) != 0)
+  if (file && S_ISREG(file->st_mode) && (file->st_mode & (S_IWGRP | S_IWOTH)) != 0)
     findings.push_back(
         {path + " has mode " + octal(file->st_mode) + ", others may write it", "chmod go-w"});
   // Root may keep the settings to himself.
-  if (file && file->st_uid != 0 && stat(fixed_paths::folder().c_str(), &folder) == 0)
+  if (file && S_ISREG(file->st_mode) && file->st_uid != 0 &&
+      stat(fixed_paths::folder().c_str(), &folder) == 0)
     checkOwner(path, *file, folder, findings);
   const SettingsReport report = readSettings();
   if (!report.problem.empty())

@@ -2,14 +2,16 @@
 
 #pragma once
 
+#include <string>
+
 #include "finding.h"
 
 namespace oauthctl {
 
-// The mode of the database's folder.
-Findings checkFolder();
+// The mode of the database's folder, or of one above it.
+Findings checkFolder(const std::string& path);
 
-// Kind, owner and mode of the database and its folder.
+// Owner, mode and names of the database and its folder.
 Findings checkFiles();
 
 // A journal that a program left behind when it died. Its rows are not all in the database, and the

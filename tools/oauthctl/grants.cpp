@@ -131,7 +131,7 @@ std::string expiryText(const Json::Value& row, std::int64_t now) {
 Json::Value grantDocument(const GrantKind& kind, const Json::Value& row, const Registry& registry,
                           bool showSecrets) {
   Json::Value document;
-  document["id"] = static_cast<Json::Int64>(idOf(row));
+  document["id"] = idValue(row);
   for (const char* const column : {"username", "scope", "state", "flow_type"})
     if (row.isMember(column)) document[column] = asGiven(row[column].asString());
   document["ip"] = row["ip"];

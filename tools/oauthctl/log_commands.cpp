@@ -44,7 +44,7 @@ Json::Value matchingLines(const std::string& text) {
           [&] { return log.Get("", "ORDER BY timestamp, id", &rows) != 0; });
   for (const Json::Value& row : rows) {
     Json::Value line;
-    line["id"] = static_cast<Json::Int64>(idOf(row));
+    line["id"] = idValue(row);
     line["timestamp"] = static_cast<Json::Int64>(number(row["timestamp"].asString()).value_or(0));
     line["msg"] = asGiven(row["msg"].asString());
     if (contains(line["msg"].asString(), text)) lines.append(line);

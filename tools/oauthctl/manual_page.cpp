@@ -118,7 +118,7 @@ std::string exitStatus() {
          entry("2", "Wrong usage. Nothing was changed.") +
          entry("3",
                "The database is busy or cannot be opened. Nothing was changed. Programs "
-               "are waited for during 5 seconds.");
+               "are waited for during 5 to 10 seconds.");
 }
 
 std::string files() {

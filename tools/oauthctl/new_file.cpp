@@ -80,7 +80,8 @@ void NewFile::requireFreeName() const {
     throw Failure(ExitCode::kUsage, path_ + " exists, and no file is ever replaced");
 }
 
-// Such a file is gone with this process, however that ends. It gets its name through /proc.
+// The kernel removes such a file when the process ends. publish() names it through /proc; without
+// /proc makeNamed() is used.
 void NewFile::makeUnnamed() {
   Descriptor file(openat(folder_.value(), ".", O_TMPFILE | O_RDWR | O_CLOEXEC, kMode));
   struct stat status;
@@ -141,8 +142,8 @@ bool NewFile::name() const {
                 AT_SYMLINK_FOLLOW) == 0;
 }
 
-// For a file system where no file has two names, and where there is no /proc. What was named is
-// looked at afterwards.
+// For a file system where no file has two names, and where there is no /proc. Checks
+// afterwards that the name leads to our file.
 bool NewFile::nameTemporary() {
   const int folder = folder_.value();
   const char *const from = temporary_.c_str(), *const to = name_.c_str();

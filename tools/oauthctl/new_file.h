@@ -44,8 +44,8 @@ class NewFile {
   const Ids maker_;
   const Descriptor folder_;
   Descriptor file_;
-  // Its name for now, where the file system has no files without one. Made late, and the signals
-  // that end the program wait until it is gone.
+  // Its temporary name, where the file system cannot make a file without one. Signals that end the
+  // program are held until that name is gone.
   std::string temporary_;
   sigset_t signalsBefore_ = {};
 };

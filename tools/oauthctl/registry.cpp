@@ -63,7 +63,7 @@ std::string Registry::describe(const std::string& identifier) const {
 
 Json::Value clientDocument(const Json::Value& row, bool showSecrets) {
   Json::Value document;
-  document["id"] = static_cast<Json::Int64>(idOf(row));
+  document["id"] = idValue(row);
   document["enabled"] = row["enable"].asString() == "1";
   document["client_id"] = row["client_id"];
   document["client_secret"] = masked(row["client_secret"].asString(), showSecrets);
