@@ -59,11 +59,10 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
   /// nothing: of several processes that try, all succeed.
   int Revoke(long long id);
 
-  /// Deletes every expired code, in one transaction. Where the disk has no
-  /// room for that, it commits row by row, and the error of the first attempt stays. Inside a
-  /// transaction of the caller it is a part of that one, and fails if SQLite ends it. 0 only if a
-  /// row could not be deleted: a failed read deletes nothing and is a success, though it leaves its
-  /// error.
+  /// Deletes every expired code, in one transaction. Where the disk has no room for that, it
+  /// commits row by row, and the error of the first attempt stays. Inside a transaction of the
+  /// caller it is a part of that one, and fails if SQLite ends it. 0 only if a row could not be
+  /// deleted: a failed read deletes nothing and is a success, though it leaves its error.
   int Purge();
 };
 

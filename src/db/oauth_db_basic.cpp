@@ -171,9 +171,8 @@ bool replaceSensitive(Json::Value& doc, const char* operation, ValueConverter co
   }
   return true;
 }
-bool encryptMembers(Json::Value& doc) {
-  return replaceSensitive(doc, "ParamEncrypt", EncryptValue);
-}
+
+// For the row reader as well, which has no store at hand.
 bool decryptMembers(Json::Value& doc) {
   return replaceSensitive(doc, "ParamDecrypt", DecryptValue);
 }
@@ -541,7 +540,9 @@ bool OAUTHDBBasic::DBEdit(Json::Value& request) {
 
 // --- Sensitive values ---
 
-bool OAUTHDBBasic::ParamEncrypt(Json::Value& doc) { return encryptMembers(doc); }
+bool OAUTHDBBasic::ParamEncrypt(Json::Value& doc) {
+  return replaceSensitive(doc, __func__, EncryptValue);
+}
 bool OAUTHDBBasic::ParamDecrypt(Json::Value& doc) { return decryptMembers(doc); }
 
 }  // namespace ZEVOOAUTHSERVER

@@ -13,6 +13,7 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdarg>
+#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
@@ -70,7 +71,10 @@ Function* next(const char* name, Function*) {
 
 }  // namespace
 
+// With OAUTHCTL_SWAP, as if somebody renamed that file to the database's name at the last moment.
 extern "C" int sqlite3_open(const char* path, sqlite3** db) {
+  if (const char* const swap = std::getenv("OAUTHCTL_SWAP"); swap != nullptr)
+    static_cast<void>(std::rename(swap, redirected(path).c_str()));
   return sqlite3_open_v2(redirected(path).c_str(), db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE,
                          nullptr);
 }

@@ -286,6 +286,7 @@ class SwappedNameTest : public HostileFolderTest {
     HostileFolderTest::SetUp();
     if (IsSkipped()) return;
     fillDatabase();
+    ASSERT_EQ(0, chmod(rootsFolder_.c_str(), 0711));  // for the owner to see what holds the program
     environment_ = {"OAUTHCTL_NO_TMPFILE=1", "OAUTHCTL_HOLD=" + rootsFolder_ + "/go"};
   }
   // Runs the command while its temporary file, whose name begins like this, is swapped.
@@ -529,6 +530,23 @@ TEST_F(HostileFolderTest, FolderOfRootThatOthersMayWriteIsTheOnlyFinding) {
       files_.directory() + " has mode 0777: others can replace the database. To do: chmod go-w.\n",
       outcome.out);
   EXPECT_EQ(contents, databaseBytes());
+}
+
+// Between the library's look at the database and SQLite's opening of it.
+TEST_F(HostileFolderTest, LinkAtTheLastMomentMakesNoFileOfRoot) {
+  for (const Words& words : kEveryCommand) {
+    fillDatabase();
+    plantLink(rootsFolder_ + "/made", "swap");
+    environment_ = {"OAUTHCTL_SWAP=" + path("swap")};
+    const int code = run(words).code;
+    const bool usesTheLibrary = words.front() != "check";
+    EXPECT_EQ(usesTheLibrary ? 3 : 0, code);
+    environment_.clear();
+    EXPECT_FALSE(fs::exists(rootsFolder_ + "/made"));
+    fs::remove(files_.database());
+    fs::remove(path("swap"));
+  }
+  expectVictimUntouched();
 }
 
 // Its owner can put a link to any folder of root's in the place of the last one.

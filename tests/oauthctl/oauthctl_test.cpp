@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <csignal>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
@@ -97,6 +98,8 @@ pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asN
   for (const std::string& variable : environment_)
     putenv(strdup(variable.c_str()));  // the program that follows takes it along
   if (asNobody) setenv("OAUTHCTL_USER", std::to_string(kNobody).c_str(), 1);
+  // Whoever started the tests may ignore them, as a shell does for a program in the background.
+  for (const int ending : {SIGINT, SIGTERM, SIGHUP}) std::signal(ending, SIG_DFL);
   alarm(120);  // rather than wait for an answer that never comes
   if (beforeExec_) beforeExec_();
   execvp(arguments.front(), arguments.data());

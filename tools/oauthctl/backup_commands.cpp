@@ -87,6 +87,7 @@ DatabaseImage liveImage(bool withoutTokens) {
 void backUp(const Invocation& invocation) {
   const std::string target = operand(invocation);
   NewFile file(target);
+  DatabaseFolder::enter(Return::kByActingAs);  // The file gets its name with the operator's ids.
   requireDatabase(Access::kRead);
   DatabaseImage image = liveImage(invocation.has("--without-tokens"));
   file.append(image.bytes());

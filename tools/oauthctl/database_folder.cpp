@@ -7,7 +7,6 @@
 #include <cstring>
 #include <sstream>
 
-#include "effective_ids.h"
 #include "exit_code.h"
 #include "fixed_paths.h"
 
@@ -32,25 +31,25 @@ int openFolder(int parent, const std::string& name) {
 }  // namespace
 
 // Step by step from the root folder: whoever owns a folder on the way can replace what is below.
-DatabaseFolder::DatabaseFolder() : descriptor_(openFolder(AT_FDCWD, "/")) {
+DatabaseFolder::DatabaseFolder(Return way) : descriptor_(openFolder(AT_FDCWD, "/")) {
   std::istringstream names(fixed_paths::folder());
   std::string path;
   for (std::string name; std::getline(names, name, '/');) {
     if (name.empty()) continue;
     path += "/" + name;
     descriptor_ = Descriptor(openFolder(descriptor_.value(), name));
-    enterFolder(path);
+    enterFolder(path, way);
   }
   // Others can put files beside the database, whom the folder's sticky bit does not hinder.
   if (isOpenToOthers()) unsafe_ = path;
 }
 
-void DatabaseFolder::enterFolder(const std::string& path) {
+void DatabaseFolder::enterFolder(const std::string& path, Return way) {
   if (fstat(descriptor_.value(), &status_) != 0)
     unavailable("cannot look at " + path + ": " + std::strerror(errno));
   if (geteuid() != 0) return;
   if (status_.st_uid != 0) {
-    becomeUser(status_.st_uid, status_.st_gid);
+    becomeUser(status_.st_uid, status_.st_gid, way);
     user_ = status_.st_uid;
   } else if (isOpenToOthers() && (status_.st_mode & S_ISVTX) == 0) {
     unsafe_ = path;
@@ -61,8 +60,8 @@ bool DatabaseFolder::isOpenToOthers() const { return (status_.st_mode & (S_IWGRP
 
 std::string DatabaseFolder::unsafeForRoot() const { return geteuid() == 0 ? unsafe_ : ""; }
 
-const DatabaseFolder& DatabaseFolder::enter() {
-  static const DatabaseFolder folder;
+const DatabaseFolder& DatabaseFolder::enter(Return way) {
+  static const DatabaseFolder folder(way);
   return folder;
 }
 

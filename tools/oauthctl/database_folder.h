@@ -10,6 +10,7 @@
 #include <string>
 
 #include "descriptor.h"
+#include "effective_ids.h"
 
 namespace oauthctl {
 
@@ -19,7 +20,7 @@ class DatabaseFolder {
   // first folder above that is not root's, until the program ends. Make the first call after the
   // operator's own files are open, and before anything in the folder is touched. Throws what stands
   // in the way.
-  static const DatabaseFolder& enter();
+  static const DatabaseFolder& enter(Return way = Return::kNever);
 
   int descriptor() const { return descriptor_.value(); }
   uid_t owner() const { return status_.st_uid; }
@@ -36,8 +37,8 @@ class DatabaseFolder {
   bool may(const std::string& name, int mode) const;
 
  private:
-  DatabaseFolder();
-  void enterFolder(const std::string& path);
+  explicit DatabaseFolder(Return way);
+  void enterFolder(const std::string& path, Return way);
   bool isOpenToOthers() const;
 
   Descriptor descriptor_;  // as long as the program runs

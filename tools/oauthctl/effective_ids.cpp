@@ -27,12 +27,15 @@ bool take(Ids ids) {
 
 Ids effectiveIds() { return {geteuid(), getegid()}; }
 
-void becomeUser(uid_t user, gid_t fallback) {
+void becomeUser(uid_t user, gid_t fallback, Return way) {
   const passwd* const known = getpwuid(user);
   const gid_t group = known == nullptr ? fallback : known->pw_gid;
   const bool joined =
       known == nullptr ? setgroups(1, &group) == 0 : initgroups(known->pw_name, group) == 0;
-  if (!joined || !take({user, group}))
+  const auto leave = [&] {
+    return setresgid(group, group, group) == 0 && setresuid(user, user, user) == 0;
+  };
+  if (!joined || !(way == Return::kNever ? leave() : take({user, group})))
     throw Failure(ExitCode::kUnavailable, "cannot take the ids of user " + std::to_string(user) +
                                               ": " + std::strerror(errno));
 }

@@ -13,11 +13,15 @@ struct Ids {
 
 Ids effectiveIds();
 
-// Takes the effective ids and the groups of this user until the program ends. fallback is the group
-// of a user whom the system does not know. Real and saved ids stay root's: so the library can raise
-// its ids to open the database, and the user can neither signal nor trace this process. Throws a
-// Failure if any of that is refused.
-void becomeUser(uid_t user, gid_t fallback);
+enum class Return {
+  kNever,       // not even the library can raise its ids any more
+  kByActingAs,  // real and saved ids stay root's; the user can neither signal nor trace this
+                // process
+};
+
+// Takes the ids and the groups of this user until the program ends. fallback is the group of a user
+// whom the system does not know. Throws a Failure if any of that is refused.
+void becomeUser(uid_t user, gid_t fallback, Return way);
 
 // Has these ids while it lives, then those from before. Ends the program if they do not come back.
 class ActingAs {
