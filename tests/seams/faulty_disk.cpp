@@ -3,7 +3,6 @@
 #include <sqlite3.h>
 
 #include <csignal>
-#include <cstddef>
 #include <stdexcept>
 
 namespace {
@@ -38,8 +37,9 @@ sqlite3_vfs* disk() {
   return vfs;
 }
 
-// SQLite's object of an open file, with the real one's right behind it.
-struct alignas(std::max_align_t) File {
+// SQLite's object of an open file, with the real one's right behind it. SQLite aligns it to 8
+// bytes.
+struct alignas(8) File {
   sqlite3_file base;
   bool isJournal;
 };
