@@ -30,14 +30,16 @@ int openFolder(int parent, const std::string& name) {
 
 }  // namespace
 
-// Step by step from the root folder: whoever owns a folder on the way can replace what is below.
-DatabaseFolder::DatabaseFolder(Return way) : descriptor_(openFolder(AT_FDCWD, "/")) {
+// Step by step from the first folder: whoever owns a folder on the way can replace what is below.
+DatabaseFolder::DatabaseFolder(Return way) {
   std::istringstream names(fixed_paths::folder());
   std::string path;
   for (std::string name; std::getline(names, name, '/');) {
     if (name.empty()) continue;
     path += "/" + name;
-    descriptor_ = Descriptor(openFolder(descriptor_.value(), name));
+    const bool isFirst = !descriptor_.isOpen();
+    descriptor_ =
+        Descriptor(isFirst ? openFolder(AT_FDCWD, path) : openFolder(descriptor_.value(), name));
     enterFolder(path, way);
   }
   // Others can put files beside the database, whom the folder's sticky bit does not hinder.
