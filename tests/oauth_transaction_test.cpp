@@ -180,6 +180,12 @@ class SweepTest : public TransactionTest {
   void insertExpired(int count) const {
     for (int id = 1; id <= count; ++id) insert(id, "1");
   }
+  // 200 expired rows of 2000 bytes each: their pages do not fit into the journal.
+  static constexpr int kJournalRoom = 128 * 1024;
+  void insertMoreThanTheJournalHolds() const {
+    insertExpired(200);
+    execute("UPDATE " + table_ + " SET state = hex(zeroblob(1000))");
+  }
   void onDeleteOf(int id, const std::string& action) const {
     execute("CREATE TRIGGER t BEFORE DELETE ON " + table_ + " WHEN old.id = " + std::to_string(id) +
             " BEGIN SELECT RAISE(" + action + "); END");
@@ -236,10 +242,9 @@ TYPED_TEST(SweepTest, StartsAgainRowByRowWhenSqliteEndsTheTransaction) {
 
 TYPED_TEST(SweepTest, NeedsLittleRoomOnTheDisk) {
   const FaultyDisk disk;
-  this->insertExpired(200);
-  this->execute("UPDATE " + this->table_ + " SET state = hex(zeroblob(1000))");
+  this->insertMoreThanTheJournalHolds();
   TypeParam store(this->table_);
-  FaultyDisk::limitJournal(128 * 1024);
+  FaultyDisk::limitJournal(this->kJournalRoom);
   EXPECT_EQ(1, store.Purge());
   EXPECT_TRUE(FaultyDisk::mend());
   EXPECT_THAT(this->ids(), IsEmpty());
@@ -252,11 +257,10 @@ TYPED_TEST(SweepTest, NeedsLittleRoomOnTheDisk) {
 // SQLite then undoes the last statement alone and leaves the transaction open.
 TYPED_TEST(SweepTest, NeedsLittleRoomOnTheDiskBesideATrigger) {
   const FaultyDisk disk;
-  this->insertExpired(200);
-  this->execute("UPDATE " + this->table_ + " SET state = hex(zeroblob(1000))");
+  this->insertMoreThanTheJournalHolds();
   this->onDeleteOf(0, "ABORT, 'never'");
   TypeParam store(this->table_);
-  FaultyDisk::limitJournal(128 * 1024);
+  FaultyDisk::limitJournal(this->kJournalRoom);
   EXPECT_EQ(1, store.Purge());
   EXPECT_TRUE(FaultyDisk::mend());
   EXPECT_THAT(this->ids(), IsEmpty());
@@ -366,11 +370,10 @@ TYPED_TEST(SweepTest, IsRolledBackWithTheCallersTransaction) {
 // Nothing is committed behind the caller's back.
 TYPED_TEST(SweepTest, FailsWhereSqliteEndsTheCallersTransaction) {
   const FaultyDisk disk;
-  this->insertExpired(200);
-  this->execute("UPDATE " + this->table_ + " SET state = hex(zeroblob(1000))");
+  this->insertMoreThanTheJournalHolds();
   TypeParam store(this->table_);
   EXPECT_TRUE(store.DBCmd("BEGIN; INSERT INTO oauth_log VALUES(1, 'lost', 1);", nullptr, nullptr));
-  FaultyDisk::limitJournal(128 * 1024);
+  FaultyDisk::limitJournal(this->kJournalRoom);
   EXPECT_EQ(0, store.Purge());
   EXPECT_TRUE(FaultyDisk::mend());
   EXPECT_EQ(200, this->rowCount(this->table_));
