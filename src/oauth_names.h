@@ -88,6 +88,7 @@ inline constexpr char kLogLevel[] = "log_level";
 }  // namespace setting
 
 namespace path {
+inline constexpr char kFolder[] = "/var/packages/Keyloft/target/etc";
 inline constexpr char kDatabase[] = "/var/packages/Keyloft/target/etc/oauth.db";
 inline constexpr char kSettings[] = "/var/packages/Keyloft/target/etc/oauth.cfg";
 inline constexpr char kDebugMarker[] = "/tmp/zevooauth_debug";

@@ -2,6 +2,8 @@
 
 #pragma once
 
+#include <json/value.h>
+
 #include <charconv>
 #include <cstdint>
 #include <limits>
@@ -25,9 +27,9 @@ inline std::optional<std::int64_t> decimalNumber(const std::string& text) {
   return number;
 }
 
-// Text that is no decimal number reads as 0.
-inline std::int64_t decimalValue(const std::string& text) {
-  return decimalNumber(text).value_or(0);
+// The number in a row's member. Null, and text that is no decimal number, reads as 0.
+inline std::int64_t decimalValue(const Json::Value& member) {
+  return decimalNumber(member.asString()).value_or(0);
 }
 
 }  // namespace ZEVOOAUTHSERVER
