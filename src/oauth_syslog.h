@@ -5,7 +5,7 @@
 //   OAUTH_ENTER  entry trace, first statement of an operation; never inside a lambda, whose
 //                __func__ is "operator()"
 //   OAUTH_LOG    any priority, for example LOG_AUTH | LOG_INFO
-//   OAUTH_LOG_AT   the same for a caller's file and line (oauth_failure.h)
+//   OAUTH_LOG_AT   the same as an expression, with the file's name and the line given
 //
 // Macros, because only they know file and line; the format stays a literal, so that the compiler
 // checks it, and no argument is evaluated for a diagnostic that is switched off.

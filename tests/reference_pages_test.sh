@@ -11,8 +11,9 @@ code() { sed 's|^ *//.*||' "$@" | tr '\n' ' ' | sed -E 's/" +"//g; s/\( +/(/g'; 
 # "<heading>: <text>" for each log line, error text and line of the audit log. A call whose text is
 # not a literal stays as it is, and no page has such a line. oauth_failure.h only passes texts on.
 messages_in_sources() {
-  { code $(printf '%s\n' src/*/*.{h,cpp} | grep -v oauth_failure.h) && grep '^#define OAUTH_ENTER' src/oauth_syslog.h; } |
-    grep -oE '(OAUTH_(FAIL|DIAG|LOG)\(|[^_]syslog\(|\b(fail|refuse)\(|SetErrMsg\(|errMsg_ = |kErrMsg\] = |auditLog\.Add\()[^";]*("[^"]*"|;)' |
+  mapfile -t files < <(find src -mindepth 2 -type f ! -name oauth_failure.h)
+  { code "${files[@]}" && grep '^#define OAUTH_ENTER' src/oauth_syslog.h; } |
+    grep -oE '(OAUTH_(FAIL|DIAG|LOG)\(|[^_]syslog\(|fail\(|OAUTH_REFUSE\(|SetErrMsg\(|errMsg_ = |kErrMsg\] = |auditLog\.Add\()[^";]*("[^"]*"|;)' |
     sed -E '
       s/^OAUTH_FAIL\("(.*)"$/Failures: \1/
       s/^OAUTH_LOG\(LOG_AUTH \| LOG_ERR, "(.*)"$/Refused privileges: \1/
@@ -21,7 +22,7 @@ messages_in_sources() {
       s/^OAUTH_DIAG\(kRow, "(.*)"$/Rows, bit 2: \1/
       s/^OAUTH_DIAG\(kArgument, "(.*)"$/Arguments, bit 4: \1/
       s/^OAUTH_DIAG\(kEntry, "(.*)"$/Entry traces, bit 8: \1/
-      s/^refuse\(\*this, kErr[A-Za-z]+, "(.*)"$/Failures: \1\nError texts: \1/
+      s/^OAUTH_REFUSE\(kErr[A-Za-z]+, "(.*)"$/Failures: \1\nError texts: \1/
       s/^fail\(\*this, [A-Za-z]+, "(.*)"$/Error texts: \1/
       s/^(SetErrMsg\(|errMsg_ = |kErrMsg\] = )"(.*)"$/Error texts: \2/
       s/^auditLog\.Add\("(.*)"$/Audit log: \1/' |

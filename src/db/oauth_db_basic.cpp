@@ -150,13 +150,21 @@ bool DecryptValue(const std::string& cipher, std::string& out) {
 
 using ValueConverter = bool (*)(const std::string& text, std::string& out);
 
+// A literal for each column: programs that capture the log may compare its formats.
+void traceConversion(const char* operation, const char* column) {
+  if (column == names::column::kClientId)
+    OAUTH_DIAG(kResult, "==> %s[client_id]", operation);
+  else
+    OAUTH_DIAG(kResult, "==> %s[client_secret]", operation);
+}
+
 // Converts the encrypted columns among the document's members. The trace names the operation that
 // was called. A document that is not an object, such as an absent condition, has no members.
 bool replaceSensitive(Json::Value& doc, const char* operation, ValueConverter converter) {
   if (!doc.isObject()) return true;
   for (const char* const column : names::kEncryptedColumns) {
     if (!doc.isMember(column)) continue;
-    OAUTH_DIAG(kResult, "==> %s[%s]", operation, column);
+    traceConversion(operation, column);
     std::string replacement;
     if (!converter(doc[column].asString(), replacement)) return false;
     doc[column] = replacement;
@@ -373,7 +381,7 @@ int OAUTHDBBasic::TabGetCallback(void* context, int columns, char** values, char
 
 bool OAUTHDBBasic::DBGetRowCount(Json::Value* result) {
   OAUTH_ENTER();
-  if (result == nullptr) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (result == nullptr) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   *result = Json::Value(Json::arrayValue);
   const std::string sql = "SELECT COUNT(*) FROM " + tabName_ + ";";
   if (DBCmd(sql, TabCountCallback, result)) return true;
@@ -469,7 +477,7 @@ bool OAUTHDBBasic::DBDel(Json::Value& request) {
 
 bool OAUTHDBBasic::DBGet(Json::Value& request, Json::Value* rows) {
   OAUTH_ENTER();
-  if (rows == nullptr) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (rows == nullptr) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value& condition = request[names::request::kCondition];
   // Callers know a failed read by this text.
   if (!ParamEncrypt(condition)) return fail(*this, kErrCrypt, "Data Decrypt failed");

@@ -9,21 +9,19 @@
 
 namespace ZEVOOAUTHSERVER {
 
-// Records code and text in the store; false, which is the result of the failed operation. For
-// failures that other lines of the log explain.
+// Records code and text in the store. Returns false, which is the result of the operation that
+// failed. For failures that have another log line, or none.
 inline bool fail(OAUTHDBBasic& store, int code, const std::string& text) {
   store.SetErrCode(code);
   store.SetErrMsg(text);
   return false;
 }
 
-// The same with the text in the log as well. A function whose line names the file and line of the
-// caller: the log shows which store refused.
-inline bool refuse(OAUTHDBBasic& store, int code, const char* text,
-                   const char* file = __builtin_FILE(), int line = __builtin_LINE()) {
-  fail(store, code, text);
-  OAUTH_LOG_AT(diagnostics::baseName(file), line, LOG_ERR, "%s", text);
-  return false;
-}
-
 }  // namespace ZEVOOAUTHSERVER
+
+// In a member function of a store: the same, and the text in the log as well. A macro, because the
+// text is the format of the log line, and the line names the file that refuses.
+#define OAUTH_REFUSE(code, text)                                                              \
+  (::ZEVOOAUTHSERVER::fail(*this, (code), text),                                              \
+   OAUTH_LOG_AT(::ZEVOOAUTHSERVER::diagnostics::baseName(__FILE__), __LINE__, LOG_ERR, text), \
+   false)

@@ -39,9 +39,9 @@ int OAUTHDBClientInfo::Add(const std::string& client_id, const std::string& clie
                          quoted(column::kScope, scope, limit::kScope),
                          quoted(column::kDisplayName, display_name, limit::kDisplayName)};
   if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kClientInfoMax))))
-    return refuse(*this, kErrTableFull, "ClientInfo Table is full");
+    return OAUTH_REFUSE(kErrTableFull, "ClientInfo Table is full");
   if (!fit(fields) || (enable != kEnabled && enable != kDisabled))
-    return refuse(*this, kErrBadParameters, "Bad parameters");
+    return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
 
   Json::Value record = newRow(fields);
   record[column::kEnable] = enable;
@@ -71,7 +71,7 @@ int OAUTHDBClientInfo::Edit(long long id, const std::string& redirect_uri, const
   const Fields fields = {quoted(column::kRedirectUri, redirect_uri, limit::kRedirectUri),
                          quoted(column::kScope, scope, limit::kScope),
                          quoted(column::kDisplayName, display_name, limit::kDisplayName)};
-  if (!fit(fields)) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
@@ -97,7 +97,7 @@ int OAUTHDBClientInfo::Del(long long id) {
 int OAUTHDBClientInfo::Get(const std::string& client_id, Json::Value* out) {
   OAUTH_ENTER();
   const Field field = quoted(column::kClientId, client_id, limit::kClientId);
-  if (!fit({field})) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value request = where(field);
   return DBGet(request, out);
 }

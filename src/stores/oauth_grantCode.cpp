@@ -44,7 +44,7 @@ int OAUTHDBGrantCode::Add(const std::string& username, const std::string& client
                          quoted(column::kState, state, limit::kState)};
   const std::string badAddress = addressError(ip);
   if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kGrantCodeMax))))
-    return refuse(*this, kErrTableFull, "GrantCode Table is full");
+    return OAUTH_REFUSE(kErrTableFull, "GrantCode Table is full");
   if (!badAddress.empty()) {
     OAUTH_FAIL("Bad IP address[%s]", badAddress.c_str());
     return 0;
@@ -92,7 +92,7 @@ int OAUTHDBGrantCode::Del(long long id) {
 int OAUTHDBGrantCode::Get(const std::string& code, Json::Value* out) {
   OAUTH_ENTER();
   const Field field = asGiven(column::kCode, code, limit::kCode);  // unlike other look-ups
-  if (!fit({field})) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value request = where(field);
   return DBGet(request, out);
 }

@@ -35,12 +35,12 @@ int OAUTHDBToken::Add(const std::string& username, const std::string& client_id,
                          quoted(column::kState, state, limit::kState)};
   const std::string badAddress = addressError(ip);
   if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kTokenMax))))
-    return refuse(*this, kErrTableFull, "Token Table is full");
+    return OAUTH_REFUSE(kErrTableFull, "Token Table is full");
   if (!badAddress.empty()) {
     OAUTH_FAIL("Bad IP address[%s]", badAddress.c_str());
     return 0;
   }
-  if (!fit(fields)) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
 
   Json::Value record = newRow(fields);
   record[column::kIp] = getSQLFormatStr(ip);
@@ -70,7 +70,7 @@ int OAUTHDBToken::Edit(long long id, const std::string& username, const std::str
                          asGiven(column::kScope, scope, limit::kScope),
                          asGiven(column::kFlowType, flow_type, limit::kFlowType),
                          asGiven(column::kState, state, limit::kState)};
-  if (!fit(fields)) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
@@ -85,7 +85,7 @@ int OAUTHDBToken::Edit(long long id, const std::string& username, const std::str
                          asGiven(column::kExpiredTime, expired_time, limit::kExpiredTime),
                          quoted(column::kFlowType, flow_type, limit::kFlowType),
                          quoted(column::kState, state, limit::kState)};
-  if (!fit(fields)) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
@@ -104,7 +104,7 @@ int OAUTHDBToken::Revoke(long long id) {
 int OAUTHDBToken::GetWithAccessToken(const std::string& access_token, Json::Value* out) {
   OAUTH_ENTER();
   const Field field = quoted(column::kAccessToken, access_token, limit::kToken);
-  if (!fit({field})) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value request = where(field);
   return DBGet(request, out);
 }
@@ -112,7 +112,7 @@ int OAUTHDBToken::GetWithAccessToken(const std::string& access_token, Json::Valu
 int OAUTHDBToken::GetWithRefreshToken(const std::string& refresh_token, Json::Value* out) {
   OAUTH_ENTER();
   const Field field = quoted(column::kRefreshToken, refresh_token, limit::kToken);
-  if (!fit({field})) return refuse(*this, kErrBadParameters, "Bad parameters");
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value request = where(field);
   return DBGet(request, out);
 }
