@@ -2,8 +2,6 @@
 
 #pragma once
 
-#include <string>
-
 #include "oauth_db_basic.h"
 #include "oauth_syslog.h"
 
@@ -11,7 +9,7 @@ namespace ZEVOOAUTHSERVER {
 
 // Records code and text in the store. Returns false, which is the result of the operation that
 // failed. For failures that have another log line, or none.
-inline bool fail(OAUTHDBBasic& store, int code, const std::string& text) {
+inline bool fail(OAUTHDBBasic& store, int code, const char* text) {
   store.SetErrCode(code);
   store.SetErrMsg(text);
   return false;

@@ -8,7 +8,8 @@
 
 namespace ZEVOOAUTHSERVER {
 
-// A value below the smallest counts as the fallback, one above the largest as the largest.
+// A value below the smallest is replaced by the fallback, which is the default; a value above the
+// largest by the largest.
 struct SettingRange {
   int fallback, smallest, largest;
 
@@ -35,7 +36,7 @@ inline constexpr Setting kSettings[] = {
     {names::setting::kGrantCodeMax, "rows of `oauth_grantCode`, expired ones included",
      kRowCeiling},
     {names::setting::kTokenMax, "rows of `oauth_token`, expired ones included", kRowCeiling},
-    {names::setting::kLogMax, "rows of `oauth_log`; older ones are dropped", kRowCeiling},
+    {names::setting::kLogMax, "rows of `oauth_log`; older ones are deleted", kRowCeiling},
     {names::setting::kGrantCodeExpired, "lifetime of a new code, seconds", kLifetime},
     {names::setting::kTokenExpired, "lifetime of a new access token, seconds", kLifetime},
     {names::setting::kLogLevel, "diagnostics, a sum of bits", kLevelMask},
