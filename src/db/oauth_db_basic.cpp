@@ -24,10 +24,10 @@ namespace {
 
 // Raises the effective ids to root for the lifetime of the object.
 //
-// It changes the group first when it raises, and the user last when it restores: without root's
-// user id the group cannot be changed. A refusal is logged; the guarded call is made all the same,
-// with the ids that the process then has. Leaves errno 0, or 1 after a refusal. Process-wide: no
-// other thread may depend on the ids meanwhile.
+// The group changes before the user, in both directions: to change it back the process needs root's
+// user id. A refusal is logged; the guarded call is made all the same, with the ids that the
+// process then has. Leaves errno 0, or 1 after a refusal. Process-wide: no other thread may depend
+// on the ids meanwhile.
 class RaisedPrivilege {
  public:
   RaisedPrivilege() : user_(geteuid()), group_(getegid()) {
