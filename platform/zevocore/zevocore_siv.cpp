@@ -12,8 +12,8 @@ using Bytes = std::vector<std::uint8_t>;
 
 static_assert(std::tuple_size<Key>::value == SIV_CMAC_AES256_KEY_SIZE);
 
-// A constant instead of a nonce, since equal texts must give equal results; it also keeps texts
-// apart that another program seals under the same key.
+// A constant is used instead of a nonce, because equal texts must give equal results. It also
+// distinguishes our texts from those that another program seals with the same key.
 constexpr std::uint8_t kLabel[] = {'z', 'e', 'v', 'o', 'c', 'o', 'r', 'e'};
 
 siv_cmac_aes256_ctx contextFor(const Key& key) {
@@ -37,8 +37,8 @@ std::string printed(const Bytes& bytes) {
   return text;
 }
 
-// Nothing unless the text is exactly what printed() makes of the bytes: a lenient decoder would
-// accept several spellings of one value.
+// Returns nothing unless the text is exactly what printed() makes from the bytes. A lenient decoder
+// would accept several spellings of one value.
 std::optional<Bytes> parsed(const std::string& text) {
   base64_decode_ctx context;
   base64url_decode_init(&context);
