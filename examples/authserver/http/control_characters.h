@@ -1,4 +1,4 @@
-// Characters that end lines and move cursors: no name, password or header has any.
+// Characters that end lines or move cursors. Names, passwords and headers have none.
 
 #pragma once
 

@@ -1,21 +1,21 @@
-// The frame of every program: read one request, answer it, and let nothing else out.
+// What every program does: it reads one request and sends one answer. No exception leaves it.
 
 #pragma once
 
+#include <exception>
 #include <string>
-#include <vector>
 
 #include "http_request.h"
 #include "http_response.h"
 
 namespace authserver {
 
-// What the outside is told of a failure of our own, whose reason goes to standard error.
+// The refusal for an error of the server itself. Only standard error gets the reason.
 Refusal serverError(const std::exception& error);
 
-// The result is the program's exit status. explain makes the answer for a refusal, and for a
-// failure of our own.
-int serve(const std::vector<std::string>& methods, Response (*answer)(const Request& request),
+// Returns the program's exit status. program is its name in endpoints.txt. explain makes the answer
+// for a refusal and for an error of the server itself.
+int serve(const std::string& program, Response (*answer)(const Request& request),
           Response (*explain)(const Refusal& refusal));
 
 }  // namespace authserver

@@ -14,7 +14,8 @@ using Fields = std::vector<std::pair<std::string, std::string>>;
 // "a=1&b=x%20y"
 std::string formEncoded(const Fields& fields);
 
-// One value; nothing if a percent sign is not followed by two hexadecimal digits.
+// The value behind one encoded text; nothing if two hexadecimal digits do not follow a percent
+// sign.
 std::optional<std::string> formDecoded(const std::string& text);
 
 }  // namespace authserver

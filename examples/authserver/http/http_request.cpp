@@ -1,6 +1,7 @@
 #include "http_request.h"
 
 #include <cgicc/Cgicc.h>
+#include <strings.h>
 
 #include <algorithm>
 #include <cctype>
@@ -8,13 +9,16 @@
 #include <set>
 
 #include "control_characters.h"
+#include "decimal_text.h"
+#include "joined.h"
 #include "refusal.h"
 
 namespace authserver {
 namespace {
 
 constexpr std::size_t kLongestName = 64, kLongestValue = 4096;  // bytes
-constexpr std::size_t kLargestBody = 65536, kMostParameters = 100;
+constexpr std::size_t kMostParameters = 100;
+constexpr std::int64_t kLargestBody = 65536;  // bytes
 constexpr char kForm[] = "application/x-www-form-urlencoded";
 
 std::string variable(const char* name) {
@@ -22,22 +26,17 @@ std::string variable(const char* name) {
   return value == nullptr ? "" : value;
 }
 
-std::string joined(const std::vector<std::string>& words) {
-  std::string result;
-  for (const std::string& word : words) result += (result.empty() ? "" : ", ") + word;
-  return result;
-}
-
-// Before anything is read: what is no form of ours is not parsed at all.
+// Runs before anything is parsed: a body that is not a form never reaches the parser.
 void checkBody() {
   std::string type = variable("CONTENT_TYPE");
   type = type.substr(0, type.find_first_of("; "));
   std::transform(type.begin(), type.end(), type.begin(),
                  [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
   if (type != kForm) throw invalidRequest(std::string("The body must be of type ") + kForm + ".");
-  if (std::strtoul(variable("CONTENT_LENGTH").c_str(), nullptr, 10) > kLargestBody)
+  const std::int64_t length = fromDecimal(variable("CONTENT_LENGTH"));
+  if (length < 0 || length > kLargestBody)
     throw Refusal(413, "invalid_request", "The body is too large.");
-  // Parameters of a query would mix with those of the form, and queries end up in log files.
+  // The parser would mix them with those of the form, and log files show queries.
   if (!variable("QUERY_STRING").empty())
     throw invalidRequest("Parameters must be in the body, not in the query.");
 }
@@ -48,7 +47,7 @@ Request::Request(const std::vector<std::string>& methods) {
   const std::string method = variable("REQUEST_METHOD");
   if (std::find(methods.begin(), methods.end(), method == "HEAD" ? "GET" : method) == methods.end())
     throw Refusal(405, "invalid_request", "This method is not allowed here.",
-                  {{"Allow", joined(methods)}});
+                  {{"Allow", joined(methods, ", ")}});
   post_ = method == "POST";
   if (post_) checkBody();
   read();
@@ -75,13 +74,19 @@ void Request::read() try {
     cookies_.emplace_back(cookie.getName(), cookie.getValue());
 } catch (const Refusal&) {
   throw;
-} catch (const std::exception&) {  // whatever the parser stumbled over came from outside
+} catch (const std::exception&) {  // only the request can make the parser fail
   throw invalidRequest("The request cannot be read.");
 }
 
 std::string Request::get(const std::string& name) const {
   const auto found = parameters_.find(name);
   return found == parameters_.end() ? "" : found->second;
+}
+
+std::string Request::required(const std::string& name) const {
+  std::string value = get(name);
+  if (value.empty()) throw invalidRequest(name + " is missing.");
+  return value;
 }
 
 void Request::requireSoundParameters() const {
@@ -96,5 +101,11 @@ std::vector<std::string> Request::cookies(const std::string& name) const {
 }
 
 std::string Request::authorization() { return variable("HTTP_AUTHORIZATION"); }
+
+std::optional<std::string> Request::credentials(const std::string& scheme) {
+  const std::string header = authorization(), start = scheme + ' ';
+  if (strncasecmp(header.c_str(), start.c_str(), start.size()) != 0) return std::nullopt;
+  return header.substr(start.size());
+}
 
 }  // namespace authserver

@@ -10,7 +10,7 @@
 namespace authserver {
 namespace {
 
-const Headers kAlways = {
+const Headers kDefaultHeaders = {
     {"Cache-Control", "no-store"},
     {"Pragma", "no-cache"},
     {"X-Content-Type-Options", "nosniff"},
@@ -27,7 +27,7 @@ void write(std::ostream& out, const Headers& headers) {
   for (const auto& [name, value] : headers) out << name << ": " << value << "\r\n";
 }
 
-// A line break in a value would begin a header of somebody else's making.
+// With a line break in a value, whoever chose the value could add headers.
 void check(const Headers& headers) {
   for (const auto& [name, value] : headers)
     if (hasControlCharacters(value)) throw std::logic_error("control character in header " + name);
@@ -58,7 +58,7 @@ void send(const Response& response) {
   check(response.headers);
   std::cout << "Status: " << response.status << "\r\n";
   write(std::cout, response.headers);
-  for (const auto& header : kAlways)
+  for (const auto& header : kDefaultHeaders)
     if (!has(response.headers, header.first)) write(std::cout, {header});
   std::cout << "\r\n" << response.body << std::flush;
 }

@@ -1,4 +1,4 @@
-// The answer as the web server expects it (RFC 3875).
+// The answer in the form that the web server expects (RFC 3875).
 
 #pragma once
 
@@ -22,8 +22,8 @@ Response redirection(int status, const std::string& target, Headers headers = {}
 // A refusal as the document of RFC 6749, section 5.2.
 Response jsonRefusal(const Refusal& refusal);
 
-// Writes the answer to standard output, with what holds for all of them: nothing is stored,
-// nothing is guessed about content, nothing is loaded, framed or told to others.
+// Writes the answer to standard output. Unless the answer has these headers itself, adds those that
+// forbid a browser to store it, guess its type, load other content, frame it or send a referrer.
 void send(const Response& response);
 
 }  // namespace authserver

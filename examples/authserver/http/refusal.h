@@ -1,5 +1,5 @@
-// What a client is told when its request cannot be served: the one exception of these programs
-// that is meant for the outside.
+// The answer to a request that cannot be served. It is the only exception whose text leaves the
+// server.
 
 #pragma once
 
@@ -12,8 +12,9 @@ namespace authserver {
 
 using Headers = std::vector<std::pair<std::string, std::string>>;
 
-// status is HTTP's; error is a code of RFC 6749, section 5.2, or of a relative; what() says it in
-// words, in ASCII without quotes and backslashes, as that section asks.
+// status is that of HTTP, error is an error code of RFC 6749, section 5.2, or of an RFC that
+// extends it. what() explains it, in ASCII without quotes and backslashes, as that section
+// requires.
 class Refusal : public std::runtime_error {
  public:
   Refusal(int httpStatus, std::string errorCode, const std::string& words, Headers extra = {})
@@ -31,9 +32,9 @@ inline Refusal invalidRequest(const std::string& words) { return {400, "invalid_
 inline Refusal invalidGrant(const std::string& words) { return {400, "invalid_grant", words}; }
 inline Refusal invalidScope(const std::string& words) { return {400, "invalid_scope", words}; }
 
-// Nothing is known to be wrong with the request: the same one may succeed a little later.
+// For a request that may be correct: the same one may succeed a little later.
 inline Refusal temporarilyUnavailable() {
-  constexpr char kRetryAfter[] = "5";  // seconds, as long as a statement waits for its turn
+  constexpr char kRetryAfter[] = "5";  // seconds, as long as a statement waits for a lock
   return {503,
           "temporarily_unavailable",
           "The server is busy. Try again in a few seconds.",

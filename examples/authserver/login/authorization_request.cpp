@@ -48,16 +48,16 @@ void AuthorizationRequest::check() {
   scope_ = grantable(http_.get("scope"), client_.scope);
 }
 
-std::string AuthorizationRequest::answer(Fields fields) const {
+std::string AuthorizationRequest::answerUrl(Fields answer) const {
   if (const std::string state = http_.get("state"); !state.empty())
-    fields.emplace_back("state", state);
-  fields.emplace_back("iss", issuer());
+    answer.emplace_back("state", state);
+  answer.emplace_back("iss", issuer());
   const char* const separator = redirectUri_.find('?') == std::string::npos ? "?" : "&";
-  return redirectUri_ + separator + formEncoded(fields);
+  return redirectUri_ + separator + formEncoded(answer);
 }
 
-std::string AuthorizationRequest::answer(const Refusal& refusal) const {
-  return answer({{"error", refusal.error}, {"error_description", refusal.what()}});
+std::string AuthorizationRequest::answerUrl(const Refusal& refusal) const {
+  return answerUrl({{"error", refusal.error}, {"error_description", refusal.what()}});
 }
 
 }  // namespace authserver

@@ -1,4 +1,4 @@
-// Which client calls, proven by its secret (RFC 6749, section 2.3).
+// Finds the client that sent a request, and checks its secret (RFC 6749, section 2.3).
 
 #pragma once
 
@@ -7,8 +7,9 @@
 
 namespace authserver {
 
-// By HTTP basic authentication or by the form's client_id and client_secret, never by both.
-// Refuses with invalid_client whoever is unknown, disabled or has the wrong secret, all alike.
+// The credentials come by HTTP basic authentication or as client_id and client_secret of the form,
+// but not by both. Refuses an unknown client, a disabled one and a wrong secret in the same way,
+// with invalid_client.
 Client authenticatedClient(const Request& request);
 
 }  // namespace authserver

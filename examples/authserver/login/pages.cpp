@@ -10,7 +10,7 @@
 namespace authserver {
 namespace {
 
-Response filled(int status, const std::string& name, ctemplate::TemplateDictionary& values,
+Response pageOf(int status, const std::string& name, ctemplate::TemplateDictionary& values,
                 const std::string& formTargets) {
   const char* const folder = std::getenv("AUTHSERVER_TEMPLATES");
   if (folder == nullptr) throw std::runtime_error("AUTHSERVER_TEMPLATES is not set");
@@ -28,7 +28,7 @@ Response filled(int status, const std::string& name, ctemplate::TemplateDictiona
   return page;
 }
 
-// A browser asks the policy about the redirection after the form too.
+// A browser applies the policy to the redirect after the form, too.
 std::string targetsOf(const FormPage& form) { return "'self' " + policySourceOf(form.redirectUri); }
 
 void fill(ctemplate::TemplateDictionary& values, const FormPage& form) {
@@ -52,7 +52,7 @@ Response loginPage(const FormPage& form, const std::string& user, bool failed) {
     values.ShowSection("FAILED");
     values.ShowSection("MARKED");
   }
-  return filled(200, "login.tpl", values, targetsOf(form));
+  return pageOf(200, "login.tpl", values, targetsOf(form));
 }
 
 Response consentPage(const FormPage& form, const std::string& user,
@@ -62,14 +62,14 @@ Response consentPage(const FormPage& form, const std::string& user,
   values.SetValue("USER", user);
   for (const std::string& wish : wishes)
     values.AddSectionDictionary("WISH")->SetValue("WORDS", wish);
-  return filled(200, "consent.tpl", values, targetsOf(form));
+  return pageOf(200, "consent.tpl", values, targetsOf(form));
 }
 
 Response errorPage(const Refusal& refusal) {
   ctemplate::TemplateDictionary values("error");
   values.SetValue("REASON", refusal.what());
   values.SetValue("CODE", refusal.error);
-  Response page = filled(refusal.status, "error.tpl", values, "'none'");
+  Response page = pageOf(refusal.status, "error.tpl", values, "'none'");
   page.headers.insert(page.headers.end(), refusal.headers.begin(), refusal.headers.end());
   return page;
 }

@@ -11,19 +11,21 @@
 
 namespace authserver {
 
-// What login and consent page have in common.
+// What the login page and the consent page have in common.
 struct FormPage {
   std::string clientName;
   std::string redirectUri;
-  Fields request;         // sent along again, hidden
-  std::string formToken;  // likewise
+  Fields request;         // a hidden field for each
+  std::string formToken;  // a hidden field
 };
 
-// user: what to fill in. failed: whether the last try was wrong.
+// user is the value of the name field. failed is true after a wrong name or password.
 Response loginPage(const FormPage& form, const std::string& user, bool failed);
-// wishes: what the client asks for, in words.
+
+// wishes are the scopes that the client asks for, in words.
 Response consentPage(const FormPage& form, const std::string& user,
                      const std::vector<std::string>& wishes);
+
 Response errorPage(const Refusal& refusal);
 
 }  // namespace authserver

@@ -1,4 +1,4 @@
-// Keys and nonces that nobody can guess.
+// Random bytes for keys and nonces.
 
 #pragma once
 

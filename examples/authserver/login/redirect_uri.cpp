@@ -9,8 +9,8 @@ namespace {
 
 constexpr char kHttps[] = "https://", kHttp[] = "http://";
 
-// A reversed domain name and one slash, as RFC 8252, section 7.1, has it. "localhost:8080/done" is
-// none, and neither is "javascript:/...".
+// A reversed domain name and one slash (RFC 8252, section 7.1), which neither "localhost:8080/done"
+// nor "javascript:/..." has.
 bool hasPrivateScheme(const std::string& uri) {
   static const std::regex pattern(R"([a-z][a-z0-9-]*(\.[a-z0-9-]+)+:/([^/].*)?)");
   return std::regex_match(uri, pattern);
@@ -31,8 +31,8 @@ bool isThisMachine(const std::string& authority) {
   return std::regex_match(authority, pattern);
 }
 
-// Neither a fragment nor what browsers read in other ways than we do.
-bool isPlain(const std::string& uri) {
+// Has no fragment, and no character that browsers interpret in another way than this server.
+bool hasPlainCharacters(const std::string& uri) {
   return std::all_of(uri.begin(), uri.end(),
                      [](char c) { return c > ' ' && c < 127 && c != '#' && c != '\\'; });
 }
@@ -50,7 +50,7 @@ std::string withoutScheme(const std::string& uri) {
 }  // namespace
 
 bool isRegistered(const std::string& presented, const std::string& stored) {
-  if (!isPlain(stored)) return false;
+  if (!hasPlainCharacters(stored)) return false;
   if (hasPrivateScheme(stored)) return presented == stored;
   const std::string bare = withoutScheme(stored), authority = authorityOf(bare);
   if (!isHost(authority) || (stored != bare && stored != presented)) return false;
@@ -72,7 +72,7 @@ std::string destinationOf(const std::string& uri) {
 std::string policySourceOf(const std::string& uri) {
   std::string scheme = uri.substr(0, uri.find(':') + 1);
   const std::string authority = authorityOf(withoutScheme(uri));
-  // The policy's grammar knows no app's hosts and no bracketed addresses.
+  // An app's URI has no host, and the policy's grammar has no addresses in brackets.
   if (hasPrivateScheme(uri) || authority.front() == '[') return scheme;
   return scheme + "//" + authority;
 }

@@ -3,23 +3,19 @@
 #include <algorithm>
 #include <sstream>
 
+#include "joined.h"
 #include "refusal.h"
 
 namespace authserver {
 namespace {
 
-constexpr std::size_t kLongestList = 1024;  // bytes; must fit into columns beside other things
+constexpr std::size_t kLongestList =
+    1024;  // bytes; must fit into the column "state" behind a digest
 
 bool isScopeCharacter(char c) { return c == '!' || (c >= '#' && c <= '~' && c != '\\'); }
 
 bool isScope(const std::string& word) {
   return std::all_of(word.begin(), word.end(), isScopeCharacter);
-}
-
-std::string listOf(const std::vector<std::string>& scopes) {
-  std::string list;
-  for (const std::string& scope : scopes) list += (list.empty() ? "" : " ") + scope;
-  return list;
 }
 
 }  // namespace
@@ -58,9 +54,9 @@ bool contains(const std::string& list, const std::string& scope) {
   return std::find(scopes.begin(), scopes.end(), scope) != scopes.end();
 }
 
-std::string grantable(const std::string& asked, const std::string& registered) {
-  checkScopes(asked);
-  std::vector<std::string> scopes = scopesOf(asked.empty() ? registered : asked);
+std::string grantable(const std::string& requested, const std::string& registered) {
+  checkScopes(requested);
+  std::vector<std::string> scopes = scopesOf(requested.empty() ? registered : requested);
   scopes.erase(std::remove_if(scopes.begin(), scopes.end(),
                               [&](const std::string& scope) {
                                 return scope == kIntrospectScope || !isScope(scope) ||
@@ -68,17 +64,17 @@ std::string grantable(const std::string& asked, const std::string& registered) {
                               }),
                scopes.end());
   if (scopes.empty()) throw invalidScope("The client is registered for none of these scopes.");
-  std::string list = listOf(scopes);
+  std::string list = joined(scopes, " ");
   if (list.size() > kLongestList) throw invalidScope("The list of scopes is too long.");
   return list;
 }
 
-std::string narrowed(const std::string& asked, const std::string& granted) {
-  checkScopes(asked);
-  const std::vector<std::string> scopes = scopesOf(asked);
+std::string narrowed(const std::string& requested, const std::string& granted) {
+  checkScopes(requested);
+  const std::vector<std::string> scopes = scopesOf(requested);
   for (const std::string& scope : scopes)
     if (!contains(granted, scope)) throw invalidScope("A scope was not granted.");
-  return scopes.empty() ? granted : listOf(scopes);
+  return scopes.empty() ? granted : joined(scopes, " ");
 }
 
 }  // namespace authserver

@@ -1,4 +1,4 @@
-// Scopes: what they mean in words, and how sets of them are compared (RFC 6749, section 3.3).
+// Scopes: their meaning in words, and comparisons of lists of them (RFC 6749, section 3.3).
 
 #pragma once
 
@@ -7,9 +7,9 @@
 
 namespace authserver {
 
-// What a client may do by itself, and nobody is asked for: see every access token's data.
+// Lets a client see the data of every access token. A user cannot grant it.
 inline constexpr char kIntrospectScope[] = "introspect";
-// What the user information endpoint asks for.
+// The user information endpoint requires it.
 inline constexpr char kProfileScope[] = "profile";
 
 struct ScopeMeaning {
@@ -18,23 +18,23 @@ struct ScopeMeaning {
 // The scopes that this server knows, for the consent page and the metadata.
 const std::vector<ScopeMeaning>& knownScopes();
 
-// In words; the name itself of a scope that this server does not know.
+// The meaning in words, or the name itself if this server does not know the scope.
 std::string meaningOf(const std::string& scope);
 
-// Refuses characters that a scope cannot have.
+// Refuses a list with a character that no scope can have.
 void checkScopes(const std::string& list);
 
 // The single scopes of a list, each once.
 std::vector<std::string> scopesOf(const std::string& list);
 bool contains(const std::string& list, const std::string& scope);
 
-// What a client asks for at first, as far as it is registered and a user can grant it; everything
-// so registered if it asks for nothing in particular. Refuses if that leaves nothing. A
-// registration may come from other programs, and what is no scope in it is never granted.
-std::string grantable(const std::string& asked, const std::string& registered);
+// The part of the requested list that the client is registered for and that a user can grant. An
+// empty request means everything registered. Refuses if nothing remains. Other programs can
+// register clients too: words of a registration that are not valid scopes are ignored.
+std::string grantable(const std::string& requested, const std::string& registered);
 
-// What a refresh asks for, all that was granted if it asks for nothing in particular. Refuses what
-// was not granted (RFC 6749, section 6).
-std::string narrowed(const std::string& asked, const std::string& granted);
+// The scopes of a refresh: the requested ones, or all that were granted if the request is empty.
+// Refuses a scope that was not granted (RFC 6749, section 6).
+std::string narrowed(const std::string& requested, const std::string& granted);
 
 }  // namespace authserver

@@ -1,38 +1,36 @@
 #include "session.h"
 
-#include <charconv>
-#include <ctime>
 #include <optional>
 
+#include "clock.h"
 #include "configuration.h"
+#include "decimal_text.h"
 #include "digest.h"
 #include "random_bytes.h"
 
 namespace authserver {
 namespace {
 
-constexpr long long kLifetime = 3600;  // seconds
+constexpr std::int64_t kLifetime = 3600;  // seconds
 
 bool overHttps() { return issuer().rfind("https://", 0) == 0; }
 
-// A browser takes the prefix from https only, and then from this very host and no neighbour.
+// A browser accepts the prefix only by https, and only from this host itself.
 std::string cookieName() { return overHttps() ? "__Host-authserver" : "authserver"; }
 
 std::string signatureOf(const std::string& content) {
   return authenticator(sessionKey(), "session\n" + content);
 }
 
-// A cookie is "<user in base64url>.<expiry>.<nonce>.<signature of all before>".
+// A cookie is "<user in base64url>.<expiry>.<nonce>.<signature of the three>".
 std::optional<Session> verified(const std::string& cookie) {
   const std::size_t end = cookie.rfind('.');
   if (end == std::string::npos) return std::nullopt;
   const std::string content = cookie.substr(0, end);
   if (!equalSecrets(cookie.substr(end + 1), signatureOf(content))) return std::nullopt;
-  const std::size_t dot = content.find('.');
-  long long expiry = 0;
-  std::from_chars(content.data() + dot + 1, content.data() + content.size(), expiry);
-  if (expiry < static_cast<long long>(std::time(nullptr))) return std::nullopt;
-  return Session{cookie, fromBase64url(content.substr(0, dot))};
+  const std::size_t user = content.find('.'), expiry = content.find('.', user + 1);
+  if (fromDecimal(content.substr(user + 1, expiry - user - 1)) < unixNow()) return std::nullopt;
+  return Session{cookie, fromBase64url(content.substr(0, user))};
 }
 
 }  // namespace
@@ -44,7 +42,7 @@ Session currentSession(const Request& request) {
 }
 
 Session newSession(const std::string& user) {
-  const long long expiry = static_cast<long long>(std::time(nullptr)) + kLifetime;
+  const std::int64_t expiry = unixNow() + kLifetime;
   const std::string content =
       base64url(user) + '.' + std::to_string(expiry) + '.' + base64url(randomBytes(16));
   return {content + '.' + signatureOf(content), user};

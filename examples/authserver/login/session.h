@@ -1,4 +1,5 @@
-// Who sits at the browser: a cookie signed by this server, good for an hour. Nothing is stored.
+// Who uses the browser: a cookie that this server signs and that is valid for an hour. The server
+// stores nothing.
 
 #pragma once
 
@@ -14,18 +15,18 @@ struct Session {
   std::string user;    // "" before login
 };
 
-// The session of the request's cookie, or a new one before login.
+// The session of the request's cookie, or a new one without a user.
 Session currentSession(const Request& request);
 
-// A new session; user is "" before login. Login gets a new one, so that nobody can have planted
-// its cookie beforehand.
+// A new session; user is "" before login. Login starts a new one, so that a cookie which an
+// attacker planted before the login is worth nothing.
 Session newSession(const std::string& user);
 
-// The headers that keep the session in the browser.
+// The headers that store the session in the browser.
 Headers sessionHeaders(const Session& session);
 
-// What a form of this session for this authorization request must carry, so that another site
-// cannot send it in the user's name.
+// The value that a form of this session for this authorization request must contain. Another site
+// does not know it and cannot send the form in the user's name.
 std::string formToken(const Session& session, const std::string& authorizationRequest);
 
 }  // namespace authserver

@@ -6,11 +6,11 @@
 
 namespace authserver {
 
-// Adds the client's address. Never refuses: a request does not fail for want of a log line.
+// Adds the client's address. If the log fails, the request goes on.
 void audit(const std::string& event);
 
-// Somebody else's text in double quotes, short, without anything that a terminal or a page would
-// take for more than text.
+// Text from outside, shortened and in double quotes. Characters that a terminal or a web page could
+// interpret are escaped.
 std::string quotedForLog(const std::string& text);
 
 }  // namespace authserver

@@ -11,7 +11,7 @@ struct Client {
   std::string id, secret, redirectUri, scope, name;
 };
 
-// The client of that identifier; nothing if it is unknown or disabled.
+// The client with that identifier; nothing if it is unknown or disabled.
 std::optional<Client> findClient(const std::string& id);
 
 }  // namespace authserver

@@ -15,16 +15,16 @@ namespace {
 constexpr char kTable[] = "oauth_grantCode";
 constexpr std::size_t kCodeLength = 64;  // bytes
 
-// Lets a store serve the codes for as long as this lives.
-class CodesFor {
+// Makes a store use the table of the codes during the lifetime of this object.
+class CodeTableScope {
  public:
-  explicit CodesFor(ZEVOOAUTHSERVER::OAUTHDBBasic& store)
+  explicit CodeTableScope(ZEVOOAUTHSERVER::OAUTHDBBasic& store)
       : store_(store), ownTable_(store.GetTabName()) {
     store_.SetTabName(kTable);
   }
-  ~CodesFor() { store_.SetTabName(ownTable_); }
-  CodesFor(const CodesFor&) = delete;
-  CodesFor& operator=(const CodesFor&) = delete;
+  ~CodeTableScope() { store_.SetTabName(ownTable_); }
+  CodeTableScope(const CodeTableScope&) = delete;
+  CodeTableScope& operator=(const CodeTableScope&) = delete;
 
  private:
   ZEVOOAUTHSERVER::OAUTHDBBasic& store_;
@@ -38,8 +38,8 @@ std::string issueCode(const std::string& user, const std::string& clientId,
                       const std::string& challenge) {
   ZEVOOAUTHSERVER::OAUTHDBGrantCode store(kTable);
   requireOpen(store);
-  // The column "state" is ours to use: "<digest of the redirect URI>.<challenge>", of a fixed
-  // length and without quotes, whatever the client sent.
+  // The library does not interpret the column "state". Here it holds "<digest of the redirect
+  // URI>.<challenge>": neither part has quotes, and the digest has a fixed length.
   const std::string state = sha256(redirectUri) + '.' + challenge;
   Json::Value issued;
   const auto add = [&] {
@@ -53,7 +53,7 @@ std::string issueCode(const std::string& user, const std::string& clientId,
 
 std::optional<Code> findCode(TokenStore& tokens, const std::string& code) {
   if (code.size() != kCodeLength) return std::nullopt;
-  const CodesFor codes(tokens);
+  const CodeTableScope codes(tokens);
   Json::Value request, rows(Json::arrayValue);
   request["condition"]["code"] = code;
   attempt(tokens, [&] { return tokens.DBGet(request, &rows); });
@@ -72,7 +72,7 @@ std::optional<Code> findCode(TokenStore& tokens, const std::string& code) {
 }
 
 bool spend(TokenStore& tokens, const Code& code) {
-  const CodesFor codes(tokens);
+  const CodeTableScope codes(tokens);
   return attempt(tokens, [&] { return tokens.Del(code.id); });
 }
 

@@ -1,4 +1,4 @@
-// Authorization codes, and what is remembered with one.
+// Authorization codes, and what is stored with each.
 
 #pragma once
 
@@ -14,23 +14,23 @@ struct Code {
   long long id;
   std::string user, clientId, scope;
   std::int64_t expires;  // Unix seconds
-  // What the code must be presented with: its redirect URI, of which the digest is kept, and for
-  // PKCE (RFC 7636) the verifier of the challenge, which is "" if there is none.
+  // Who presents the code must send the redirect URI with this digest and, unless the challenge of
+  // PKCE (RFC 7636) is "", its verifier.
   std::string redirectDigest, challenge;
 };
 
-// Issues a code; if the table is full, after the expired ones are gone.
+// Issues a code. Deletes the expired codes first if the table is full.
 std::string issueCode(const std::string& user, const std::string& clientId,
                       const std::string& scope, const std::string& redirectUri,
                       const std::string& challenge);
 
-// These two go through the store of the tokens. Each store is a connection, and a transaction spans
-// one: only so do spending a code and issuing what it is spent for happen together, or not at all.
+// The next two use the store of the tokens. Each store has its own connection, and a transaction
+// belongs to one connection: this way one transaction spends a code and issues the tokens for it.
 
-// Expired codes are found too.
+// Finds expired codes too.
 std::optional<Code> findCode(TokenStore& tokens, const std::string& code);
 
-// Whether the code was still there to be spent.
+// Deletes the code. False if another program has already deleted it.
 bool spend(TokenStore& tokens, const Code& code);
 
 }  // namespace authserver

@@ -1,4 +1,4 @@
-// The folder that authserver_setup made, named by the variable AUTHSERVER_FOLDER.
+// The folder that authserver_setup makes. The environment variable AUTHSERVER_FOLDER names it.
 
 #pragma once
 
@@ -14,10 +14,10 @@ std::string configurationPath(const std::string& name);
 std::string readFile(const std::string& path);
 Json::Value readJsonFile(const std::string& path);
 
-// The server's own name, for example "https://login.example" (RFC 8414): no slash at its end.
+// The server's own name (RFC 8414), without a slash at its end: "https://login.example".
 std::string issuer();
 
-// What sessions are signed with, 32 bytes.
+// The key that signs sessions, 32 bytes.
 std::string sessionKey();
 
 }  // namespace authserver

@@ -6,23 +6,23 @@
 namespace authserver {
 namespace {
 
-// SQLite's codes for a database that others are using.
+// SQLite's error codes while another connection holds a lock.
 constexpr int kBusy = 5, kLocked = 6;
 
 }  // namespace
 
 void requireOpen(const ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
   if (store.GetErrCode() == ZEVOOAUTHSERVER::kErrNone) return;
-  // In one piece: other programs write to the same log.
+  // One write: other programs write to the same log.
   std::cerr << "authserver: the database did not open [" + std::to_string(store.GetErrCode()) +
                    "] " + store.GetErrMsg() + '\n';
   throw temporarilyUnavailable();
 }
 
-bool isJustMissing(const ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
+bool isMissingRow(const ZEVOOAUTHSERVER::OAUTHDBBasic& store) {
   switch (store.GetErrCode()) {
     case ZEVOOAUTHSERVER::kErrNone:
-    case ZEVOOAUTHSERVER::kErrBadParameters:  // of a length that no row can have
+    case ZEVOOAUTHSERVER::kErrBadParameters:  // a value of a length that no row can have
       return true;
     case ZEVOOAUTHSERVER::kErrTableFull:
       throw TableFull();

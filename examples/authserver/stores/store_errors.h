@@ -1,4 +1,5 @@
-// What the result of a store's operation means for the request: done, not there, or "try again".
+// What the result of a store's operation means for the request: success, no such row, or "try
+// again".
 
 #pragma once
 
@@ -9,27 +10,27 @@
 
 namespace authserver {
 
-// A table has no room, or could not be counted, which the stores report alike.
+// A table is full or could not be counted. The stores report the same error for both.
 struct TableFull : std::exception {};
 
-// Refuses the request, with "try again", if the store did not open. Without this look everything
-// it is asked later would read as "not there".
+// Refuses the request with "try again" if the store did not open. Without this check, the results
+// of its operations would look like "no such row".
 void requireOpen(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
 
-// Whether an operation's failure only means that there is no such row. Throws otherwise: the
-// refusal "try again" for a busy database, TableFull, or the store's own words.
-bool isJustMissing(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
+// True if an operation failed only because there is no such row. Otherwise throws the refusal "try
+// again" for a busy database, TableFull, or an error with the store's message.
+bool isMissingRow(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
 
 // Runs one operation: true if it succeeded, false if there is no such row.
 template <class Operation>
 bool attempt(ZEVOOAUTHSERVER::OAUTHDBBasic& store, Operation operation) {
   // A success leaves an earlier error in place, and a missing row records none.
   store.SetErrCode(ZEVOOAUTHSERVER::kErrNone);
-  return operation() || !isJustMissing(store);
+  return operation() || !isMissingRow(store);
 }
 
-// Runs an operation that adds a row; if the table is full, once more after makeRoom, and then
-// refuses the request with "try again".
+// Runs an operation that adds a row. If the table is full, calls makeRoom and runs the operation
+// once more. If the table is still full, refuses the request with "try again".
 template <class Operation, class MakeRoom>
 auto withRoom(Operation operation, MakeRoom makeRoom) -> decltype(operation()) try {
   try {

@@ -1,4 +1,4 @@
-// Reading the rows of the stores.
+// Values from the rows of the stores.
 
 #pragma once
 
@@ -9,12 +9,11 @@
 
 namespace authserver {
 
-// The text as it was once given. The stores double a single quote before they quote the value for
-// SQL, which doubles it again, so that it comes back doubled. Every text of a row is read by this.
+// The text as it was given to the store. A store doubles single quotes before it quotes the value
+// for SQL, which doubles them again. So rows hold them doubled, and every text needs this function.
 std::string storedText(const Json::Value& row, const char* column);
 
-// A number, which rows hold as decimal text; 0 if it is none, and the nearest that fits if it is
-// beyond 64 bits, as the library reads it: an expiry in the far future is not in the past.
+// A number, which rows hold as decimal text; see fromDecimal().
 std::int64_t storedNumber(const Json::Value& row, const char* column);
 
 }  // namespace authserver

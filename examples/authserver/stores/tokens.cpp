@@ -1,8 +1,8 @@
 #include "tokens.h"
 
-#include <ctime>
 #include <stdexcept>
 
+#include "clock.h"
 #include "digest.h"
 #include "oauth_utils.h"
 #include "store_errors.h"
@@ -12,19 +12,20 @@
 namespace authserver {
 namespace {
 
-// The column "state" is ours to use: "<digest of the code> <scope of the refresh token>".
+// The library does not interpret the column "state". Here it holds "<digest of the code> <scope of
+// the refresh token>".
 std::string stateOf(const Grant& grant) { return grant.codeDigest + ' ' + grant.refreshScope; }
 
 Token tokenOf(const Json::Value& row) {
   const std::string state = storedText(row, "state"), scope = storedText(row, "scope");
-  const bool ours = state.size() > kDigestLength + 1 && state[kDigestLength] == ' ';
+  const bool isOurForm = state.size() > kDigestLength + 1 && state[kDigestLength] == ' ';
   return {storedNumber(row, "id"),
           {storedText(row, "username"), storedText(row, "client_id"), scope,
-           ours ? state.substr(kDigestLength + 1) : scope, state.substr(0, kDigestLength)},
+           isOurForm ? state.substr(kDigestLength + 1) : scope, state.substr(0, kDigestLength)},
           storedNumber(row, "expired_time")};
 }
 
-std::optional<Token> first(const Json::Value& rows) {
+std::optional<Token> firstToken(const Json::Value& rows) {
   if (rows.empty()) return std::nullopt;
   return tokenOf(rows[0U]);
 }
@@ -36,13 +37,13 @@ TokenStore::TokenStore() : OAUTHDBToken("oauth_token") { requireOpen(*this); }
 std::optional<Token> findAccessToken(TokenStore& store, const std::string& token) {
   Json::Value rows(Json::arrayValue);
   attempt(store, [&] { return store.GetWithAccessToken(token, &rows); });
-  return first(rows);
+  return firstToken(rows);
 }
 
 std::optional<Token> findRefreshToken(TokenStore& store, const std::string& token) {
   Json::Value rows(Json::arrayValue);
   attempt(store, [&] { return store.GetWithRefreshToken(token, &rows); });
-  return first(rows);
+  return firstToken(rows);
 }
 
 Json::Value issueTokens(TokenStore& store, const Grant& grant, const std::string& flow) {
@@ -74,8 +75,8 @@ int revokeIssuedFor(TokenStore& store, const std::string& codeDigest, const std:
 }
 
 void purgeLongExpired(TokenStore& store) {
-  constexpr std::int64_t kLongestRest = 30LL * 24 * 60 * 60;  // seconds without a refresh
-  const std::int64_t oldest = static_cast<std::int64_t>(std::time(nullptr)) - kLongestRest;
+  constexpr std::int64_t kLongestPause = 30LL * 24 * 60 * 60;  // seconds without a refresh
+  const std::int64_t oldest = unixNow() - kLongestPause;
   Transaction transaction(store);
   Json::Value rows(Json::arrayValue);
   attempt(store, [&] { return store.Get(&rows); });

@@ -10,38 +10,38 @@
 
 namespace authserver {
 
-// The store, which has opened or refuses the request.
+// The store. Its constructor refuses the request if the store does not open.
 class TokenStore : public ZEVOOAUTHSERVER::OAUTHDBToken {
  public:
   TokenStore();
 };
 
-// What tokens are issued for. A row holds an access token and its refresh token; a refresh may
-// narrow the scope of the former, never that of the latter (RFC 6749, section 6).
+// What tokens are issued for. A row holds an access token and its refresh token. A refresh may
+// narrow the scope of the access token, but never that of the refresh token (RFC 6749, section 6).
 struct Grant {
   std::string user, clientId;
   std::string accessScope, refreshScope;
-  std::string codeDigest;  // of the code that it all began with
+  std::string codeDigest;  // of the code that the first tokens were issued for
 };
 
 struct Token {
   long long id;
   Grant grant;
-  std::int64_t expires;  // Unix seconds, concerns the access token
+  std::int64_t expires;  // Unix seconds; a refresh token does not expire
 };
 
-// Expired ones are found too.
+// Both find expired tokens too.
 std::optional<Token> findAccessToken(TokenStore& store, const std::string& token);
 std::optional<Token> findRefreshToken(TokenStore& store, const std::string& token);
 
 // Issues tokens and returns the document for the client (RFC 6749, section 5.1). Throws TableFull.
 Json::Value issueTokens(TokenStore& store, const Grant& grant, const std::string& flow);
 
-// Revokes what the client got for a code; returns how many rows that were.
+// Revokes the tokens that the client got for a code. Returns their number of rows.
 int revokeIssuedFor(TokenStore& store, const std::string& codeDigest, const std::string& clientId);
 
-// Deletes what expired so long ago that its refresh token will not be missed. Not the library's
-// Purge(), which would end every login whose access token has expired.
+// Deletes the rows that expired so long ago that nobody will use their refresh tokens. The
+// library's Purge() would end every login whose access token has expired.
 void purgeLongExpired(TokenStore& store);
 
 }  // namespace authserver

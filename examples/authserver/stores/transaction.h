@@ -1,4 +1,4 @@
-// Several operations of one store as one: all of them happen, or none.
+// Several operations of one store: all of them take effect, or none.
 
 #pragma once
 
@@ -6,13 +6,13 @@
 
 namespace authserver {
 
-// Takes the database's write lock at once and rolls back unless it is committed.
+// Takes the write lock of the database at once. Rolls back unless it is committed.
 //
-// Spending needs it: stores delete by row id, and the id of a deleted row may be given to the next
-// new one. Without the lock a program that found a code, and was overtaken by another that spent
-// it, could delete the code of somebody else and take its own for spent by itself.
+// Whoever spends a code or a refresh token needs it. Stores delete by row id, and a new row may get
+// the id of a deleted one. Without the lock, another program could spend a code after this one
+// found it; this one would then delete somebody else's code and believe that it had spent its own.
 //
-// Nothing but this store may write meanwhile. Its Purge() becomes a part of the transaction.
+// Only this store may write meanwhile. Its Purge() becomes a part of the transaction.
 class Transaction {
  public:
   explicit Transaction(ZEVOOAUTHSERVER::OAUTHDBBasic& store) : store_(store) {

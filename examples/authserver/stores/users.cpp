@@ -9,23 +9,23 @@
 namespace authserver {
 namespace {
 
-// Small enough for several logins at once on an appliance with little memory, and still some ten
-// milliseconds of a fast processor for every guess.
+// An appliance with little memory can serve several logins at once, and each guess still costs some
+// ten milliseconds of a fast processor.
 constexpr unsigned long long kPasses = 3;
 constexpr std::size_t kMemory = 12UL * 1024 * 1024;  // bytes
 
-Json::Value document() { return readJsonFile(configurationPath("users.json")); }
+Json::Value usersFile() { return readJsonFile(configurationPath("users.json")); }
 
 }  // namespace
 
 std::optional<User> findUser(const std::string& name) {
-  const Json::Value users = document()["users"];
+  const Json::Value users = usersFile()["users"];
   if (name.empty() || !users.isMember(name)) return std::nullopt;
   return User{name, users[name]["display_name"].asString()};
 }
 
 std::optional<User> checkPassword(const std::string& name, const std::string& password) {
-  const Json::Value content = document();
+  const Json::Value content = usersFile();
   const Json::Value& users = content["users"];
   const bool known = !name.empty() && users.isMember(name);
   const std::string hash = known ? users[name]["password"].asString() : content["decoy"].asString();
