@@ -10,7 +10,7 @@
 
 namespace authserver {
 
-// A table is full or could not be counted. The stores report the same error for both.
+// Thrown if a table is full or could not be counted. The stores report the same error for both.
 struct TableFull : std::exception {};
 
 // Refuses the request with "try again" if the store did not open. Without this check, the results
