@@ -42,7 +42,7 @@ serve() {
   secret=$(grep -oP '"client_secret" : "\K\w+' <<<"$client")
 
   need_free_port
-  lighttpd -D -f "$AUTHSERVER_SOURCE/lighttpd.conf" &
+  lighttpd -D -f "${AUTHSERVER_SETUP%/*}/lighttpd.conf" &
   server=$!
   trap 'kill "$server" 2>/dev/null || true' INT TERM
   until answers; do

@@ -1,5 +1,5 @@
 // GET and POST /authorize: the user logs in and decides, and the client gets a code (RFC 6749,
-// section 4.1). Every form brings the authorization request again, which is checked afresh.
+// section 4.1). Every form sends the authorization request again, and it is checked again.
 
 #include "audit.h"
 #include "authorization_request.h"
@@ -24,8 +24,8 @@ Response withSession(Response response, const Session& session) {
   return response;
 }
 
-// The login page or, for whoever is logged in, the consent page.
-Response show(const AuthorizationRequest& request, const Session& session) {
+// The consent page, or the login page if nobody is logged in.
+Response nextPage(const AuthorizationRequest& request, const Session& session) {
   const std::optional<User> user = findUser(session.user);
   if (!user) return withSession(loginPage(formOf(request, session), "", false), session);
   std::vector<std::string> wishes;
@@ -33,15 +33,15 @@ Response show(const AuthorizationRequest& request, const Session& session) {
   return consentPage(formOf(request, session), user->displayName, wishes);
 }
 
-// The same request again, with GET: a page that can be reloaded.
-Response showAgain(const AuthorizationRequest& request, const Session& session) {
+// Redirects to the same request by GET. The user can reload that page.
+Response redirectToRequest(const AuthorizationRequest& request, const Session& session) {
   return withSession(redirection(303, "/authorize?" + formEncoded(request.fields())), session);
 }
 
 Response logIn(const Request& http, const AuthorizationRequest& request, const Session& session) {
   const std::string name = http.get("username");
   if (const auto user = checkPassword(name, http.get("password")))
-    return showAgain(request, newSession(user->name));
+    return redirectToRequest(request, newSession(user->name));
   audit("login failed for " + quotedForLog(name));
   return loginPage(formOf(request, session), name, true);
 }
@@ -51,15 +51,16 @@ Response allow(const AuthorizationRequest& request, const User& user) {
                                      request.redirectUri(), request.challenge());
   audit(quotedForLog(user.name) + " allowed " + quotedForLog(request.client().name) + " " +
         quotedForLog(request.scope()));
-  return redirection(303, request.answer({{"code", code}}));
+  return redirection(303, request.answerUrl({{"code", code}}));
 }
 
-Response act(const Request& http, const AuthorizationRequest& request, const Session& session) {
+Response pressedButton(const Request& http, const AuthorizationRequest& request,
+                       const Session& session) {
   const std::string action = http.get("action");
   if (action == "login") return logIn(http, request, session);
-  if (action == "switch") return showAgain(request, newSession(""));
+  if (action == "switch") return redirectToRequest(request, newSession(""));
   const std::optional<User> user = findUser(session.user);
-  if (!user) return show(request, session);
+  if (!user) return nextPage(request, session);
   if (action == "allow") return allow(request, *user);
   if (action == "deny") throw Refusal(400, "access_denied", "The user said no.");
   throw invalidRequest("The form lacks an action.");
@@ -74,15 +75,15 @@ void checkFormToken(const Request& http, const AuthorizationRequest& request,
 
 Response backToClient(const Request& http, const AuthorizationRequest& request,
                       const Refusal& refusal) {
-  return redirection(http.isPost() ? 303 : 302, request.answer(refusal));
+  return redirection(http.isPost() ? 303 : 302, request.answerUrl(refusal));
 }
 
-Response decide(const Request& http, AuthorizationRequest& request) {
+Response answerOf(const Request& http, AuthorizationRequest& request) {
   const Session session = currentSession(http);
   if (http.isPost()) checkFormToken(http, request, session);
   try {
     request.check();
-    return http.isPost() ? act(http, request, session) : show(request, session);
+    return http.isPost() ? pressedButton(http, request, session) : nextPage(request, session);
   } catch (const Refusal& refusal) {
     return backToClient(http, request, refusal);
   }
@@ -91,10 +92,10 @@ Response decide(const Request& http, AuthorizationRequest& request) {
 Response authorize(const Request& http) {
   AuthorizationRequest request(http);
   try {
-    return decide(http, request);
+    return answerOf(http, request);
   } catch (const Refusal&) {
     throw;
-  } catch (const std::exception& error) {  // as an error code, since no status goes by redirect
+  } catch (const std::exception& error) {  // a redirect has no status of an error
     return backToClient(http, request, serverError(error));
   }
 }
@@ -102,6 +103,4 @@ Response authorize(const Request& http) {
 }  // namespace
 }  // namespace authserver
 
-int main() {
-  return authserver::serve({"GET", "HEAD", "POST"}, authserver::authorize, authserver::errorPage);
-}
+int main() { return authserver::serve("authorize", authserver::authorize, authserver::errorPage); }

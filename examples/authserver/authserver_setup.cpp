@@ -1,4 +1,4 @@
-// authserver_setup: makes the folder of a server, adds its users and registers its clients.
+// authserver_setup: makes the folder of a server, adds users and registers clients.
 
 #include <sodium.h>
 #include <sys/stat.h>
@@ -20,7 +20,7 @@
 namespace authserver {
 namespace {
 
-// A new file takes the old one's place at once: no program ever reads half of one.
+// Replaces the old file in one step: no program ever reads half a file.
 void writeFile(const std::string& path, const std::string& content) {
   const std::string unfinished = path + ".new";
   std::ofstream file(unfinished, std::ios::binary | std::ios::trunc);
@@ -50,7 +50,7 @@ void init(const std::string& folder, const std::string& issuer) {
   writeJsonFile(configurationPath("config.json"), configuration);
 }
 
-// The first line of standard input, which may end as Windows ends lines.
+// The first line of standard input. It may end with CR LF.
 std::string givenPassword() {
   std::string password;
   std::getline(std::cin, password);
@@ -61,7 +61,7 @@ std::string givenPassword() {
 }
 
 void addUser(const std::string& name, const std::string& displayName) {
-  constexpr std::size_t kLongestName = 256;  // bytes, as the stores take
+  constexpr std::size_t kLongestName = 256;  // bytes, the limit of the stores
   if (name.empty() || name.size() > kLongestName || hasControlCharacters(name))
     throw std::runtime_error("a name has 1 to 256 bytes and no control characters");
   const std::string password = givenPassword();
@@ -73,7 +73,7 @@ void addUser(const std::string& name, const std::string& displayName) {
   writeJsonFile(configurationPath("users.json"), document);
 }
 
-// Tells identifier and secret, this once.
+// Prints identifier and secret. The secret is not shown again.
 void addClient(const std::string& redirectUri, const std::string& scope, const std::string& name) {
   if (!isRegistrable(redirectUri))
     throw std::runtime_error(

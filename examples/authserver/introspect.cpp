@@ -1,10 +1,9 @@
-// POST /introspect: what a token is good for (RFC 7662). A client learns about its own tokens; one
-// registered for the scope "introspect", such as a resource server, about everybody's access
-// tokens. A refresh token is nobody's business but its client's.
-
-#include <ctime>
+// POST /introspect: what a token is valid for (RFC 7662). A client learns about its own tokens. A
+// client with the scope "introspect", such as a resource server, also learns about the access
+// tokens of all clients. Only its own client learns about a refresh token.
 
 #include "client_authentication.h"
+#include "clock.h"
 #include "configuration.h"
 #include "endpoint.h"
 #include "scope.h"
@@ -14,13 +13,13 @@
 namespace authserver {
 namespace {
 
-bool maySeeAccess(const Client& client, const Token& token) {
+bool maySeeAccessToken(const Client& client, const Token& token) {
   if (token.grant.clientId == client.id) return true;
-  // The tokens of a disabled client are worth nothing.
+  // The tokens of a disabled client are void.
   return contains(client.scope, kIntrospectScope) && findClient(token.grant.clientId).has_value();
 }
 
-// What a user allowed ends with the user.
+// A removed user's grants are void.
 bool hasUser(const Token& token) { return findUser(token.grant.user).has_value(); }
 
 Json::Value describe(const Token& token, const std::string& scope) {
@@ -43,14 +42,14 @@ Json::Value inactive() {
 Json::Value stateOf(const std::string& presented, const Client& client) {
   TokenStore tokens;
   if (const auto token = findAccessToken(tokens, presented)) {
-    const bool expired = static_cast<std::int64_t>(std::time(nullptr)) > token->expires;
-    if (expired || !maySeeAccess(client, *token) || !hasUser(*token)) return inactive();
+    const bool expired = unixNow() > token->expires;
+    if (expired || !maySeeAccessToken(client, *token) || !hasUser(*token)) return inactive();
     Json::Value document = describe(*token, token->grant.accessScope);
     document["token_type"] = "Bearer";
     document["exp"] = static_cast<Json::Int64>(token->expires);
     return document;
   }
-  const auto token = findRefreshToken(tokens, presented);  // of these none expires by itself
+  const auto token = findRefreshToken(tokens, presented);  // which never expires
   if (!token || token->grant.clientId != client.id || !hasUser(*token)) return inactive();
   return describe(*token, token->grant.refreshScope);
 }
@@ -58,12 +57,12 @@ Json::Value stateOf(const std::string& presented, const Client& client) {
 Response introspect(const Request& http) {
   http.requireSoundParameters();
   const Client client = authenticatedClient(http);
-  const std::string presented = http.get("token");
-  if (presented.empty()) throw invalidRequest("token is missing.");
-  return jsonResponse(200, stateOf(presented, client));
+  return jsonResponse(200, stateOf(http.required("token"), client));
 }
 
 }  // namespace
 }  // namespace authserver
 
-int main() { return authserver::serve({"POST"}, authserver::introspect, authserver::jsonRefusal); }
+int main() {
+  return authserver::serve("introspect", authserver::introspect, authserver::jsonRefusal);
+}

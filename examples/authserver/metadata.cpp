@@ -1,7 +1,8 @@
-// GET /.well-known/oauth-authorization-server: what this server can do and where (RFC 8414).
+// GET /.well-known/oauth-authorization-server: what this server offers, and its URLs (RFC 8414).
 
 #include "configuration.h"
 #include "endpoint.h"
+#include "endpoints.h"
 #include "scope.h"
 
 namespace authserver {
@@ -17,26 +18,24 @@ Response metadata(const Request&) {
   const std::string base = issuer();
   Json::Value document;
   document["issuer"] = base;
-  document["authorization_endpoint"] = base + "/authorize";
-  document["token_endpoint"] = base + "/token";
-  document["revocation_endpoint"] = base + "/revoke";
-  document["introspection_endpoint"] = base + "/introspect";
-  document["userinfo_endpoint"] = base + "/userinfo";
+  for (const Endpoint& endpoint : endpoints()) {
+    if (endpoint.metadataName.empty()) continue;
+    const std::string name = endpoint.metadataName + "_endpoint";
+    document[name] = base + endpoint.path;
+    if (endpoint.clientAuthenticates)
+      document[name + "_auth_methods_supported"] =
+          list({"client_secret_basic", "client_secret_post"});
+  }
   for (const ScopeMeaning& scope : knownScopes()) document["scopes_supported"].append(scope.name);
   document["response_types_supported"] = list({"code"});
   document["response_modes_supported"] = list({"query"});
   document["grant_types_supported"] = list({"authorization_code", "refresh_token"});
   document["code_challenge_methods_supported"] = list({"S256"});
   document["authorization_response_iss_parameter_supported"] = true;
-  for (const char* const endpoint : {"token", "revocation", "introspection"})
-    document[std::string(endpoint) + "_endpoint_auth_methods_supported"] =
-        list({"client_secret_basic", "client_secret_post"});
   return jsonResponse(200, document);
 }
 
 }  // namespace
 }  // namespace authserver
 
-int main() {
-  return authserver::serve({"GET", "HEAD"}, authserver::metadata, authserver::jsonRefusal);
-}
+int main() { return authserver::serve("metadata", authserver::metadata, authserver::jsonRefusal); }

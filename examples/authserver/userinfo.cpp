@@ -1,7 +1,5 @@
-// GET /userinfo: the protected resource. Who presents an access token with the scope "profile" in
-// the header Authorization (RFC 6750) learns the name of its user.
-
-#include <strings.h>
+// GET /userinfo: the protected resource. A request with an access token of the scope "profile" in
+// the header Authorization (RFC 6750) gets the name of the token's user.
 
 #include "clients.h"
 #include "endpoint.h"
@@ -14,8 +12,6 @@
 namespace authserver {
 namespace {
 
-constexpr char kBearer[] = "Bearer ";
-
 constexpr char kChallenge[] = "Bearer realm=\"authserver\"";
 
 Refusal refused(int status, const std::string& error, const std::string& words,
@@ -25,15 +21,8 @@ Refusal refused(int status, const std::string& error, const std::string& words,
   return {status, error, words, {{"WWW-Authenticate", kChallenge + details}}};
 }
 
-// "" if the request brings none.
-std::string presentedToken() {
-  const std::string header = Request::authorization();
-  if (strncasecmp(header.c_str(), kBearer, sizeof kBearer - 1) != 0) return "";
-  return header.substr(sizeof kBearer - 1);
-}
-
-// Verify() tells whom a token speaks for but not which client holds it, which is looked up apart:
-// the tokens of a disabled client are worth nothing.
+// Verify() returns the user of a token but not its client, which needs a second look-up: the tokens
+// of a disabled client are void.
 std::string userOf(const std::string& presented) {
   TokenStore tokens;
   Json::Value verified;
@@ -48,8 +37,8 @@ std::string userOf(const std::string& presented) {
 }
 
 Response userinfo(const Request&) {
-  const std::string presented = presentedToken();
-  // Who tried nothing is told of no error (RFC 6750, section 3.1).
+  const std::string presented = Request::credentials("Bearer").value_or("");
+  // A request without a token gets no error code (RFC 6750, section 3.1).
   if (presented.empty()) return {401, {{"WWW-Authenticate", kChallenge}}, ""};
   const std::optional<User> user = findUser(userOf(presented));
   if (!user) throw refused(401, "invalid_token", "The user is gone.");
@@ -62,6 +51,4 @@ Response userinfo(const Request&) {
 }  // namespace
 }  // namespace authserver
 
-int main() {
-  return authserver::serve({"GET", "HEAD"}, authserver::userinfo, authserver::jsonRefusal);
-}
+int main() { return authserver::serve("userinfo", authserver::userinfo, authserver::jsonRefusal); }

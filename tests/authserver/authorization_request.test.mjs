@@ -1,9 +1,9 @@
-// GET /authorize: which requests reach a page, which go back to the client, which go nowhere.
+// GET /authorize: which requests get a page, a redirect to the client, or an error page.
 
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
 
-import { allowed, atConsent, authorizeUrl, pkce, tradeCode, withChallenge } from './code_flow.mjs';
+import { allowed, atConsent, authorizeUrl, pkce, exchangeCode, withChallenge } from './code_flow.mjs';
 import { elements, FormBrowser, textOf } from './form_browser.mjs';
 import { basic, encoded, post, request } from './http.mjs';
 import { assertBadRequest, assertErrorPage, assertRedirected, assertTokens } from './outcomes.mjs';
@@ -130,7 +130,7 @@ test('a registration that kept its scheme matches with that scheme only', async 
   }
 });
 
-test('redirect URIs that could never match safely cannot be registered', () => {
+test('redirect URIs that can never match safely cannot be registered', () => {
   for (const redirectUri of [
     'http://album.example/callback',
     'https://album.example/#fragment',
@@ -183,12 +183,12 @@ test('response types other than code are refused by redirect', async () => {
     );
 });
 
-test('scopes that the client is not registered for are left out', async () => {
+test('scopes that the client is not registered for are ignored', async () => {
   assert.deepEqual(await wishes(album, { scope: 'read admin read' }), [
     'See your photos and albums',
   ]);
   const { code } = await allowed(server, album, { scope: 'admin profile read' });
-  assertTokens(await tradeCode(server, album, code), { scope: 'profile read' });
+  assertTokens(await exchangeCode(server, album, code), { scope: 'profile read' });
   server.clear();
 });
 
@@ -205,12 +205,12 @@ test('a request without a scope asks for everything registered', async () => {
   ]);
 });
 
-test('a registered scope that is none is not granted and harms nothing', async () => {
+test('words of a registration that are not valid scopes are not granted', async () => {
   const odd = server.addClient({ ...photoAlbum, name: 'Odd' });
   server.sql(`UPDATE oauth_clientInfo SET scope = 'read "x" \\' WHERE display_name = 'Odd'`);
   for (const scope of [undefined, 'read', 'read write']) {
     const { code } = await allowed(server, odd, { scope });
-    const { json: tokens } = await tradeCode(server, odd, code);
+    const { json: tokens } = await exchangeCode(server, odd, code);
     assert.equal(tokens.scope, 'read');
     const seen = await post(server, '/introspect', { token: tokens.access_token }, basic(odd));
     assert.deepEqual([seen.status, seen.json.active, seen.json.scope], [200, true, 'read']);
@@ -220,7 +220,7 @@ test('a registered scope that is none is not granted and harms nothing', async (
   server.clear();
 });
 
-test('state comes back unchanged whatever it holds', async () => {
+test('state comes back unchanged whatever it contains', async () => {
   for (const state of ['%', '&error=x', 'a b+c', '#?/\\', 'ümlaut €', '"\'<>', '/'.repeat(4096)]) {
     const answer = await allowed(server, album, { state });
     assert.deepEqual(
@@ -253,7 +253,7 @@ test('a registered query of the redirect URI is kept', async () => {
   );
 });
 
-test('PKCE by plain, without a method or with a challenge of another shape is refused', async () => {
+test('PKCE with method plain, without a method or with a malformed challenge is refused', async () => {
   const { verifier, challenge } = pkce();
   const wrong = [
     { code_challenge: verifier, code_challenge_method: 'plain' },
@@ -286,7 +286,7 @@ test('the first visit sets one cookie that scripts and other sites cannot use', 
   );
 });
 
-test('behind https the cookie goes over https only and belongs to this host alone', async () => {
+test('with an https issuer the cookie is sent by https only and only to this host', async () => {
   server.actFor('https://login.example');
   const answer = await request(server.issuer + authorizeUrl(album));
   server.actFor(server.issuer);

@@ -1,4 +1,4 @@
-// A server whose folder lacks a file: nobody is told why, but everybody that something is wrong.
+// A server whose folder lacks a file: every answer reports an error and hides its reason.
 
 import assert from 'node:assert/strict';
 import { renameSync } from 'node:fs';
@@ -40,7 +40,7 @@ test('a failure at /authorize goes back to the client as server_error', async ()
   );
 });
 
-test('a failure goes nowhere when there is nowhere to go', async () => {
+test('a failure without a valid redirect URI gets a page and no redirect', async () => {
   await without('session.key', async () => {
     assertErrorPage(await ask({ redirect_uri: 'https://evil.example/' }), 400);
     assertErrorPage(await ask({ client_id: 'x' }), 400);
@@ -48,7 +48,7 @@ test('a failure goes nowhere when there is nowhere to go', async () => {
   await without('config.json', async () => assertErrorPage(await ask(), 500));
 });
 
-test('a failure elsewhere is 500 without its reason', async () => {
+test('a failure at another endpoint is 500 and hides its reason', async () => {
   const { access_token: token } = await issued(server, album);
   await without('users.json', async () => {
     const answer = await request(`${server.issuer}/userinfo`, { headers: bearer(token) });

@@ -1,4 +1,4 @@
-// A person at a real browser.
+// A person with a real browser.
 
 import assert from 'node:assert/strict';
 import { once } from 'node:events';
@@ -7,7 +7,7 @@ import http from 'node:http';
 import { after, afterEach, before, test } from 'node:test';
 
 import { launch, openWindow } from './chromium.mjs';
-import { authorizeUrl, tradeCode } from './code_flow.mjs';
+import { authorizeUrl, exchangeCode } from './code_flow.mjs';
 import { assertTokens } from './outcomes.mjs';
 import { alice, photoAlbum, Server } from './server.mjs';
 
@@ -64,7 +64,7 @@ afterEach(() => {
 });
 callbacks = [];
 
-// Runs the steps in a window, whose page must have had nothing to complain about.
+// Runs the steps in a window and asserts that its page caused no console message or error.
 async function inWindow(options, steps) {
   const { page, complaints, close } = await openWindow(browser, options);
   try {
@@ -90,7 +90,7 @@ async function assertAllowed() {
   assert.equal(callbacks.length, 1);
   const { code, ...rest } = Object.fromEntries(callbacks[0]);
   assert.deepEqual(rest, { state: 'as it was', iss: server.issuer });
-  assertTokens(await tradeCode(server, album, code), { scope: 'read write profile' });
+  assertTokens(await exchangeCode(server, album, code), { scope: 'read write profile' });
 }
 
 const windows = {
@@ -131,7 +131,7 @@ for (const [where, options] of Object.entries(windows)) {
       assert.deepEqual(server.rows(), { codes: [], tokens: [] });
     }));
 
-  test(`a wrong password is told beside its field and can be mended ${where}`, () =>
+  test(`a wrong password is reported beside its field and can be corrected ${where}`, () =>
     inWindow(options, async (page) => {
       await open(page);
       await logIn(page, { name: 'alice', password: 'wrong password' });
@@ -154,7 +154,7 @@ for (const [where, options] of Object.entries(windows)) {
     }));
 }
 
-test('a person who is logged in is asked without a password, and can change the account', () =>
+test('a person who is logged in needs no password and can change the account', () =>
   inWindow({}, async (page) => {
     await open(page);
     await logIn(page);
@@ -166,7 +166,7 @@ test('a person who is logged in is asked without a password, and can change the 
     await heading(page, 'Log in');
   }));
 
-test('everything can be done with the keyboard, and the focus is seen', () =>
+test('everything can be done with the keyboard, and the focus is visible', () =>
   inWindow({}, async (page) => {
     const focused = async () => {
       const element = page.locator(':focus-visible');
@@ -244,7 +244,7 @@ test('the error page meets WCAG 2.2 AA as far as a program can tell', async () =
   await close();
 });
 
-test('nothing is wider than a narrow phone or smaller than a finger, also with long names', () =>
+test('the pages fit on a narrow phone and buttons are large enough, also with long names', () =>
   inWindow({ ...phone, viewport: { width: 320, height: 480 } }, async (page) => {
     const long = server.addClient({
       redirectUri: `https://${'l'.repeat(60)}.${'l'.repeat(60)}.example/`,
@@ -293,7 +293,7 @@ test('scripts in every field are shown as text and do not run', () =>
     assert.equal(callbacks[0].get('state'), script);
   }));
 
-test('scripts in a refused request are not even shown', async () => {
+test('scripts in a refused request are not shown', async () => {
   const { page, complaints, close } = await openWindow(browser);
   for (const name of ['client_id', 'redirect_uri', 'scope', 'state']) {
     await open(page, { ...album, id: 'unknown' }, { [name]: script });
@@ -307,7 +307,7 @@ test('scripts in a refused request are not even shown', async () => {
   await close();
 });
 
-test('the policy stops scripts, styles, images and foreign forms that got into a page after all', async () => {
+test('the policy stops injected scripts, styles, images and foreign forms', async () => {
   const { page, complaints, close } = await openWindow(browser);
   await open(page);
   await page.evaluate(() => {
@@ -324,7 +324,7 @@ test('the policy stops scripts, styles, images and foreign forms that got into a
   const before = page.url();
   await page.getByLabel('Name').fill(alice.name);
   await page.getByLabel('Password').fill(alice.password);
-  await button(page, 'Log in').click({ noWaitAfter: true }); // it leads nowhere
+  await button(page, 'Log in').click({ noWaitAfter: true }); // the policy blocks the form
   await page.waitForTimeout(500);
   assert.equal(page.url(), before);
   const blocked = complaints.map(

@@ -1,10 +1,10 @@
-// A database that others keep locked: "try again", which is neither yes nor no.
+// A database that another process keeps locked: the answer is "try again".
 
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
 import { setTimeout as sleep } from 'node:timers/promises';
 
-import { atConsent, allowed, authorizeUrl, issued, refresh, tradeCode } from './code_flow.mjs';
+import { atConsent, allowed, authorizeUrl, issued, refresh, exchangeCode } from './code_flow.mjs';
 import { FormBrowser } from './form_browser.mjs';
 import { basic, bearer, post, request } from './http.mjs';
 import { assertErrorPage, assertRedirected, assertRefused, assertTokens } from './outcomes.mjs';
@@ -22,7 +22,7 @@ const userinfo = (token) => request(`${server.issuer}/userinfo`, { headers: bear
 const introspect = (token) => post(server, '/introspect', { token }, basic(album));
 const revoke = (token) => post(server, '/revoke', { token }, basic(album));
 
-// Runs the requests at the same time, each of which waits five seconds or more.
+// Runs the requests at the same time. Each of them waits for five seconds or more.
 async function whileLocked(begin, requests) {
   const lock = await server.lockDatabase(begin);
   try {
@@ -52,7 +52,7 @@ test('a locked database is 503 at every endpoint and spends nothing', async () =
   const [page, form, ...answers] = await whileLocked('BEGIN EXCLUSIVE', [
     () => new FormBrowser(server).open(authorizeUrl(album)),
     () => browser.submit('Allow'),
-    () => tradeCode(server, album, code),
+    () => exchangeCode(server, album, code),
     () => refresh(server, album, tokens.refresh_token),
     () => introspect(tokens.access_token),
     () => revoke(tokens.access_token),
@@ -63,12 +63,12 @@ test('a locked database is 503 at every endpoint and spends nothing', async () =
   assertBusy(answers);
   assert.deepEqual(server.rows(), before);
 
-  assertTokens(await tradeCode(server, album, code), { scope: 'read profile' });
+  assertTokens(await exchangeCode(server, album, code), { scope: 'read profile' });
   assert.equal((await userinfo(tokens.access_token)).status, 200);
   assertTokens(await refresh(server, album, tokens.refresh_token), { scope: 'read profile' });
 });
 
-test('a database that cannot be written is 503 for what spends or issues', async () => {
+test('a database that cannot be written is 503 for requests that spend or issue', async () => {
   const { code } = await allowed(server, album);
   const tokens = await issued(server, album);
   const browser = await atConsent(server, album);
@@ -77,20 +77,20 @@ test('a database that cannot be written is 503 for what spends or issues', async
     () => browser.submit('Allow'),
     () => userinfo(tokens.access_token),
     () => introspect(tokens.access_token),
-    () => tradeCode(server, album, code),
+    () => exchangeCode(server, album, code),
     () => refresh(server, album, tokens.refresh_token),
     () => revoke(tokens.access_token),
   ]);
   assertRedirected(form, server, album, 'temporarily_unavailable', { status: 303 });
-  assert.equal(user.status, 200); // who only reads does not notice
+  assert.equal(user.status, 200); // it only reads
   assert.equal(active.json.active, true);
   assertBusy(answers);
   assert.deepEqual(server.rows(), before);
-  assertTokens(await tradeCode(server, album, code), { scope: 'read profile' });
+  assertTokens(await exchangeCode(server, album, code), { scope: 'read profile' });
 });
 
-// Every code was traded, or is as good as it was.
-async function assertTradedOrGood(codes, answers) {
+// Every code was exchanged, or is still valid.
+async function assertExchangedOrValid(codes, answers) {
   const busy = answers.filter((answer) => answer.status === 503);
   assertBusy(busy);
   for (const answer of answers)
@@ -102,7 +102,7 @@ async function assertTradedOrGood(codes, answers) {
   );
   assert.equal(tokens.length, codes.length - busy.length);
   for (const { code } of left)
-    assertTokens(await tradeCode(server, album, code), { scope: 'read profile' });
+    assertTokens(await exchangeCode(server, album, code), { scope: 'read profile' });
 }
 
 async function someCodes(count) {
@@ -111,32 +111,32 @@ async function someCodes(count) {
   return codes;
 }
 
-test('a lock that comes while codes are traded loses none of them', async () => {
+test('a lock that begins while codes are exchanged loses none of them', async () => {
   const codes = await someCodes(16);
-  const trades = codes.map(async (code, i) => {
+  const exchanges = codes.map(async (code, i) => {
     await sleep(8 * i);
-    return tradeCode(server, album, code);
+    return exchangeCode(server, album, code);
   });
   await sleep(40);
   const lock = await server.lockDatabase('BEGIN EXCLUSIVE');
-  const answers = await Promise.all(trades);
+  const answers = await Promise.all(exchanges);
   await lock.release();
-  await assertTradedOrGood(codes, answers);
+  await assertExchangedOrValid(codes, answers);
 });
 
-test('a trade that fails in its very last step is 503 and the code stays good', async () => {
+test('an exchange whose commit fails is 503 and the code stays valid', async () => {
   const codes = await someCodes(1);
   const reader = await server.lockDatabase('BEGIN; SELECT count(*) FROM oauth_token');
-  const answer = await tradeCode(server, album, codes[0]); // all but the commit passes a reader
+  const answer = await exchangeCode(server, album, codes[0]); // a reader blocks only the commit
   await reader.release();
   assertBusy([answer]);
-  await assertTradedOrGood(codes, [answer]);
+  await assertExchangedOrValid(codes, [answer]);
 });
 
-test('a lock shorter than the wait is not noticed', async () => {
+test('a lock shorter than the wait causes no error', async () => {
   const { code } = await allowed(server, album);
   const lock = await server.lockDatabase('BEGIN EXCLUSIVE');
-  const pending = tradeCode(server, album, code);
+  const pending = exchangeCode(server, album, code);
   setTimeout(() => lock.release(), 1500);
   assertTokens(await pending, { scope: 'read profile' });
 });

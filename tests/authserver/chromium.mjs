@@ -1,4 +1,4 @@
-// Chromium as Debian packages it, with everything that a page complains about noted.
+// Debian's Chromium, with a record of everything that a page reports.
 
 import { chromium } from 'playwright-core';
 
@@ -6,7 +6,7 @@ export function launch() {
   return chromium.launch({
     executablePath: '/usr/bin/chromium',
     args: [
-      '--no-sandbox', // has no use for root
+      '--no-sandbox', // the sandbox does not work for root
       '--disable-background-networking',
       '--disable-component-update',
       '--disable-sync',
@@ -18,7 +18,7 @@ export function launch() {
   });
 }
 
-// A window of its own; complaints collects console messages, script errors and dialogs.
+// Opens a new window; complaints collects console messages, script errors and dialogs.
 export async function openWindow(browser, options = {}) {
   const context = await browser.newContext({ viewport: { width: 900, height: 640 }, ...options });
   const page = await context.newPage();

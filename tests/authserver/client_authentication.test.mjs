@@ -1,9 +1,10 @@
-// How clients prove who they are at /token, /revoke and /introspect (RFC 6749, section 2.3).
+// How clients authenticate (RFC 6749, section 2.3).
 
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
 
-import { allowed, issued, refresh, tradeCode } from './code_flow.mjs';
+import { allowed, issued, refresh, exchangeCode } from './code_flow.mjs';
+import { clientPaths } from './endpoints.mjs';
 import { basic, post } from './http.mjs';
 import { assertRefused, assertTokens, leavesNoTrace } from './outcomes.mjs';
 import { photoAlbum, printShop, Server } from './server.mjs';
@@ -21,13 +22,13 @@ const scope = 'read write profile';
 const inForm = ({ id, secret }) => ({ client_id: id, client_secret: secret });
 const header = (text) => ({ authorization: `Basic ${Buffer.from(text).toString('base64')}` });
 
-// The same wrong credentials at every endpoint that asks for them.
+// Sends the same wrong credentials to every endpoint where clients authenticate.
 async function refusedEverywhere(parameters, headers, status, error) {
   const { code } = await allowed(server, album);
   const { access_token: token } = await issued(server, album);
   await leavesNoTrace(server, async () => {
-    assertRefused(await tradeCode(server, album, code, parameters, headers), status, error);
-    for (const path of ['/revoke', '/introspect'])
+    assertRefused(await exchangeCode(server, album, code, parameters, headers), status, error);
+    for (const path of clientPaths)
       assertRefused(await post(server, path, { token, ...parameters }, headers), status, error);
   });
 }
@@ -39,18 +40,18 @@ test('clients authenticate by header or by form', async () => {
     [{ client_id: album.id }, basic(album)],
   ]) {
     const { code } = await allowed(server, album);
-    assertTokens(await tradeCode(server, album, code, changes, headers), { scope });
+    assertTokens(await exchangeCode(server, album, code, changes, headers), { scope });
   }
 });
 
-test('the header is understood in any case and with percent encoding', async () => {
+test('the header is accepted in any case and with percent encoding', async () => {
   const escaped = (text) => text.replace(/./g, (c) => `%${c.charCodeAt(0).toString(16)}`);
   for (const headers of [
     { authorization: basic(album).authorization.replace('Basic', 'bAsIc') },
     header(`${escaped(album.id)}:${escaped(album.secret)}`),
   ]) {
     const { code } = await allowed(server, album);
-    assertTokens(await tradeCode(server, album, code, {}, headers), { scope });
+    assertTokens(await exchangeCode(server, album, code, {}, headers), { scope });
   }
 });
 
@@ -85,7 +86,7 @@ for (const [what, [parameters, text]] of Object.entries(wrong)) {
   });
 }
 
-test('headers that are no basic authentication are refused with invalid_client', async () => {
+test('headers without basic authentication are refused with invalid_client', async () => {
   for (const authorization of [
     'Basic',
     'Basic ',
@@ -119,14 +120,14 @@ test('a repeated secret is refused with invalid_request', async () => {
   );
 });
 
-test('a disabled client is refused with all that it holds', async () => {
+test('a disabled client cannot use its codes and tokens', async () => {
   const { code } = await allowed(server, printer);
   const tokens = await issued(server, printer);
   server.oauthctl('client', 'disable', printer.id);
   await leavesNoTrace(server, async () => {
-    assertRefused(await tradeCode(server, printer, code), 401, 'invalid_client');
+    assertRefused(await exchangeCode(server, printer, code), 401, 'invalid_client');
     assertRefused(await refresh(server, printer, tokens.refresh_token), 401, 'invalid_client');
-    for (const path of ['/revoke', '/introspect'])
+    for (const path of clientPaths)
       assertRefused(
         await post(server, path, { token: tokens.access_token }, basic(printer)),
         401,
@@ -134,7 +135,7 @@ test('a disabled client is refused with all that it holds', async () => {
       );
   });
   server.oauthctl('client', 'enable', printer.id);
-  assertTokens(await tradeCode(server, printer, code), { scope: 'read' });
+  assertTokens(await exchangeCode(server, printer, code), { scope: 'read' });
 });
 
 test('failed authentication is in the audit log without the secret', async () => {

@@ -39,14 +39,14 @@ export async function atConsent(server, client, changes = {}, user = alice) {
   return browser;
 }
 
-// The answer's parameters after the user has allowed it.
+// The parameters of the answer after the user has allowed the request.
 export async function allowed(server, client, changes = {}, user = alice) {
   const browser = await atConsent(server, client, changes, user);
   const { location } = await browser.submit('Allow');
   return Object.fromEntries(location.searchParams);
 }
 
-export function tradeCode(server, client, code, changes = {}, headers = basic(client)) {
+export function exchangeCode(server, client, code, changes = {}, headers = basic(client)) {
   const parameters = {
     grant_type: 'authorization_code',
     code,
@@ -65,10 +65,10 @@ export function refresh(server, client, token, changes = {}, headers = basic(cli
   );
 }
 
-// Tokens as the client gets them.
+// The tokens that the client gets.
 export async function issued(server, client, changes = {}, user = alice) {
   const { code } = await allowed(server, client, changes, user);
-  const answer = await tradeCode(server, client, code);
+  const answer = await exchangeCode(server, client, code);
   if (answer.status !== 200) throw new Error(`no tokens: ${answer.status} ${answer.text}`);
   return { ...answer.json, code };
 }

@@ -1,4 +1,4 @@
-// As much of a browser as pages without scripts need: cookies, forms, redirects within the server.
+// A small browser for pages without scripts: cookies, forms, redirects within the server.
 
 import { parse } from 'parse5';
 
@@ -42,7 +42,7 @@ export class FormBrowser {
     return this.page;
   }
 
-  // The fields of the page's form, with those given in place of its own; undefined leaves one out.
+  // The fields of the page's form with the given changes; undefined removes a field.
   fields(changes = {}) {
     const form = [...elements(this.page.document)].find((element) => element.tagName === 'form');
     const inputs = [...elements(form)].filter((element) => element.tagName === 'input');
@@ -52,7 +52,7 @@ export class FormBrowser {
     return { ...own, ...changes };
   }
 
-  // Presses the button of that label.
+  // Presses the button with that label.
   submit(label, changes = {}) {
     const all = [...elements(this.page.document)];
     const form = all.find((element) => element.tagName === 'form');

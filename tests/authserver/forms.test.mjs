@@ -1,4 +1,4 @@
-// POST /authorize: login, the decision, and forms that others would like to send.
+// POST /authorize: login, the decision, and forms of other sites.
 
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
@@ -78,12 +78,12 @@ test('login gives a new session', async () => {
     action: 'login',
   });
   assert.match(answer.text, /Alice Miller/);
-  const other = new FormBrowser(server); // with the cookie of before the login
+  const other = new FormBrowser(server); // with the cookie from before the login
   const page = await other.open(authorizeUrl(album), { headers: { cookie: before.split(';')[0] } });
   assert.match(page.text, /<h1>Log in<\/h1>/);
 });
 
-test('allowing gives a code and nothing else', async () => {
+test('allowing issues a code and nothing else', async () => {
   const browser = await atConsent(server, album);
   const answer = await browser.submit('Allow');
   assert.equal(answer.status, 303);
@@ -100,7 +100,7 @@ test('allowing gives a code and nothing else', async () => {
   );
 });
 
-test('denying sends access_denied and leaves nothing', async () => {
+test('denying sends access_denied and issues nothing', async () => {
   const browser = await atConsent(server, album);
   const answer = await leavesNoTrace(server, () => browser.submit('Deny'));
   assertRedirected(answer, server, album, 'access_denied', { status: 303 });
@@ -119,7 +119,7 @@ test('another account can be used instead', async () => {
   );
 });
 
-test('a form without, with a changed or with a foreign CSRF field does nothing', async () => {
+test('a form with a missing, changed or foreign CSRF field does nothing', async () => {
   const stranger = await atConsent(server, album);
   const otherRequest = await atConsent(server, album, { scope: 'read' });
   const browser = await atConsent(server, album);
@@ -139,10 +139,10 @@ test('a form without, with a changed or with a foreign CSRF field does nothing',
       for (const action of ['allow', 'deny', 'switch', 'login'])
         assertErrorPage(await browser.post('/authorize', { ...consent, action, csrf }), 403);
   });
-  assert.equal((await browser.post('/authorize', consent)).status, 303); // and the true one still works
+  assert.equal((await browser.post('/authorize', consent)).status, 303); // the correct form still works
 });
 
-test('a login form of another site logs nobody in', async () => {
+test('a login form of another site does not log in', async () => {
   const attacker = await atLogin();
   const victim = await atLogin();
   const answer = await victim.post('/authorize', {
@@ -194,17 +194,17 @@ test('allow before login only shows the login page', async () => {
   });
 });
 
-test('a client that is disabled meanwhile gets no code', async () => {
+test('a client that is disabled before the decision gets no code', async () => {
   const browser = await atConsent(server, printer);
   server.oauthctl('client', 'disable', printer.id);
   await leavesNoTrace(server, async () => assertErrorPage(await browser.submit('Allow'), 400));
   server.oauthctl('client', 'enable', printer.id);
 });
 
-test('a session with a changed or forged cookie is none', async () => {
+test('a changed or forged cookie gives no session', async () => {
   const browser = await atConsent(server, album);
   const header = browser.page.headers['set-cookie']?.[0] ?? '';
-  assert.equal(header, ''); // the consent page sets none
+  assert.equal(header, ''); // the consent page sets no cookie
   const user = Buffer.from('alice').toString('base64url');
   for (const cookie of [
     `${user}.9999999999.0.`,

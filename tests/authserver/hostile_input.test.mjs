@@ -1,9 +1,10 @@
-// Input that no honest client sends. Nothing crashes, nothing is left behind, nothing is said twice.
+// Input that no honest client sends. It crashes nothing and changes no row.
 
 import assert from 'node:assert/strict';
 import { after, afterEach, before, beforeEach, test } from 'node:test';
 
-import { allowed, atConsent, authorizeUrl, issued, tradeCode } from './code_flow.mjs';
+import { allowed, atConsent, authorizeUrl, issued, exchangeCode } from './code_flow.mjs';
+import { clientPaths } from './endpoints.mjs';
 import { basic, bearer, encoded, post, raw, request } from './http.mjs';
 import {
   assertBadRequest,
@@ -21,7 +22,7 @@ before(async () => {
 });
 after(() => server.stop(/request-size too long|oversized request-header/));
 beforeEach(async () => {
-  await allowed(server, album); // a code and a token that must outlive all of it
+  await allowed(server, album); // a code and a token that must stay
   await issued(server, album);
   kept = server.rows();
 });
@@ -30,11 +31,10 @@ afterEach(() => {
   server.clear();
 });
 
-const endpoints = ['/token', '/revoke', '/introspect'];
 const form = 'application/x-www-form-urlencoded';
 const credentials = () => encoded({ client_id: album.id, client_secret: album.secret });
 
-test('bodies that are no form are refused', async () => {
+test('bodies that are not forms are refused', async () => {
   const types = [
     undefined,
     '',
@@ -45,7 +45,7 @@ test('bodies that are no form are refused', async () => {
     `x${form}`,
     'application/x-www-form-urlencoded, text/plain',
   ];
-  for (const path of endpoints)
+  for (const path of clientPaths)
     for (const type of types) {
       const headers = type === undefined ? {} : { 'content-type': type };
       const answer = await request(server.issuer + path, {
@@ -57,7 +57,7 @@ test('bodies that are no form are refused', async () => {
     }
 });
 
-test('a form with a charset is a form', async () => {
+test('a form with a charset is accepted', async () => {
   const answer = await post(
     server,
     '/introspect',
@@ -68,7 +68,7 @@ test('a form with a charset is a form', async () => {
 });
 
 test('bodies over the limit are refused with 413', async () => {
-  for (const path of [...endpoints, '/authorize'])
+  for (const path of [...clientPaths, '/authorize'])
     for (const size of [65537, 70000, 1000000]) {
       const answer = await post(server, path, `token=${'x'.repeat(size - 6)}`, basic(album));
       assert.equal(answer.status, 413, `${path} ${size}`);
@@ -77,7 +77,7 @@ test('bodies over the limit are refused with 413', async () => {
 });
 
 test('a value over the limit is refused', async () => {
-  for (const path of endpoints) {
+  for (const path of clientPaths) {
     assertRefused(
       await post(server, path, { token: 'x'.repeat(4097) }, basic(album)),
       400,
@@ -115,7 +115,7 @@ test('a value over the limit is refused', async () => {
 
 test('a thousand parameters are refused', async () => {
   const many = 'a=1&'.repeat(1000);
-  for (const path of endpoints)
+  for (const path of clientPaths)
     assertRefused(await post(server, path, `${many}${credentials()}`), 400, 'invalid_request');
 });
 
@@ -132,7 +132,7 @@ test('unknown parameters are ignored', async () => {
 });
 
 test('parameters in the query of a POST are refused', async () => {
-  for (const path of endpoints)
+  for (const path of clientPaths)
     assertRefused(
       await post(server, `${path}?${credentials()}`, { token: 'x' }, basic(album)),
       400,
@@ -140,7 +140,7 @@ test('parameters in the query of a POST are refused', async () => {
     );
 });
 
-// What a form says is not always sound; the code in it must not be taken then.
+// Bodies of forms that are malformed or unusual.
 const malformed = [
   '%',
   '%4',
@@ -171,7 +171,7 @@ const malformed = [
   '+'.repeat(1000),
 ];
 test('malformed forms are refused or ignored', async () => {
-  for (const path of endpoints)
+  for (const path of clientPaths)
     for (const text of malformed) {
       const answer = await post(server, path, text, basic(album));
       assert.ok(
@@ -195,7 +195,7 @@ test('malformed forms do not log in, allow or deny', async () => {
   }
 });
 
-test('malformed queries reach nobody', async () => {
+test('malformed queries are refused and do not redirect', async () => {
   for (const text of malformed.filter((text) => !/[\0-\x1f]/.test(text))) {
     const answer = await raw(server, `GET /authorize?${text} HTTP/1.0\r\n\r\n`);
     assert.equal(answer.status, 400, text);
@@ -203,7 +203,7 @@ test('malformed queries reach nobody', async () => {
   }
 });
 
-test('truncated escapes in a value go back to the client as an error or unchanged', async () => {
+test('truncated escapes in a value are refused or kept', async () => {
   for (const state of ['%', '%4', '%zz', 'a%', '%%%']) {
     const answer = await request(
       `${server.issuer}${authorizeUrl(album, { state: undefined })}&state=${state}`,
@@ -226,7 +226,7 @@ test('invalid UTF-8 is refused or shown as text, never as markup', async () => {
 });
 
 test('control characters in a parameter are refused', async () => {
-  for (const path of endpoints)
+  for (const path of clientPaths)
     for (const character of ['\0', '\n', '\r', '\t', '\x1b', '\x7f'])
       assertRefused(
         await post(server, path, { token: `x${character}y` }, basic(album)),
@@ -235,7 +235,7 @@ test('control characters in a parameter are refused', async () => {
       );
 });
 
-test('requests that are no HTTP are refused by the web server', async () => {
+test('requests that are not valid HTTP are refused by the web server', async () => {
   const length =
     'POST /token HTTP/1.1\r\nHost: x\r\nContent-Type: application/x-www-form-urlencoded\r\nContent-Length:';
   const requests = [
@@ -261,7 +261,7 @@ test('requests that are no HTTP are refused by the web server', async () => {
   }
 });
 
-test('a body shorter than it says is not acted upon', async () => {
+test('a body shorter than its Content-Length issues no tokens', async () => {
   const [{ code }] = kept.codes;
   const body = encoded({ grant_type: 'authorization_code', code, redirect_uri: album.redirectUri });
   const head = `POST /token HTTP/1.0\r\nContent-Type: ${form}\r\nAuthorization: ${basic(album).authorization}\r\n`;
@@ -282,7 +282,7 @@ test('a chunked body is read like any other', async () => {
   assert.equal(kept.tokens.length, 2);
 });
 
-test('headers cannot choose the folder of the server', async () => {
+test('headers cannot change the folder of the server', async () => {
   const hostile = {
     AUTHSERVER_FOLDER: '/tmp',
     'authserver-folder': '/tmp',
@@ -305,7 +305,7 @@ test('headers cannot choose the folder of the server', async () => {
   });
   assert.equal(location.searchParams.get('iss'), server.issuer);
   assert.equal(server.rows().codes.at(-1).ip, '127.0.0.1');
-  assertTokens(await tradeCode(server, album, location.searchParams.get('code')), {
+  assertTokens(await exchangeCode(server, album, location.searchParams.get('code')), {
     scope: 'read write profile',
   });
   kept = server.rows();

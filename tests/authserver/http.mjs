@@ -1,4 +1,4 @@
-// Plain HTTP, with nothing put right on the way out and nothing followed.
+// Plain HTTP: it corrects nothing in a request and follows no redirect.
 
 import http from 'node:http';
 import net from 'node:net';
@@ -26,7 +26,7 @@ export function request(url, { method = 'GET', headers = {}, body } = {}) {
   });
 }
 
-// Pairs, so that a parameter may occur twice; values that are undefined are left out.
+// Takes an object, or pairs if a parameter occurs twice. Skips undefined values.
 export function encoded(parameters) {
   const pairs = Array.isArray(parameters) ? parameters : Object.entries(parameters);
   return new URLSearchParams(pairs.filter(([, value]) => value !== undefined)).toString();
@@ -49,7 +49,7 @@ export function post(server, path, parameters, headers = {}) {
   });
 }
 
-// Bytes that no HTTP library would send; the answer's status, or 0 if the connection just ends.
+// Sends bytes that no HTTP library would send. The status is 0 if the connection ends without one.
 export function raw(server, bytes) {
   return new Promise((resolve, reject) => {
     let text = '';

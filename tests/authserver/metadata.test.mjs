@@ -1,8 +1,10 @@
-// GET /.well-known/oauth-authorization-server (RFC 8414).
+// The endpoints, and the metadata document that names them (RFC 8414).
 
 import assert from 'node:assert/strict';
+import { readdirSync } from 'node:fs';
 import { after, before, test } from 'node:test';
 
+import { clientPaths, endpoints } from './endpoints.mjs';
 import { request } from './http.mjs';
 import { Server } from './server.mjs';
 
@@ -10,7 +12,7 @@ let server;
 before(async () => (server = await Server.start()));
 after(() => server.stop());
 
-test('metadata name the issuer, every endpoint and what is served there', async () => {
+test('the metadata document names the issuer, every endpoint and what it supports', async () => {
   const answer = await request(`${server.issuer}/.well-known/oauth-authorization-server`);
   assert.equal(answer.status, 200);
   assert.equal(answer.headers['content-type'], 'application/json');
@@ -35,25 +37,39 @@ test('metadata name the issuer, every endpoint and what is served there', async 
 });
 
 test('each endpoint refuses other methods than its own with 405', async () => {
-  const endpoints = {
-    '/.well-known/oauth-authorization-server': 'GET, HEAD',
-    '/authorize': 'GET, HEAD, POST',
-    '/token': 'POST',
-    '/revoke': 'POST',
-    '/introspect': 'POST',
-    '/userinfo': 'GET, HEAD',
-  };
-  for (const [path, allowed] of Object.entries(endpoints)) {
+  for (const { path, methods } of endpoints) {
     for (const method of ['GET', 'POST', 'PUT', 'DELETE', 'PATCH', 'OPTIONS']) {
-      if (allowed.split(', ').includes(method)) continue;
+      if (methods.includes(method)) continue;
       const answer = await request(server.issuer + path, { method });
       assert.equal(answer.status, 405, `${method} ${path}`);
-      assert.equal(answer.headers.allow, allowed, `${method} ${path}`);
+      assert.equal(answer.headers.allow, methods.join(', '), `${method} ${path}`);
     }
   }
 });
 
-test('there is nothing behind or beside the endpoints', async () => {
+// RFC 6749, section 3.2, RFC 7009, section 2.1, and RFC 7662, section 2.1.
+test('endpoints where clients authenticate accept POST only', async () => {
+  assert.ok(clientPaths.includes('/token'));
+  for (const path of clientPaths) {
+    const answer = await request(server.issuer + path);
+    assert.deepEqual([answer.status, answer.headers.allow], [405, 'POST'], path);
+  }
+});
+
+test('other endpoints accept GET with HEAD, and only the forms of /authorize come by POST', () => {
+  for (const { path, methods, client } of endpoints)
+    if (!client)
+      assert.equal(methods.join(', '), path === '/authorize' ? 'GET, HEAD, POST' : 'GET, HEAD', path);
+});
+
+test('endpoints.txt lists every program of the server', () => {
+  const sources = readdirSync(process.env.AUTHSERVER_SOURCE)
+    .filter((name) => name.endsWith('.cpp') && name !== 'authserver_setup.cpp')
+    .map((name) => name.replace('.cpp', ''));
+  assert.deepEqual(endpoints.map(({ program }) => program).sort(), sources.sort());
+});
+
+test('paths other than those of the endpoints do not exist', async () => {
   for (const path of [
     '/',
     '/token/',

@@ -1,4 +1,4 @@
-// Whole outcomes, asserted in one go.
+// Assertions about whole outcomes.
 
 import assert from 'node:assert/strict';
 
@@ -32,7 +32,7 @@ export function assertRefused(answer, status, error) {
   assert.equal(answer.headers['retry-after'] !== undefined, status === 503);
 }
 
-// A page of this server, from which nobody is sent anywhere.
+// An error page of this server, without a redirect.
 export function assertErrorPage(answer, status) {
   assert.equal(answer.status, status, answer.text);
   assertNotStored(answer);
@@ -46,8 +46,8 @@ export function assertErrorPage(answer, status) {
   assert.match(answer.text, /<h1>This does not work<\/h1>/);
 }
 
-// An error that the client is told by redirect (RFC 6749, section 4.1.2.1, and RFC 9207);
-// state is null if there is none to send back.
+// An error that goes to the client by redirect (RFC 6749, section 4.1.2.1, and RFC 9207); state is
+// null if the answer has none.
 export function assertRedirected(
   answer,
   server,
@@ -64,14 +64,14 @@ export function assertRedirected(
   assert.deepEqual(rest, { error, ...(state !== null && { state }), iss: server.issuer });
 }
 
-// The web server's own word on what it does not even hand on.
+// The web server itself refuses the request.
 export function assertBadRequest(answer) {
   assert.equal(answer.status, 400, answer.text);
   assert.equal(answer.headers.location, undefined);
   assert.match(answer.text, /400 Bad Request/);
 }
 
-// Nothing is issued, spent or revoked meanwhile.
+// Asserts that the action issues, spends and revokes nothing.
 export async function leavesNoTrace(server, action) {
   const before = server.rows();
   const result = await action();

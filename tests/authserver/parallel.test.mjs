@@ -1,9 +1,9 @@
-// Many requests at once: what can be spent is spent once, and everybody else gets through.
+// Many requests at once: a code or refresh token is spent once, and independent requests succeed.
 
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
 
-import { allowed, issued, pkce, refresh, tradeCode, withChallenge } from './code_flow.mjs';
+import { allowed, issued, pkce, refresh, exchangeCode, withChallenge } from './code_flow.mjs';
 import { bearer, request } from './http.mjs';
 import { assertRefused, assertTokens } from './outcomes.mjs';
 import { alice, photoAlbum, Server } from './server.mjs';
@@ -27,16 +27,16 @@ function assertOneWon(answers) {
   return won[0].json;
 }
 
-test('of 8 that trade one code at once exactly one wins', async () => {
+test('of 8 requests that use one code at once exactly one wins', async () => {
   for (let round = 0; round < rounds; ++round) {
     const { code } = await allowed(server, album);
-    assertOneWon(await eight(() => tradeCode(server, album, code)));
-    // The others replayed it, which ends the winner's tokens.
+    assertOneWon(await eight(() => exchangeCode(server, album, code)));
+    // The others replayed the code, which ends the winner's tokens.
     assert.deepEqual(server.rows(), { codes: [], tokens: [] });
   }
 });
 
-test('of 8 that use one refresh token at once exactly one wins', async () => {
+test('of 8 requests that use one refresh token at once exactly one wins', async () => {
   for (let round = 0; round < rounds; ++round) {
     const { refresh_token: token } = await issued(server, album);
     const winner = assertOneWon(await eight(() => refresh(server, album, token)));
@@ -49,7 +49,7 @@ test('of 8 that use one refresh token at once exactly one wins', async () => {
   }
 });
 
-test('of 8 that use the refresh tokens of 8 logins at once all win', async () => {
+test('8 requests that use the refresh tokens of 8 logins at once all win', async () => {
   const logins = await eight(() => issued(server, album));
   const answers = await Promise.all(
     logins.map((login) => refresh(server, album, login.refresh_token)),
@@ -66,7 +66,7 @@ test('200 full logins at 8 in parallel all succeed', async (t) => {
     while (left-- > 0) {
       const { verifier, challenge } = pkce();
       const { code } = await allowed(server, album, withChallenge({ challenge }));
-      const answer = await tradeCode(server, album, code, { code_verifier: verifier });
+      const answer = await exchangeCode(server, album, code, { code_verifier: verifier });
       assertTokens(answer, { scope: 'read profile' });
       const user = await request(`${server.issuer}/userinfo`, {
         headers: bearer(answer.json.access_token),

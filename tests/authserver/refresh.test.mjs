@@ -3,7 +3,7 @@
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
 
-import { issued, refresh, tradeCode } from './code_flow.mjs';
+import { issued, refresh, exchangeCode } from './code_flow.mjs';
 import { bearer, request } from './http.mjs';
 import { assertRefused, assertTokens, leavesNoTrace } from './outcomes.mjs';
 import { photoAlbum, printShop, Server } from './server.mjs';
@@ -17,7 +17,7 @@ before(async () => {
 after(() => server.stop());
 afterEach(() => server.clear());
 
-test('a refresh token is traded once for new tokens, which replace the old', async () => {
+test('a refresh token is exchanged once for new tokens, which replace the old ones', async () => {
   const old = await issued(server, album);
   const answer = await refresh(server, album, old.refresh_token);
   assertTokens(answer, { scope: 'read write profile' });
@@ -49,7 +49,7 @@ test('a refresh may narrow the scope and widen it again up to what was granted',
   assertTokens(wide, { scope: 'read profile' });
 });
 
-test('a refresh for more than was granted is refused and ends nothing', async () => {
+test('a refresh for more than was granted is refused and the refresh token stays valid', async () => {
   const first = await issued(server, album, { scope: 'read' });
   await leavesNoTrace(server, async () => {
     for (const scope of ['read write', 'write', 'profile', 'admin', 'READ', 'read"'])
@@ -62,7 +62,7 @@ test('a refresh for more than was granted is refused and ends nothing', async ()
   assertTokens(await refresh(server, album, first.refresh_token), { scope: 'read' });
 });
 
-test('the refresh token of another client is refused and stays good for its owner', async () => {
+test('the refresh token of another client is refused and stays valid for its owner', async () => {
   const { refresh_token: token } = await issued(server, album);
   await leavesNoTrace(server, async () =>
     assertRefused(await refresh(server, printer, token), 400, 'invalid_grant'),
@@ -80,7 +80,7 @@ test('a refresh token that cannot be spent gives no tokens', async () => {
   assertTokens(await refresh(server, album, token), { scope: 'read write profile' });
 });
 
-test('an access token is no refresh token and the other way round', async () => {
+test('an access token and a refresh token cannot replace each other', async () => {
   const tokens = await issued(server, album);
   await leavesNoTrace(server, async () => {
     assertRefused(await refresh(server, album, tokens.access_token), 400, 'invalid_grant');
@@ -102,6 +102,6 @@ test('a replayed code ends its tokens also after a refresh', async () => {
   const old = await issued(server, album);
   const answer = await refresh(server, album, old.refresh_token);
   assert.equal(answer.status, 200);
-  assertRefused(await tradeCode(server, album, old.code), 400, 'invalid_grant');
+  assertRefused(await exchangeCode(server, album, old.code), 400, 'invalid_grant');
   assert.deepEqual(server.rows().tokens, []);
 });

@@ -1,4 +1,4 @@
-// Scripts in every field that somebody else fills in. The browser's part is in browser.test.mjs.
+// Scripts in every field that comes from outside. browser.test.mjs tests them in a real browser.
 
 import assert from 'node:assert/strict';
 import { after, before, test } from 'node:test';
@@ -10,7 +10,7 @@ import { assertErrorPage } from './outcomes.mjs';
 import { Server } from './server.mjs';
 
 const script = `"'><script>alert(1)</script><img src=x onerror=alert(1)>`;
-const named = `"'><script>alert(1)</script>{{CLIENT}}&amp;`; // names are short
+const named = `"'><script>alert(1)</script>{{CLIENT}}&amp;`; // without an image, because names are short
 const mallory = { name: `m${script}`, displayName: `Mallory ${script}`, password: 'open sesame 8' };
 let server, client;
 before(async () => {
@@ -62,7 +62,7 @@ function assertHarmless({ document, headers, text }) {
 
 const only = (document, tag) => [...elements(document)].find((element) => element.tagName === tag);
 
-test('scripts in client name, state, scope and user are text on login and consent page', async () => {
+test('scripts in client name, state, scope and user are text on the login and consent pages', async () => {
   const browser = new FormBrowser(server);
   const login = await browser.open(authorizeUrl(client, { state: script }));
   assertHarmless(login);
@@ -100,7 +100,7 @@ test('scripts in every parameter of a refused request are text on the error page
   }
 });
 
-test('the policy allows a form to go to this server and the client only', async () => {
+test('the policy allows forms to this server and the client only', async () => {
   const { page } = await atConsent(server, client, {}, mallory);
   assert.equal(
     page.headers['content-security-policy'],

@@ -1,4 +1,4 @@
-// The example authorization server under test: started afresh, with an empty database.
+// Starts the example authorization server with an empty database.
 
 import assert from 'node:assert/strict';
 import { spawn, execFileSync } from 'node:child_process';
@@ -25,7 +25,7 @@ export const printShop = {
   name: 'Printer',
 };
 
-// What these tests empty must not be anything of the machine's.
+// These tests delete files in /var: it must be the private one.
 function requirePrivateVar() {
   const mounts = readFileSync('/proc/self/mountinfo', 'utf8').split('\n');
   const last = mounts.filter((line) => line.split(' ')[4] === '/var').pop();
@@ -75,7 +75,7 @@ export class Server {
   async #run() {
     this.#process = spawn(
       'lighttpd',
-      ['-D', '-f', `${process.env.AUTHSERVER_SOURCE}/lighttpd.conf`],
+      ['-D', '-f', `${build}/examples/authserver/lighttpd.conf`],
       {
         stdio: ['ignore', 'inherit', 'pipe'],
         env: {
@@ -96,7 +96,7 @@ export class Server {
     }
   }
 
-  // The programs must have had nothing to complain about but what is expected.
+  // Asserts that the log holds only expected lines.
   async stop(expected) {
     this.#process.kill('SIGTERM');
     await once(this.#process, 'close');
@@ -109,12 +109,12 @@ export class Server {
     );
   }
 
-  // The library's settings file, read afresh by every program.
+  // Writes the library's settings file, which every program reads again.
   set(settings) {
     writeFileSync(`${databaseFolder}/oauth.cfg`, JSON.stringify(settings));
   }
 
-  // As if it were served under this address.
+  // Makes the server act as if this were its address.
   actFor(issuer) {
     writeFileSync(`${folder}/config.json`, JSON.stringify({ issuer }));
   }
@@ -142,7 +142,7 @@ export class Server {
     return words.includes('--json') ? JSON.parse(output) : String(output);
   }
 
-  // Everything that a request may have left behind.
+  // Every row that a request may change.
   rows() {
     return {
       codes: this.oauthctl('code', 'list', '--json', '--show-secrets'),
@@ -162,8 +162,8 @@ export class Server {
     return this.oauthctl('log', '--json').map((row) => row.msg);
   }
 
-  // Keeps everybody else from the database: BEGIN EXCLUSIVE from reading, BEGIN IMMEDIATE from
-  // writing. Ends with release().
+  // Locks the database against others until release(): BEGIN EXCLUSIVE against reading, BEGIN
+  // IMMEDIATE against writing.
   async lockDatabase(begin) {
     const locker = spawn('sqlite3', ['-cmd', '.timeout 5000', database], {
       stdio: ['pipe', 'pipe', 'inherit'],

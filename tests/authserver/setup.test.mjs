@@ -1,4 +1,4 @@
-// authserver_setup: what it refuses can never become part of a server.
+// authserver_setup: what it accepts and what it refuses.
 
 import assert from 'node:assert/strict';
 import { existsSync, readFileSync, rmSync, writeFileSync } from 'node:fs';
@@ -49,7 +49,7 @@ test('a name of 256 bytes can log in', async () => {
   assert.equal(await heading(bob), 'Allow Photo album?');
 });
 
-test('nobody has the empty name, whoever put it among the users', async () => {
+test('nobody can log in with the empty name, even if users.json contains it', async () => {
   const document = JSON.parse(original);
   document.users[''] = document.users[alice.name];
   writeFileSync(users, JSON.stringify(document));
@@ -59,7 +59,7 @@ test('nobody has the empty name, whoever put it among the users', async () => {
   assert.equal(await heading(alice), 'Allow Photo album?');
 });
 
-test('passwords that are empty, of another length or hold control characters are refused', () => {
+test('passwords that are empty, too short, too long or hold control characters are refused', () => {
   for (const input of [
     '',
     '\n',
@@ -73,7 +73,7 @@ test('passwords that are empty, of another length or hold control characters are
     assertNotAdded('bob', input, 'a password has 8 to 1024 bytes and no control characters');
 });
 
-test('a password is the first line whichever way it ends', async () => {
+test('a password is the first line, whatever its line ending', async () => {
   const ends = ['', '\n', '\r\n', '\nsecond line\n'];
   for (const [i, end] of ends.entries()) {
     add(`bob${i}`, password + end);
@@ -84,28 +84,37 @@ test('a password is the first line whichever way it ends', async () => {
   assert.equal(await heading(longest), 'Allow Photo album?');
 });
 
-test('an issuer is a scheme, a host and perhaps a port, and http on this machine only', () => {
+const refusedIssuers = [
+  '',
+  'login.example',
+  'https://',
+  'https://login.example/',
+  'https://login.example/path',
+  'https://login.example?query',
+  'https://login.example#fragment',
+  'https://user@login.example',
+  'https://login.example ',
+  'https://login .example',
+  'https://login.example:',
+  'https://login.example:port',
+  'HTTPS://login.example',
+  'https://https://login.example',
+  'ftp://login.example',
+  'com.example.login:/',
+  'http://login.example',
+  'http://127.0.0.1.login.example',
+];
+const acceptedIssuers = [
+  'https://login.example',
+  'https://login.example:8443',
+  'https://[2001:db8::1]',
+  'http://127.0.0.1:8080',
+  'http://[::1]',
+  'http://localhost',
+];
+test('an issuer is https, or http on this machine, and ends after its host or port', () => {
   const init = (folder, issuer) => server.setup(['init', folder, '--issuer', issuer]);
-  for (const issuer of [
-    '',
-    'login.example',
-    'https://',
-    'https://login.example/',
-    'https://login.example/path',
-    'https://login.example?query',
-    'https://login.example#fragment',
-    'https://user@login.example',
-    'https://login.example ',
-    'https://login .example',
-    'https://login.example:',
-    'https://login.example:port',
-    'HTTPS://login.example',
-    'https://https://login.example',
-    'ftp://login.example',
-    'com.example.login:/',
-    'http://login.example',
-    'http://127.0.0.1.login.example',
-  ]) {
+  for (const issuer of refusedIssuers) {
     assert.throws(
       () => init('/var/refused', issuer),
       ({ status, stderr }) =>
@@ -116,14 +125,7 @@ test('an issuer is a scheme, a host and perhaps a port, and http on this machine
     );
     assert.equal(existsSync('/var/refused'), false);
   }
-  for (const issuer of [
-    'https://login.example',
-    'https://login.example:8443',
-    'https://[2001:db8::1]',
-    'http://127.0.0.1:8080',
-    'http://[::1]',
-    'http://localhost',
-  ]) {
+  for (const issuer of acceptedIssuers) {
     init('/var/accepted', issuer);
     assert.deepEqual(JSON.parse(readFileSync('/var/accepted/config.json', 'utf8')), { issuer });
     rmSync('/var/accepted', { recursive: true });

@@ -3,7 +3,7 @@
 import assert from 'node:assert/strict';
 import { after, afterEach, before, test } from 'node:test';
 
-import { allowed, issued, pkce, tradeCode, withChallenge } from './code_flow.mjs';
+import { allowed, issued, pkce, exchangeCode, withChallenge } from './code_flow.mjs';
 import { basic, post } from './http.mjs';
 import { assertRefused, assertTokens, leavesNoTrace } from './outcomes.mjs';
 import { photoAlbum, printShop, Server } from './server.mjs';
@@ -20,9 +20,9 @@ afterEach(() => {
   server.clear();
 });
 
-test('a code is traded for tokens once and is gone', async () => {
+test('a code is exchanged for tokens once and deleted', async () => {
   const { code } = await allowed(server, album);
-  const answer = await tradeCode(server, album, code);
+  const answer = await exchangeCode(server, album, code);
   assertTokens(answer, { scope: 'read write profile' });
   const { codes, tokens } = server.rows();
   assert.deepEqual(codes, []);
@@ -35,10 +35,10 @@ test('a code is traded for tokens once and is gone', async () => {
   assert.ok(Math.abs(Number(tokens[0].expired_time) - Date.now() / 1000 - 600) < 10);
 });
 
-test('a replayed code is refused and ends the tokens that it gave', async () => {
+test('a replayed code is refused and ends the tokens issued for it', async () => {
   const kept = await issued(server, album);
   const { access_token: access, code } = await issued(server, album);
-  assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant');
+  assertRefused(await exchangeCode(server, album, code), 400, 'invalid_grant');
   assert.deepEqual(
     server.rows().tokens.map((row) => row.access_token),
     [kept.access_token],
@@ -51,20 +51,20 @@ test('a replayed code is refused and ends the tokens that it gave', async () => 
   );
 });
 
-test("a code that another client replays ends nobody's tokens", async () => {
+test('a code that another client replays ends no tokens', async () => {
   const { code } = await issued(server, album);
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, printer, code), 400, 'invalid_grant'),
+    assertRefused(await exchangeCode(server, printer, code), 400, 'invalid_grant'),
   );
 });
 
-test('a stolen code without its verifier is refused and stays good for its owner', async () => {
+test('a stolen code without its verifier is refused and stays valid for its owner', async () => {
   const { verifier, challenge } = pkce();
   const { code } = await allowed(server, album, withChallenge({ challenge }));
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'),
+    assertRefused(await exchangeCode(server, album, code), 400, 'invalid_grant'),
   );
-  assertTokens(await tradeCode(server, album, code, { code_verifier: verifier }), {
+  assertTokens(await exchangeCode(server, album, code, { code_verifier: verifier }), {
     scope: 'read write profile',
   });
 });
@@ -74,13 +74,13 @@ test('a wrong verifier is refused and spends the code', async () => {
     const { verifier, challenge } = pkce();
     const { code } = await allowed(server, album, withChallenge({ challenge }));
     assertRefused(
-      await tradeCode(server, album, code, { code_verifier: wrong }),
+      await exchangeCode(server, album, code, { code_verifier: wrong }),
       400,
       'invalid_grant',
     );
     assert.deepEqual(server.rows(), { codes: [], tokens: [] });
     assertRefused(
-      await tradeCode(server, album, code, { code_verifier: verifier }),
+      await exchangeCode(server, album, code, { code_verifier: verifier }),
       400,
       'invalid_grant',
     );
@@ -88,11 +88,11 @@ test('a wrong verifier is refused and spends the code', async () => {
   }
 });
 
-test('the challenge itself is no verifier', async () => {
+test('the challenge is not accepted as its verifier', async () => {
   const { challenge } = pkce();
   const { code } = await allowed(server, album, withChallenge({ challenge }));
   assertRefused(
-    await tradeCode(server, album, code, { code_verifier: challenge }),
+    await exchangeCode(server, album, code, { code_verifier: challenge }),
     400,
     'invalid_grant',
   );
@@ -103,24 +103,24 @@ test('a verifier for a code without a challenge is refused', async () => {
   const { code } = await allowed(server, album);
   await leavesNoTrace(server, async () =>
     assertRefused(
-      await tradeCode(server, album, code, { code_verifier: pkce().verifier }),
+      await exchangeCode(server, album, code, { code_verifier: pkce().verifier }),
       400,
       'invalid_grant',
     ),
   );
 });
 
-test('the code of another client is refused and stays good for its owner', async () => {
+test('the code of another client is refused and stays valid for its owner', async () => {
   const { code } = await allowed(server, album);
   await leavesNoTrace(server, async () => {
-    assertRefused(await tradeCode(server, printer, code), 400, 'invalid_grant');
+    assertRefused(await exchangeCode(server, printer, code), 400, 'invalid_grant');
     assertRefused(
-      await tradeCode(server, printer, code, { redirect_uri: album.redirectUri }),
+      await exchangeCode(server, printer, code, { redirect_uri: album.redirectUri }),
       400,
       'invalid_grant',
     );
   });
-  assertTokens(await tradeCode(server, album, code), { scope: 'read write profile' });
+  assertTokens(await exchangeCode(server, album, code), { scope: 'read write profile' });
 });
 
 test('another redirect URI than that of the request is refused', async () => {
@@ -133,13 +133,13 @@ test('another redirect URI than that of the request is refused', async () => {
       'x',
     ])
       assertRefused(
-        await tradeCode(server, album, code, { redirect_uri: uri }),
+        await exchangeCode(server, album, code, { redirect_uri: uri }),
         400,
         'invalid_grant',
       );
     for (const uri of [undefined, ''])
       assertRefused(
-        await tradeCode(server, album, code, { redirect_uri: uri }),
+        await exchangeCode(server, album, code, { redirect_uri: uri }),
         400,
         'invalid_request',
       );
@@ -150,7 +150,7 @@ test('an expired code is refused', async () => {
   const { code } = await allowed(server, album);
   server.sql("UPDATE oauth_grantCode SET expired_time = strftime('%s', 'now') - 1");
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'),
+    assertRefused(await exchangeCode(server, album, code), 400, 'invalid_grant'),
   );
 });
 
@@ -165,7 +165,7 @@ test('an unknown code is refused', async () => {
       '_'.repeat(64),
       '\u20ac',
     ])
-      assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant');
+      assertRefused(await exchangeCode(server, album, code), 400, 'invalid_grant');
   });
 });
 
@@ -175,10 +175,10 @@ test('a code that cannot be spent gives no tokens', async () => {
     'CREATE TRIGGER keep BEFORE DELETE ON oauth_grantCode BEGIN SELECT RAISE(IGNORE); END',
   );
   await leavesNoTrace(server, async () =>
-    assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant'),
+    assertRefused(await exchangeCode(server, album, code), 400, 'invalid_grant'),
   );
   server.sql('DROP TRIGGER keep');
-  assertTokens(await tradeCode(server, album, code), { scope: 'read write profile' });
+  assertTokens(await exchangeCode(server, album, code), { scope: 'read write profile' });
 });
 
 test('a missing or repeated parameter is refused and spends nothing', async () => {
@@ -224,5 +224,5 @@ test('other grant types are refused', async () => {
 test('tokens live as long as the settings say', async () => {
   server.set({ token_expired: 42 });
   const { code } = await allowed(server, album);
-  assertTokens(await tradeCode(server, album, code), { scope: 'read write profile', lifetime: 42 });
+  assertTokens(await exchangeCode(server, album, code), { scope: 'read write profile', lifetime: 42 });
 });

@@ -1,10 +1,10 @@
-// What becomes of tokens: /userinfo (RFC 6750), /introspect (RFC 7662), /revoke (RFC 7009).
+// The use of tokens: /userinfo (RFC 6750), /introspect (RFC 7662), /revoke (RFC 7009).
 
 import assert from 'node:assert/strict';
 import { readFileSync, writeFileSync } from 'node:fs';
 import { after, afterEach, before, test } from 'node:test';
 
-import { allowed, issued, refresh, tradeCode } from './code_flow.mjs';
+import { allowed, issued, refresh, exchangeCode } from './code_flow.mjs';
 import { basic, bearer, post, request } from './http.mjs';
 import { assertNotStored, assertRefused, leavesNoTrace } from './outcomes.mjs';
 import { alice, photoAlbum, printShop, Server } from './server.mjs';
@@ -23,7 +23,7 @@ before(async () => {
 after(() => server.stop());
 afterEach(() => server.clear());
 
-// As if all users had been removed.
+// Runs the action while users.json has no users.
 async function withoutUsers(action) {
   const file = '/var/authserver/users.json';
   const original = readFileSync(file, 'utf8');
@@ -47,7 +47,7 @@ function assertUnauthorized(answer, status, error) {
   assert.equal(answer.json.error, error);
 }
 
-// No error: nothing was tried.
+// A request without a token gets no error code.
 function assertTokenNeeded(answer) {
   assert.equal(answer.status, 401);
   assertNotStored(answer);
@@ -62,7 +62,7 @@ async function assertInactive(client, token) {
   assert.deepEqual(answer.json, { active: false });
 }
 
-test('userinfo tells the name of the user to who has the scope profile', async () => {
+test('userinfo returns the name of the user for a token with the scope profile', async () => {
   const { access_token: token } = await issued(server, album);
   for (const headers of [bearer(token), { authorization: `bearer ${token}` }]) {
     const answer = await userinfo(headers);
@@ -72,12 +72,12 @@ test('userinfo tells the name of the user to who has the scope profile', async (
   }
 });
 
-test('userinfo without a token says how to come by one', async () => {
+test('userinfo without a token answers with a challenge and no error code', async () => {
   assertTokenNeeded(await userinfo({}));
   assertTokenNeeded(await userinfo(basic(album)));
 });
 
-test('userinfo takes no token from the query', async () => {
+test('userinfo ignores a token in the query', async () => {
   const { access_token: token } = await issued(server, album);
   assertTokenNeeded(await request(`${server.issuer}/userinfo?access_token=${token}`));
 });
@@ -103,7 +103,7 @@ test('userinfo refuses a token of narrower scope with insufficient_scope', async
   assertUnauthorized(await userinfo(bearer(token)), 403, 'insufficient_scope');
 });
 
-test('the tokens of a disabled client open nothing', async () => {
+test('the tokens of a disabled client are void', async () => {
   const tokens = await issued(server, album);
   server.oauthctl('client', 'disable', album.id);
   assertUnauthorized(await userinfo(bearer(tokens.access_token)), 401, 'invalid_token');
@@ -112,12 +112,12 @@ test('the tokens of a disabled client open nothing', async () => {
   server.oauthctl('client', 'enable', album.id);
 });
 
-test('a user who was removed gets no tokens and no answer', async () => {
+test('the codes and tokens of a removed user are void', async () => {
   const { code } = await allowed(server, album);
   const tokens = await issued(server, album);
   await withoutUsers(() =>
     leavesNoTrace(server, async () => {
-      assertRefused(await tradeCode(server, album, code), 400, 'invalid_grant');
+      assertRefused(await exchangeCode(server, album, code), 400, 'invalid_grant');
       assertRefused(await refresh(server, album, tokens.refresh_token), 400, 'invalid_grant');
       for (const token of [tokens.access_token, tokens.refresh_token]) {
         await assertInactive(album, token);
@@ -129,7 +129,7 @@ test('a user who was removed gets no tokens and no answer', async () => {
   assert.equal((await introspect(album, tokens.access_token)).json.active, true);
 });
 
-test('an expiry beyond 64 bits is the far future everywhere', async () => {
+test('an expiry beyond 64 bits is in the far future at every endpoint', async () => {
   const { code } = await allowed(server, album);
   const { access_token: token } = await issued(server, album);
   for (const table of ['grantCode', 'token'])
@@ -139,10 +139,10 @@ test('an expiry beyond 64 bits is the far future everywhere', async () => {
     '"active":true',
     '"exp":9223372036854775807',
   ]);
-  assert.equal((await tradeCode(server, album, code)).status, 200);
+  assert.equal((await exchangeCode(server, album, code)).status, 200);
 });
 
-test('introspection tells a client about its own tokens', async () => {
+test("introspection describes a client's own tokens", async () => {
   const tokens = await issued(server, album, { scope: 'read profile' });
   const common = {
     active: true,
@@ -159,21 +159,21 @@ test('introspection tells a client about its own tokens', async () => {
   assert.deepEqual((await introspect(album, tokens.refresh_token)).json, common);
 });
 
-test('introspection tells other clients nothing unless they are registered for it', async () => {
+test('introspection describes tokens of other clients only to those registered for it', async () => {
   const tokens = await issued(server, album);
   await assertInactive(printer, tokens.access_token);
   await assertInactive(printer, tokens.refresh_token);
   assert.equal((await introspect(gateway, tokens.access_token)).json.active, true);
 });
 
-test('introspection tells about a refresh token only to the client that it belongs to', async () => {
+test('introspection describes a refresh token only to its own client', async () => {
   const tokens = await issued(server, album);
   await assertInactive(gateway, tokens.refresh_token);
   await assertInactive(printer, tokens.refresh_token);
   assert.equal((await introspect(album, tokens.refresh_token)).json.active, true);
 });
 
-test('introspection calls unknown, expired and spent tokens inactive', async () => {
+test('introspection reports unknown, expired and spent tokens as inactive', async () => {
   const old = await issued(server, album);
   const { json: tokens } = await refresh(server, album, old.refresh_token);
   for (const token of [
@@ -190,7 +190,7 @@ test('introspection calls unknown, expired and spent tokens inactive', async () 
   assert.equal((await introspect(album, tokens.refresh_token)).json.active, true);
 });
 
-test('revoking the access or the refresh token ends both', async () => {
+test('revoking the access token or the refresh token ends both', async () => {
   for (const name of ['access_token', 'refresh_token']) {
     for (const hint of [undefined, 'access_token', 'refresh_token', 'nonsense']) {
       const kept = await issued(server, album);
@@ -209,12 +209,12 @@ test('revoking the access or the refresh token ends both', async () => {
   }
 });
 
-test('revoking what is not there succeeds', async () => {
+test('revoking an unknown token succeeds', async () => {
   for (const token of ['x', '0'.repeat(64), "' OR '1'='1"])
     assert.equal((await revoke(album, token)).status, 200);
 });
 
-test('nobody can revoke the tokens of another client', async () => {
+test('a client cannot revoke the tokens of another client', async () => {
   const tokens = await issued(server, album);
   await leavesNoTrace(server, async () => {
     for (const client of [printer, gateway])
