@@ -40,6 +40,27 @@ inline constexpr char kTimestamp[] = "timestamp";  // Unix seconds, integer
 inline constexpr char kMsg[] = "msg";
 }  // namespace column
 
+// The columns that are encrypted at rest, in every table that has them.
+inline constexpr const char* kEncryptedColumns[] = {column::kClientId, column::kClientSecret};
+
+// Lengths of values in bytes, both inclusive.
+struct Limit {
+  int min, max;
+};
+namespace limit {
+inline constexpr Limit kUserName{1, 256};
+inline constexpr Limit kClientId{64, 64};
+inline constexpr Limit kClientSecret{64, 64};
+inline constexpr Limit kRedirectUri{3, 2048};
+inline constexpr Limit kScope{1, 2048};
+inline constexpr Limit kDisplayName{1, 64};
+inline constexpr Limit kCode{64, 64};
+inline constexpr Limit kToken{64, 64};
+inline constexpr Limit kExpiredTime{1, 128};
+inline constexpr Limit kFlowType{1, 32};
+inline constexpr Limit kState{1, 2048};
+}  // namespace limit
+
 // Keys of a request document.
 namespace request {
 inline constexpr char kModified[] = "modified";
@@ -55,6 +76,7 @@ inline constexpr char kErrCode[] = "err_code";
 inline constexpr char kExist[] = "exist";
 }  // namespace result
 
+// oauth_settings.h says what each one bounds, its default and its range.
 namespace setting {
 inline constexpr char kGrantCodeExpired[] = "grantcode_expired";
 inline constexpr char kTokenExpired[] = "token_expired";
@@ -66,6 +88,7 @@ inline constexpr char kLogLevel[] = "log_level";
 }  // namespace setting
 
 namespace path {
+inline constexpr char kFolder[] = "/var/packages/Keyloft/target/etc";
 inline constexpr char kDatabase[] = "/var/packages/Keyloft/target/etc/oauth.db";
 inline constexpr char kSettings[] = "/var/packages/Keyloft/target/etc/oauth.cfg";
 inline constexpr char kDebugMarker[] = "/tmp/zevooauth_debug";

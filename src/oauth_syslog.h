@@ -5,6 +5,7 @@
 //   OAUTH_ENTER  entry trace, first statement of an operation; never inside a lambda, whose
 //                __func__ is "operator()"
 //   OAUTH_LOG    any priority, for example LOG_AUTH | LOG_INFO
+//   OAUTH_LOG_AT   the same as an expression, with the file's name and the line given
 //
 // Macros, because only they know file and line; the format stays a literal, so that the compiler
 // checks it, and no argument is evaluated for a diagnostic that is switched off.
@@ -32,10 +33,12 @@ inline bool wants(Class c) { return isDebugEnabled() && (getLogLevel() & c) != 0
 
 }  // namespace ZEVOOAUTHSERVER::diagnostics
 
+#define OAUTH_LOG_AT(file, line, priority, format, ...) \
+  syslog((priority), "%s:%d " format, (file), (line), ##__VA_ARGS__)
 #define OAUTH_LOG(priority, format, ...)                                                  \
   do {                                                                                    \
     constexpr const char* oauthFile = ::ZEVOOAUTHSERVER::diagnostics::baseName(__FILE__); \
-    syslog((priority), "%s:%d " format, oauthFile, __LINE__, ##__VA_ARGS__);              \
+    OAUTH_LOG_AT(oauthFile, __LINE__, priority, format, ##__VA_ARGS__);                   \
   } while (0)
 #define OAUTH_FAIL(format, ...) OAUTH_LOG(LOG_ERR, format, ##__VA_ARGS__)
 #define OAUTH_DIAG(klass, format, ...)                                                \

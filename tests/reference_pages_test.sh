@@ -8,11 +8,12 @@ cd "$(dirname "$0")/.."
 # The sources as one line, without comments; literals that stand side by side are one.
 code() { sed 's|^ *//.*||' "$@" | tr '\n' ' ' | sed -E 's/" +"//g; s/\( +/(/g'; }
 
-# "<heading>: <text>" for each log line, error text and line of the audit log. What takes its text
-# from elsewhere than a literal stays as it is, and is in no catalogue.
+# "<heading>: <text>" for each log line, error text and line of the audit log. A call whose text is
+# not a literal stays as it is, and no page has such a line. oauth_failure.h only passes texts on.
 messages_in_sources() {
-  { code src/*/*.{h,cpp} && grep '^#define OAUTH_ENTER' src/oauth_syslog.h; } |
-    grep -oE '(OAUTH_(FAIL|DIAG|LOG)\(|[^_]syslog\(|SetErrMsg\(|errMsg_ = |kErrMsg\] = |auditLog\.Add\()[^";]*("[^"]*"|;)' |
+  mapfile -t files < <(find src -mindepth 2 -type f ! -name oauth_failure.h)
+  { code "${files[@]}" && grep '^#define OAUTH_ENTER' src/oauth_syslog.h; } |
+    grep -oE '(OAUTH_(FAIL|DIAG|LOG)\(|[^_]syslog\(|fail\(|OAUTH_REFUSE\(|SetErrMsg\(|errMsg_ = |kErrMsg\] = |auditLog\.Add\()[^";]*("[^"]*"|;)' |
     sed -E '
       s/^OAUTH_FAIL\("(.*)"$/Failures: \1/
       s/^OAUTH_LOG\(LOG_AUTH \| LOG_ERR, "(.*)"$/Refused privileges: \1/
@@ -21,10 +22,12 @@ messages_in_sources() {
       s/^OAUTH_DIAG\(kRow, "(.*)"$/Rows, bit 2: \1/
       s/^OAUTH_DIAG\(kArgument, "(.*)"$/Arguments, bit 4: \1/
       s/^OAUTH_DIAG\(kEntry, "(.*)"$/Entry traces, bit 8: \1/
+      s/^OAUTH_REFUSE\(kErr[A-Za-z]+, "(.*)"$/Failures: \1\nError texts: \1/
+      s/^fail\(\*this, [A-Za-z]+, "(.*)"$/Error texts: \1/
       s/^(SetErrMsg\(|errMsg_ = |kErrMsg\] = )"(.*)"$/Error texts: \2/
       s/^auditLog\.Add\("(.*)"$/Audit log: \1/' |
     # The definition, SQLite's own text, and the text of the store.
-    grep -vxF -e 'SetErrMsg(const std::string& msg) { errMsg_ = msg;' -e 'SetErrMsg(text);' \
+    grep -vxF -e 'SetErrMsg(const std::string& msg) { errMsg_ = msg;' -e 'fail(*this, code, text);' \
       -e 'kErrMsg] = GetErrMsg();' | LC_ALL=C sort -u
 }
 

@@ -5,12 +5,11 @@
 #include <exception>
 
 #include "host_libraries.h"
+#include "oauth_names.h"
 #include "zevocore_key.h"
 #include "zevocore_siv.h"
 
 namespace {
-
-constexpr char kKeyDirectory[] = "/var/packages/Keyloft/target/etc";
 
 // Copies the text with its NUL byte; 0 and nothing written if it does not fit.
 int deliver(const std::string& text, char* out, int outSize) {
@@ -23,7 +22,7 @@ int deliver(const std::string& text, char* out, int outSize) {
 
 [[gnu::visibility("default")]] int ZOCLCryptSzEncrypt(const char* plain, char* out,
                                                       int outSize) try {
-  const std::optional<zevocore::Key> key = zevocore::loadKey(kKeyDirectory);
+  const std::optional<zevocore::Key> key = zevocore::loadKey(ZEVOOAUTHSERVER::names::path::kFolder);
   return key ? deliver(zevocore::seal(*key, plain), out, outSize) : 0;
 } catch (const std::exception&) {
   return 0;
@@ -31,7 +30,7 @@ int deliver(const std::string& text, char* out, int outSize) {
 
 [[gnu::visibility("default")]] int ZOCLCryptSzDecrypt(const char* cipher, char* out,
                                                       int outSize) try {
-  const std::optional<zevocore::Key> key = zevocore::loadKey(kKeyDirectory);
+  const std::optional<zevocore::Key> key = zevocore::loadKey(ZEVOOAUTHSERVER::names::path::kFolder);
   if (!key) return 0;
   const std::optional<std::string> plain = zevocore::unseal(*key, cipher);
   return plain ? deliver(*plain, out, outSize) : 0;

@@ -8,36 +8,24 @@
 #include <cerrno>
 #include <cstdlib>
 
+#include "utils/descriptor.h"
+
 namespace zevocore {
 namespace {
 
-class File {
- public:
-  explicit File(int descriptor) : descriptor_(descriptor) {}
-  ~File() {
-    if (descriptor_ >= 0) close(descriptor_);
-  }
-  File(const File&) = delete;
-  File& operator=(const File&) = delete;
-
-  int descriptor() const { return descriptor_; }
-  bool isOpen() const { return descriptor_ >= 0; }
-
- private:
-  const int descriptor_;
-};
+using ZEVOOAUTHSERVER::Descriptor;
 
 // Nothing on any failure, with errno ENOENT only if there is no such file.
 std::optional<Key> readKey(const std::string& path) {
   // Not through a link, and without waiting for a writer should it be a pipe.
-  const File file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+  const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
   if (!file.isOpen()) return std::nullopt;
   errno = EINVAL;
   Key key;
   struct stat status;
-  if (fstat(file.descriptor(), &status) != 0 || !S_ISREG(status.st_mode) ||
+  if (fstat(file.value(), &status) != 0 || !S_ISREG(status.st_mode) ||
       status.st_size != static_cast<off_t>(key.size()) ||
-      read(file.descriptor(), key.data(), key.size()) != static_cast<ssize_t>(key.size()))
+      read(file.value(), key.data(), key.size()) != static_cast<ssize_t>(key.size()))
     return std::nullopt;
   return key;
 }
@@ -54,14 +42,13 @@ bool writeRandomKey(int descriptor) {
 // file behind, of mode 0600 like the key.
 void makeKey(const std::string& directory, const std::string& path) {
   std::string temporary = directory + "/.zevocore.key.XXXXXX";
-  const File file(mkostemp(temporary.data(), O_CLOEXEC));
+  const Descriptor file(mkostemp(temporary.data(), O_CLOEXEC));
   if (!file.isOpen()) return;
-  const bool linked =
-      writeRandomKey(file.descriptor()) && link(temporary.c_str(), path.c_str()) == 0;
+  const bool linked = writeRandomKey(file.value()) && link(temporary.c_str(), path.c_str()) == 0;
   unlink(temporary.c_str());
   if (!linked) return;
-  const File folder(open(directory.c_str(), O_RDONLY | O_CLOEXEC | O_DIRECTORY));
-  if (folder.isOpen()) fsync(folder.descriptor());
+  const Descriptor folder(open(directory.c_str(), O_RDONLY | O_CLOEXEC | O_DIRECTORY));
+  if (folder.isOpen()) fsync(folder.value());
 }
 
 }  // namespace

@@ -12,6 +12,7 @@
 
 #include "decimal_text.h"
 #include "host_libraries.h"
+#include "oauth_failure.h"
 #include "oauth_names.h"
 #include "oauth_syslog.h"
 #include "oauth_transaction.h"
@@ -59,7 +60,7 @@ class RaisedPrivilege {
   static bool setUser(unsigned id) { return report("resuid", id, setresuid(kKeep, id, kKeep)); }
   static bool setGroup(unsigned id) { return report("resgid", id, setresgid(kKeep, id, kKeep)); }
 
-  // Logs what a call did; a drop back to ordinary ids is not worth a line.
+  // Logs a refusal, or that the process became root. A return to ordinary ids is not logged.
   static bool report(const char* call, unsigned id, int result) {
     const int target = static_cast<int>(id);
     if (result != 0) {
@@ -78,8 +79,8 @@ class RaisedPrivilege {
 
 constexpr int kBusyTimeout = 5000;  // milliseconds
 
-// True if the path holds something other than a regular file. Root must not open it: whoever made a
-// link would choose the file.
+// True if there is something other than a regular file at the path. Root must not open it: the
+// maker of a link would choose which file root opens.
 bool holdsNoDatabase(const char* path) {
   struct stat status;
   return lstat(path, &status) == 0 && !S_ISREG(status.st_mode);
@@ -91,8 +92,8 @@ void makeFile(const char* path, uid_t user, gid_t group) {
   constexpr mode_t kMode = S_IRUSR | S_IWUSR;
   const int file = open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode);
   if (file < 0) return;  // It exists, or sqlite3_open() reports what is wrong.
-  fchmod(file, kMode);   // Whatever the umask took away.
-  static_cast<void>(!fchown(file, user, group));  // If this is refused, the file stays root's.
+  fchmod(file, kMode);   // The umask may have removed bits.
+  static_cast<void>(!fchown(file, user, group));  // If this fails, the file still belongs to root.
   close(file);
 }
 
@@ -105,7 +106,7 @@ int openDatabase(sqlite3** db) {
     const RaisedPrivilege raised;
     const int error = errno;
     makeFile(path, user, group);
-    // Root looks again: it also sees what the program's own user may not look at.
+    // Look again as root, who can also see into folders that are closed to the program's user.
     const bool mayOpen = !holdsNoDatabase(path);
     errno = error;
     if (mayOpen) return sqlite3_open(path, db);
@@ -116,8 +117,8 @@ int openDatabase(sqlite3** db) {
   return result;
 }
 
-// The file may come from anybody who can write its folder. Refuse statements that change SQLite's
-// own tables, and functions with side effects in views and triggers.
+// Anybody who can write to the folder may have made the file. Refuse statements that change
+// SQLite's own tables, and functions with side effects in views and triggers.
 void distrustSchema(sqlite3* db) {
   sqlite3_db_config(db, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
   sqlite3_db_config(db, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
@@ -125,7 +126,7 @@ void distrustSchema(sqlite3* db) {
 
 using HostCipher = int (*)(const char* text, char* out, int outSize);
 
-// The text that the host's cipher makes of the input; false, and out left empty, if it refuses.
+// Writes what the host's cipher returns for the text to out; false, without a change, if it fails.
 bool convert(HostCipher cipher, const std::string& text, std::string& out) {
   char buffer[1024] = {};
   if (cipher(text.c_str(), buffer, sizeof buffer) == 0) return false;
@@ -133,7 +134,7 @@ bool convert(HostCipher cipher, const std::string& text, std::string& out) {
   return true;
 }
 
-// The host takes texts that end at a NUL byte, so it could not give back one that holds a NUL.
+// The host's texts end at a NUL byte: a value that holds one would come back cut.
 bool EncryptValue(const std::string& plain, std::string& out) {
   const bool isWhole = plain.find('\0') == std::string::npos;
   if (isWhole && convert(ZOCLCryptSzEncrypt, plain, out)) return true;
@@ -149,30 +150,29 @@ bool DecryptValue(const std::string& cipher, std::string& out) {
 
 using ValueConverter = bool (*)(const std::string& text, std::string& out);
 
-bool replaceMember(Json::Value& doc, const char* key, ValueConverter converter) {
-  std::string replacement;
-  if (!converter(doc[key].asString(), replacement)) return false;
-  doc[key] = replacement;
-  return true;
-}
-
-// A document that is no object, such as an absent condition, has no member to convert.
-bool has(const Json::Value& doc, const char* key) { return doc.isObject() && doc.isMember(key); }
-
-// Converts the sensitive members. The trace names the operation that was called.
-bool replaceSensitive(Json::Value& doc, const char* operation, ValueConverter converter) {
-  if (has(doc, names::column::kClientId)) {
+// A literal for each column: programs that capture the log may compare its formats.
+void traceConversion(const char* operation, const char* column) {
+  if (column == names::column::kClientId)
     OAUTH_DIAG(kResult, "==> %s[client_id]", operation);
-    if (!replaceMember(doc, names::column::kClientId, converter)) return false;
-  }
-  if (has(doc, names::column::kClientSecret)) {
+  else
     OAUTH_DIAG(kResult, "==> %s[client_secret]", operation);
-    if (!replaceMember(doc, names::column::kClientSecret, converter)) return false;
+}
+
+// Converts the encrypted columns among the document's members. The trace names the operation that
+// was called. A document that is not an object, such as an absent condition, has no members.
+bool replaceSensitive(Json::Value& doc, const char* operation, ValueConverter converter) {
+  if (!doc.isObject()) return true;
+  for (const char* const column : names::kEncryptedColumns) {
+    if (!doc.isMember(column)) continue;
+    traceConversion(operation, column);
+    std::string replacement;
+    if (!converter(doc[column].asString(), replacement)) return false;
+    doc[column] = replacement;
   }
   return true;
 }
 
-// For the row reader as well, which has no store at hand.
+// ParamDecrypt() without a store: the row callback has none.
 bool decryptMembers(Json::Value& doc) {
   return replaceSensitive(doc, "ParamDecrypt", DecryptValue);
 }
@@ -181,8 +181,8 @@ void dumpColumn(int index, const char* name, const char* value) {
   OAUTH_DIAG(kRow, "##### [%d][%s = %s]", index, name, textOrEmpty(value));
 }
 
-// Runs the body of a row callback. SQLite is C: no exception may unwind through it, so a row that
-// cannot be delivered fails the statement (SQLITE_ABORT) instead of going missing.
+// Runs the body of a row callback. No exception may pass through SQLite, which is C. A row that
+// cannot be delivered fails the statement (SQLITE_ABORT), so that no row is lost silently.
 template <class Body>
 int deliver(Body body) noexcept {
   try {
@@ -193,16 +193,10 @@ int deliver(Body body) noexcept {
   }
 }
 
-bool badParameters(OAUTHDBBasic& store) {
-  store.SetErrCode(kErrBadParameters);
-  store.SetErrMsg("Bad parameters");
-  OAUTH_FAIL("Bad parameters");
-  return false;
-}
-
-// A value between single quotes, those inside doubled. A NUL byte stays in it: SQLite reads the
-// statement up to that byte only, finds no closing quote, and refuses it. So no value is cut.
-std::string quoted(const Json::Value& value) {
+// The value between single quotes, with the quotes inside it doubled. A NUL byte stays in it:
+// SQLite reads the statement only up to that byte, finds no closing quote, and refuses it. So no
+// value is cut.
+std::string sqlLiteral(const Json::Value& value) {
   std::string text = value.asString();
   boost::algorithm::replace_all(text, "'", "''");
   return "'" + text + "'";
@@ -215,14 +209,13 @@ std::string quoted(const Json::Value& value) {
 OAUTHDBBasic::OAUTHDBBasic() : OAUTHDBBasic(nullptr) {
   const int result = openDatabase(&db_);
   if (result != SQLITE_OK) {
-    SetErrCode(result);
-    SetErrMsg("Open DB failed!!");
+    fail(*this, result, "Open DB failed!!");
     OAUTH_FAIL("Open DB failed!![%d]", result);
   } else {
     distrustSchema(db_);
     sqlite3_busy_timeout(db_, kBusyTimeout);
   }
-  // Also after a failed open: SQLite hands out a handle then too, and what fails on it is logged.
+  // Also after a failed open: SQLite returns a handle then too, and each failure on it is logged.
   DBInit();
 }
 
@@ -255,8 +248,7 @@ bool OAUTHDBBasic::DBInit() {
 
   OAUTH_DIAG(kEntry, "==> %s[init meta table]", __func__);
   if (!IsDBTabExist(names::table::kMeta) && !createMetaTable()) {
-    SetErrCode(kErrCreateTable);
-    SetErrMsg("Create table failed");
+    fail(*this, kErrCreateTable, "Create table failed");
     OAUTH_FAIL("Create Table failed!![meta]");
     return ready_;
   }
@@ -273,17 +265,17 @@ bool OAUTHDBBasic::DBInit() {
   return true;
 }
 
-// All or nothing, and only once: the first of several processes creates the table. The others
-// look again under the write lock and find it. (In the caller's own transaction the lock comes with
-// the first change.) A look-up that fails there is a failure, not a missing table.
+// Several processes may find no table at the same time. The first one creates it. The others look
+// again under the write lock and find it. (In the caller's own transaction the lock comes with the
+// first change.) A look-up that fails there is a failure, not a missing table.
 bool OAUTHDBBasic::createMetaTable() {
-  Transaction transaction(*this, &OAUTHDBBasic::DBCmdRun);
+  Transaction transaction = Transaction::whileMakingReady(*this);
   bool exists = false;
   if (!transaction.begun() || !lookUpTable(names::table::kMeta, exists)) return false;
-  return (exists || fillMetaTable()) && transaction.commit();
+  return (exists || fillMetaTable()) && transaction.commitIfBegun();
 }
 
-// Counts the rows that came, because a view of that name can swallow them without an error.
+// Counts the rows that were inserted: a view of that name can swallow them without an error.
 bool OAUTHDBBasic::fillMetaTable() {
   if (!CreateDBTab(names::schema::kMeta)) return false;
   const int rowsBefore = sqlite3_total_changes(db_);
@@ -293,11 +285,7 @@ bool OAUTHDBBasic::fillMetaTable() {
 }
 
 bool OAUTHDBBasic::CreateDBTab(const std::string& sql) {
-  if (!DBCmdRun(sql, nullptr, nullptr)) {
-    SetErrCode(kErrCreateTable);
-    SetErrMsg("Create table failed");
-    return false;
-  }
+  if (!DBCmdRun(sql, nullptr, nullptr)) return fail(*this, kErrCreateTable, "Create table failed");
   OAUTH_DIAG(kEntry, "Create tab success");
   return true;
 }
@@ -351,8 +339,7 @@ bool OAUTHDBBasic::DBCmdRun(const std::string& sql, RowCallback callback, Json::
   if (code == SQLITE_OK) return true;
   // On a handle whose open failed there is a code without a text.
   const char* const text = textOrEmpty(error.get());
-  SetErrCode(code);
-  SetErrMsg(text);
+  fail(*this, code, text);
   OAUTH_FAIL("Run Command failed!![%s][%d]", text, code);
   return false;
 }
@@ -394,7 +381,7 @@ int OAUTHDBBasic::TabGetCallback(void* context, int columns, char** values, char
 
 bool OAUTHDBBasic::DBGetRowCount(Json::Value* result) {
   OAUTH_ENTER();
-  if (result == nullptr) return badParameters(*this);
+  if (result == nullptr) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   *result = Json::Value(Json::arrayValue);
   const std::string sql = "SELECT COUNT(*) FROM " + tabName_ + ";";
   if (DBCmd(sql, TabCountCallback, result)) return true;
@@ -426,7 +413,7 @@ std::string OAUTHDBBasic::GetInsertParam(const Json::Value& record) {
     }
     columns += member.name();
     if (!member->isNull())
-      values += quoted(*member);
+      values += sqlLiteral(*member);
     else if (member.name() == names::column::kTimestamp)
       values += "strftime('%s','now')";
     else
@@ -440,7 +427,7 @@ std::string OAUTHDBBasic::ConcateParam(const Json::Value& values, const std::str
   std::string result;
   for (auto member = values.begin(); member != values.end(); ++member) {
     if (!result.empty()) result += separator;
-    result += member.name() + "=" + quoted(*member);
+    result += member.name() + "=" + sqlLiteral(*member);
   }
   return result;
 }
@@ -465,11 +452,7 @@ std::string OAUTHDBBasic::GetUpdateParam(const Json::Value& request) {
 
 bool OAUTHDBBasic::DBAdd(Json::Value& record) {
   OAUTH_ENTER();
-  if (!ParamEncrypt(record)) {
-    SetErrCode(kErrCrypt);
-    SetErrMsg("Data Encrypt failed");
-    return false;
-  }
+  if (!ParamEncrypt(record)) return fail(*this, kErrCrypt, "Data Encrypt failed");
   if (!DBCmd("INSERT INTO " + tabName_ + GetInsertParam(record) + ";", nullptr, nullptr)) {
     OAUTH_FAIL("Add failed[%s]", tabName_.c_str());
     return false;
@@ -481,11 +464,7 @@ bool OAUTHDBBasic::DBAdd(Json::Value& record) {
 bool OAUTHDBBasic::DBDel(Json::Value& request) {
   OAUTH_ENTER();
   Json::Value& condition = request[names::request::kCondition];
-  if (!ParamEncrypt(condition)) {
-    SetErrCode(kErrCrypt);
-    SetErrMsg("Data Encrypt failed");
-    return false;
-  }
+  if (!ParamEncrypt(condition)) return fail(*this, kErrCrypt, "Data Encrypt failed");
   const std::string sql = "DELETE FROM " + tabName_ + GetConditionParam(condition) + ";";
   if (!DBCmd(sql, nullptr, nullptr) || sqlite3_changes(db_) <= 0) {
     OAUTH_FAIL("Delete failed[%s]", tabName_.c_str());
@@ -498,13 +477,10 @@ bool OAUTHDBBasic::DBDel(Json::Value& request) {
 
 bool OAUTHDBBasic::DBGet(Json::Value& request, Json::Value* rows) {
   OAUTH_ENTER();
-  if (rows == nullptr) return badParameters(*this);
+  if (rows == nullptr) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
   Json::Value& condition = request[names::request::kCondition];
-  if (!ParamEncrypt(condition)) {
-    SetErrCode(kErrCrypt);
-    SetErrMsg("Data Decrypt failed");  // callers know a failed read by this text
-    return false;
-  }
+  // Callers know a failed read by this text.
+  if (!ParamEncrypt(condition)) return fail(*this, kErrCrypt, "Data Decrypt failed");
   *rows = Json::Value(Json::arrayValue);
   std::string sql = "SELECT * FROM " + tabName_;
   if (request.isMember(names::request::kConditionLike))
@@ -524,11 +500,8 @@ bool OAUTHDBBasic::DBGet(Json::Value& request, Json::Value* rows) {
 bool OAUTHDBBasic::DBEdit(Json::Value& request) {
   OAUTH_ENTER();
   if (!ParamEncrypt(request[names::request::kCondition]) ||
-      !ParamEncrypt(request[names::request::kModified])) {
-    SetErrCode(kErrCrypt);
-    SetErrMsg("Data Encrypt failed");
-    return false;
-  }
+      !ParamEncrypt(request[names::request::kModified]))
+    return fail(*this, kErrCrypt, "Data Encrypt failed");
   const std::string sql = "UPDATE " + tabName_ + GetUpdateParam(request) + ";";
   if (!DBCmd(sql, nullptr, nullptr) || sqlite3_changes(db_) <= 0) {
     OAUTH_FAIL("Edit failed[%s]", tabName_.c_str());

@@ -1,5 +1,4 @@
-// A transaction of a store's connection, rolled back unless it is committed. Inside a transaction
-// that the caller has begun it is a part of that one, which the caller commits.
+// A transaction of a store's connection.
 
 #pragma once
 
@@ -9,21 +8,15 @@
 
 namespace ZEVOOAUTHSERVER {
 
+// It is rolled back unless it is committed. Inside a transaction that the caller has begun it is a
+// part of that one: the caller then commits or rolls back the whole.
 class Transaction {
  public:
-  // How its statements are run: OAUTHDBBasic::DBCmd, or DBCmdRun while the store is made ready.
-  using Runner = bool (OAUTHDBBasic::*)(const std::string& sql, OAUTHDBBasic::RowCallback callback,
-                                        Json::Value* result);
-
-  // Takes the write lock at once: a transaction that began by reading and then wants to write
-  // fails without waiting while another one does the same. Where it cannot begin, statements are
-  // committed one by one. On a store that is not ready nothing is tried, since whatever comes
-  // next is refused with the same line.
-  Transaction(OAUTHDBBasic& store, Runner run) : store_(store), run_(run) {
-    if (run_ == &OAUTHDBBasic::DBCmd && !store_.ready_) return;
-    isPart_ = isUnderWay();
-    begun_ = execute(isPart_ ? "SAVEPOINT zevooauth;" : "BEGIN IMMEDIATE;");
-  }
+  // For operations on records. On a store that is not ready nothing is begun: the operation's own
+  // statement is refused with the same line.
+  static Transaction onReadyStore(OAUTHDBBasic& store) { return {store, true}; }
+  // For making the schema, which happens before the store is ready.
+  static Transaction whileMakingReady(OAUTHDBBasic& store) { return {store, false}; }
   ~Transaction() {
     try {
       rollBack();
@@ -35,19 +28,20 @@ class Transaction {
 
   bool begun() const { return begun_; }
 
-  // It cannot be committed whole: SQLite rolled everything back by itself after an error, or the
-  // disk has no room for the last statement, which SQLite then undoes alone on a table with
-  // triggers.
+  // True if it cannot be committed whole. Either SQLite rolled everything back by itself after an
+  // error, or the disk has no room for the last statement. (On a table with triggers SQLite undoes
+  // that statement alone.)
   bool isLost() const {
     const bool isFull = !isPart_ && (sqlite3_errcode(store_.db_) & 0xFF) == SQLITE_FULL;
     return begun_ && (isFull || !isUnderWay());
   }
 
-  // The caller has begun it.
+  // True if the caller had begun a transaction before.
   bool isPart() const { return isPart_; }
 
-  // True if the changes are kept. Where no transaction could begin, each was committed already.
-  bool commit() {
+  // True if the changes are kept. If no transaction could begin, each statement was committed by
+  // itself and there is nothing left to do.
+  bool commitIfBegun() {
     if (!begun_) return true;
     if (!isLost() && execute(isPart_ ? "RELEASE zevooauth;" : "COMMIT;")) {
       begun_ = false;
@@ -58,8 +52,20 @@ class Transaction {
   }
 
  private:
+  // Takes the write lock at once: a transaction that began by reading and then wants to write
+  // fails without waiting while another one does the same. If it cannot begin, statements are
+  // committed one by one.
+  Transaction(OAUTHDBBasic& store, bool mustBeReady) : store_(store), mustBeReady_(mustBeReady) {
+    if (mustBeReady_ && !store_.ready_) return;
+    isPart_ = isUnderWay();
+    begun_ = execute(isPart_ ? "SAVEPOINT zevooauth;" : "BEGIN IMMEDIATE;");
+  }
+
   bool isUnderWay() const { return sqlite3_get_autocommit(store_.db_) == 0; }
-  bool execute(const char* sql) { return (store_.*run_)(sql, nullptr, nullptr); }
+  bool execute(const char* sql) {
+    return mustBeReady_ ? store_.DBCmd(sql, nullptr, nullptr)
+                        : store_.DBCmdRun(sql, nullptr, nullptr);
+  }
   void rollBack() {
     if (begun_ && isUnderWay())
       execute(isPart_ ? "ROLLBACK TO zevooauth; RELEASE zevooauth;" : "ROLLBACK;");
@@ -67,7 +73,7 @@ class Transaction {
   }
 
   OAUTHDBBasic& store_;
-  const Runner run_;
+  const bool mustBeReady_;
   bool isPart_ = false, begun_ = false;
 };
 

@@ -1,32 +1,24 @@
 #include "oauth_clientInfo.h"
 
+#include "oauth_failure.h"
 #include "oauth_log.h"
 #include "oauth_names.h"
 #include "oauth_request.h"
 #include "oauth_syslog.h"
+#include "redirect_uri.h"
 
 namespace ZEVOOAUTHSERVER {
 namespace {
 
+namespace column = names::column;
+namespace limit = names::limit;
+
 constexpr char kEnabled[] = "1";
 constexpr char kDisabled[] = "0";
 
-int badParameters(OAUTHDBClientInfo& store) {
-  store.SetErrCode(kErrBadParameters);
-  store.SetErrMsg("Bad parameters");
-  OAUTH_FAIL("Bad parameters");
-  return 0;
-}
-
-std::string withoutScheme(const std::string& uri) {
-  for (const std::string scheme : {"https://", "http://"})
-    if (uri.compare(0, scheme.size(), scheme) == 0) return uri.substr(scheme.size());
-  return uri;
-}
-
 Json::Value setEnable(long long id, const char* value) {
   Json::Value request = whereId(id);
-  request[names::request::kModified][names::column::kEnable] = value;
+  request[names::request::kModified][column::kEnable] = value;
   return request;
 }
 
@@ -41,30 +33,20 @@ int OAUTHDBClientInfo::Add(const std::string& client_id, const std::string& clie
   OAUTH_ENTER();
   OAUTHDBLog auditLog(names::table::kLog);
   const std::string uri = withoutScheme(redirect_uri);
-  if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kClientInfoMax)))) {
-    SetErrCode(kErrTableFull);
-    SetErrMsg("ClientInfo Table is full");
-    OAUTH_FAIL("ClientInfo Table is full");
-    return 0;
-  }
-  if (!fit({{client_id, kClientIdLimit},
-            {client_secret, kClientSecretLimit},
-            {uri, kRedirectUriLimit},
-            {scope, kScopeLimit},
-            {display_name, kDisplayNameLimit}}) ||
-      (enable != kEnabled && enable != kDisabled))
-    return badParameters(*this);
+  const Fields fields = {quoted(column::kClientId, client_id, limit::kClientId),
+                         quoted(column::kClientSecret, client_secret, limit::kClientSecret),
+                         quoted(column::kRedirectUri, uri, limit::kRedirectUri),
+                         quoted(column::kScope, scope, limit::kScope),
+                         quoted(column::kDisplayName, display_name, limit::kDisplayName)};
+  if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kClientInfoMax))))
+    return OAUTH_REFUSE(kErrTableFull, "ClientInfo Table is full");
+  if (!fit(fields) || (enable != kEnabled && enable != kDisabled))
+    return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
 
-  Json::Value record;
-  record[names::column::kEnable] = enable;
-  record[names::column::kClientId] = getSQLFormatStr(client_id);
-  record[names::column::kClientSecret] = getSQLFormatStr(client_secret);
-  record[names::column::kRedirectUri] = getSQLFormatStr(uri);
-  record[names::column::kScope] = getSQLFormatStr(scope);
-  record[names::column::kDisplayName] = getSQLFormatStr(display_name);
-  record[names::column::kId] = Json::nullValue;
-  result[names::column::kClientId] = client_id;
-  result[names::column::kClientSecret] = client_secret;
+  Json::Value record = newRow(fields);
+  record[column::kEnable] = enable;
+  result[column::kClientId] = client_id;
+  result[column::kClientSecret] = client_secret;
   if (!DBAdd(record)) return 0;
   auditLog.Add("Application registed[" + display_name + "]");  // spelt as in existing logs
   return 1;
@@ -86,15 +68,11 @@ int OAUTHDBClientInfo::Add(const std::string& client_secret, const std::string& 
 int OAUTHDBClientInfo::Edit(long long id, const std::string& redirect_uri, const std::string& scope,
                             const std::string& display_name) {
   OAUTH_ENTER();
-  if (!fit({{redirect_uri, kRedirectUriLimit},
-            {scope, kScopeLimit},
-            {display_name, kDisplayNameLimit}}))
-    return badParameters(*this);
-  Json::Value request = whereId(id);
-  Json::Value& modified = request[names::request::kModified];
-  modified[names::column::kRedirectUri] = getSQLFormatStr(redirect_uri);
-  modified[names::column::kScope] = getSQLFormatStr(scope);
-  modified[names::column::kDisplayName] = getSQLFormatStr(display_name);
+  const Fields fields = {quoted(column::kRedirectUri, redirect_uri, limit::kRedirectUri),
+                         quoted(column::kScope, scope, limit::kScope),
+                         quoted(column::kDisplayName, display_name, limit::kDisplayName)};
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
+  Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
 
@@ -118,8 +96,9 @@ int OAUTHDBClientInfo::Del(long long id) {
 
 int OAUTHDBClientInfo::Get(const std::string& client_id, Json::Value* out) {
   OAUTH_ENTER();
-  if (!fit({{client_id, kClientIdLimit}})) return badParameters(*this);
-  Json::Value request = where(names::column::kClientId, getSQLFormatStr(client_id));
+  const Field field = quoted(column::kClientId, client_id, limit::kClientId);
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
+  Json::Value request = where(field);
   return DBGet(request, out);
 }
 

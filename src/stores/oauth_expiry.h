@@ -1,32 +1,30 @@
-// Expiry of codes and tokens. Moments are Unix seconds in 64 bits, also where a long has 32.
+// Expiry of codes and tokens.
 
 #pragma once
 
 #include <json/value.h>
 
 #include <cstdint>
-#include <ctime>
 #include <string>
 
 #include "decimal_text.h"
 #include "oauth_names.h"
 #include "oauth_transaction.h"
+#include "unix_time.h"
 
 namespace ZEVOOAUTHSERVER {
 
-inline std::int64_t unixNow() { return static_cast<std::int64_t>(std::time(nullptr)); }
-
-// Still valid during the very second that the row's expiry names.
+// A row is still valid during the second that its expiry names.
 inline bool isExpired(const Json::Value& row, std::int64_t now) {
   return now > decimalValue(row[names::column::kExpiredTime]);
 }
 
-// Deletes every expired row of the store until stopped. A failed delete makes the result 0 and does
-// not stop the sweep. Where the rows cannot be read, unread is the result.
+// Deletes the store's expired rows until stop() is true. A failed delete makes the result 0 and
+// does not end the sweep. If the rows cannot be read, the result is ifUnread.
 template <class Store, class Stop>
-int deleteExpired(Store& store, std::int64_t now, int unread, Stop stop) {
+int deleteExpired(Store& store, std::int64_t now, int ifUnread, Stop stop) {
   Json::Value rows(Json::arrayValue);
-  if (!store.Get(&rows)) return unread;
+  if (!store.Get(&rows)) return ifUnread;
   int result = 1;
   for (const Json::Value& row : rows) {
     if (stop()) break;
@@ -35,18 +33,19 @@ int deleteExpired(Store& store, std::int64_t now, int unread, Stop stop) {
   return result;
 }
 
-// In one transaction, since a commit for every row would make the disk write four times for each.
-// Where the disk has no room for all of it, the sweep starts again and commits row by row, which
-// needs little room. A failed first read deletes nothing and counts as success.
+// Purge() of codes and tokens, in one transaction: with a commit for each row the disk would write
+// four times for each row. If the disk has no room for the whole, the sweep starts again and
+// commits row by row, which needs little room. A failed first read deletes nothing and counts as
+// success.
 template <class Store>
 int purgeExpired(Store& store) {
   const std::int64_t now = unixNow();
   {
-    Transaction transaction(store, &OAUTHDBBasic::DBCmd);
+    Transaction transaction = Transaction::onReadyStore(store);
     const int result = deleteExpired(store, now, 1, [&] { return transaction.isLost(); });
-    if (transaction.commit()) return result;
-    // Another process held the file for too long, or the caller's transaction is gone: what was
-    // deleted came back.
+    if (transaction.commitIfBegun()) return result;
+    // The deleted rows are back: another process held the file for too long, or SQLite ended the
+    // caller's transaction.
     if (!transaction.isLost() || transaction.isPart()) return 0;
   }
   return deleteExpired(store, now, 0, [] { return false; });

@@ -1,14 +1,17 @@
 #include "oauth_grantCode.h"
 
-#include <boost/asio/ip/address.hpp>
-
+#include "ip_address.h"
 #include "oauth_expiry.h"
+#include "oauth_failure.h"
 #include "oauth_names.h"
 #include "oauth_request.h"
 #include "oauth_syslog.h"
 
 namespace ZEVOOAUTHSERVER {
 namespace {
+
+namespace column = names::column;
+namespace limit = names::limit;
 
 // Log only, unlike the other stores: the error state stays as it was.
 int badParameters() {
@@ -33,53 +36,36 @@ int OAUTHDBGrantCode::Add(const std::string& username, const std::string& client
                           const std::string& expired_time, const std::string& state,
                           const std::string& ip, Json::Value& result) {
   OAUTH_ENTER();
-  boost::system::error_code ipError;
-  boost::asio::ip::make_address(ip, ipError);
-  if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kGrantCodeMax)))) {
-    SetErrCode(kErrTableFull);
-    SetErrMsg("GrantCode Table is full");
-    OAUTH_FAIL("GrantCode Table is full");
+  const Fields fields = {quoted(column::kUserName, username, limit::kUserName),
+                         quoted(column::kClientId, client_id, limit::kClientId),
+                         quoted(column::kScope, scope, limit::kScope),
+                         quoted(column::kCode, code, limit::kCode),
+                         asGiven(column::kExpiredTime, expired_time, limit::kExpiredTime),
+                         quoted(column::kState, state, limit::kState)};
+  const std::string badAddress = addressError(ip);
+  if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kGrantCodeMax))))
+    return OAUTH_REFUSE(kErrTableFull, "GrantCode Table is full");
+  if (!badAddress.empty()) {
+    OAUTH_FAIL("Bad IP address[%s]", badAddress.c_str());
     return 0;
   }
-  if (!ip.empty() && ipError) {
-    OAUTH_FAIL("Bad IP address[%s]", ipError.message().c_str());
-    return 0;
-  }
-  if (!fit({{username, kUserNameLimit},
-            {client_id, kClientIdLimit},
-            {scope, kScopeLimit},
-            {code, kCodeLimit},
-            {expired_time, kExpiredTimeLimit},
-            {state, kStateLimit}}))
-    return badParameters();
+  if (!fit(fields)) return badParameters();
 
-  Json::Value record;
-  record[names::column::kUserName] = getSQLFormatStr(username);
-  record[names::column::kClientId] = getSQLFormatStr(client_id);
-  record[names::column::kScope] = getSQLFormatStr(scope);
-  record[names::column::kCode] = getSQLFormatStr(code);
-  record[names::column::kExpiredTime] = expired_time;  // as given, unlike a token's
-  record[names::column::kState] = getSQLFormatStr(state);
-  record[names::column::kId] = Json::nullValue;
-  record[names::column::kIp] = ip;  // as given, unlike a token's
-  result[names::column::kCode] = code;
+  Json::Value record = newRow(fields);
+  record[column::kIp] = ip;  // as given, unlike a token's
+  result[column::kCode] = code;
   return DBAdd(record);
 }
 
-// Values as given, none quoted, and no entry trace: unlike the form with expired_time.
+// No entry trace, and values as given, unlike the form with expired_time.
 int OAUTHDBGrantCode::Edit(long long id, const std::string& username, const std::string& client_id,
                            const std::string& scope, const std::string& state) {
-  if (!fit({{username, kUserNameLimit},
-            {client_id, kClientIdLimit},
-            {scope, kScopeLimit},
-            {state, kStateLimit}}))
-    return badParameters();
-  Json::Value request = whereId(id);
-  Json::Value& modified = request[names::request::kModified];
-  modified[names::column::kUserName] = username;
-  modified[names::column::kClientId] = client_id;
-  modified[names::column::kScope] = scope;
-  modified[names::column::kState] = state;
+  const Fields fields = {asGiven(column::kUserName, username, limit::kUserName),
+                         asGiven(column::kClientId, client_id, limit::kClientId),
+                         asGiven(column::kScope, scope, limit::kScope),
+                         asGiven(column::kState, state, limit::kState)};
+  if (!fit(fields)) return badParameters();
+  Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
 
@@ -87,19 +73,13 @@ int OAUTHDBGrantCode::Edit(long long id, const std::string& username, const std:
                            const std::string& scope, const std::string& expired_time,
                            const std::string& state) {
   OAUTH_ENTER();
-  if (!fit({{username, kUserNameLimit},
-            {client_id, kClientIdLimit},
-            {scope, kScopeLimit},
-            {expired_time, kExpiredTimeLimit},
-            {state, kStateLimit}}))
-    return badParameters();
-  Json::Value request = whereId(id);
-  Json::Value& modified = request[names::request::kModified];
-  modified[names::column::kUserName] = getSQLFormatStr(username);
-  modified[names::column::kClientId] = getSQLFormatStr(client_id);
-  modified[names::column::kScope] = getSQLFormatStr(scope);
-  modified[names::column::kState] = getSQLFormatStr(state);
-  modified[names::column::kExpiredTime] = expired_time;
+  const Fields fields = {quoted(column::kUserName, username, limit::kUserName),
+                         quoted(column::kClientId, client_id, limit::kClientId),
+                         quoted(column::kScope, scope, limit::kScope),
+                         asGiven(column::kExpiredTime, expired_time, limit::kExpiredTime),
+                         quoted(column::kState, state, limit::kState)};
+  if (!fit(fields)) return badParameters();
+  Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
 
@@ -111,12 +91,9 @@ int OAUTHDBGrantCode::Del(long long id) {
 
 int OAUTHDBGrantCode::Get(const std::string& code, Json::Value* out) {
   OAUTH_ENTER();
-  if (!fit({{code, kCodeLimit}})) {
-    SetErrCode(kErrBadParameters);
-    SetErrMsg("Bad parameters");
-    return badParameters();
-  }
-  Json::Value request = where(names::column::kCode, code);  // as given, unlike other look-ups
+  const Field field = asGiven(column::kCode, code, limit::kCode);  // unlike other look-ups
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
+  Json::Value request = where(field);
   return DBGet(request, out);
 }
 
@@ -141,7 +118,7 @@ int OAUTHDBGrantCode::GetIndex(const std::string& code) {
 int OAUTHDBGrantCode::Revoke(long long id) {
   OAUTH_ENTER();
   Json::Value request = whereId(id);
-  request[names::request::kModified][names::column::kExpiredTime] = std::to_string(unixNow());
+  request[names::request::kModified][column::kExpiredTime] = std::to_string(unixNow());
   return DBEdit(request);
 }
 

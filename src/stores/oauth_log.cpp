@@ -16,8 +16,8 @@ int OAUTHDBLog::Add(const std::string& msg) {
   record[names::column::kId] = Json::nullValue;
   const bool added = DBAdd(record);
 
-  // By timestamp and not by id: what shares the second of the first row beyond the ceiling goes
-  // with it. Tried after a failed insert too.
+  // By timestamp and not by id: all rows that share the second of the first row beyond the ceiling
+  // are deleted too. This happens after a failed insert as well.
   const std::string table = GetTabName();
   const std::string trim = "DELETE FROM " + table + " WHERE timestamp IN (SELECT timestamp FROM " +
                            table + " ORDER BY timestamp DESC LIMIT -1 OFFSET " +

@@ -1,8 +1,10 @@
 #include "oauth_token.h"
 
-#include <boost/asio/ip/address.hpp>
+#include <utility>
 
+#include "ip_address.h"
 #include "oauth_expiry.h"
+#include "oauth_failure.h"
 #include "oauth_names.h"
 #include "oauth_request.h"
 #include "oauth_syslog.h"
@@ -10,12 +12,8 @@
 namespace ZEVOOAUTHSERVER {
 namespace {
 
-int badParameters(OAUTHDBToken& store) {
-  store.SetErrCode(kErrBadParameters);
-  store.SetErrMsg("Bad parameters");
-  OAUTH_FAIL("Bad parameters");
-  return 0;
-}
+namespace column = names::column;
+namespace limit = names::limit;
 
 }  // namespace
 
@@ -27,41 +25,27 @@ int OAUTHDBToken::Add(const std::string& username, const std::string& client_id,
                       const std::string& flow_type, const std::string& state, const std::string& ip,
                       Json::Value& result) {
   OAUTH_ENTER();
-  boost::system::error_code ipError;
-  boost::asio::ip::make_address(ip, ipError);
-  if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kTokenMax)))) {
-    SetErrCode(kErrTableFull);
-    SetErrMsg("Token Table is full");
-    OAUTH_FAIL("Token Table is full");
+  const Fields fields = {quoted(column::kUserName, username, limit::kUserName),
+                         quoted(column::kClientId, client_id, limit::kClientId),
+                         quoted(column::kScope, scope, limit::kScope),
+                         quoted(column::kRefreshToken, refresh_token, limit::kToken),
+                         quoted(column::kAccessToken, access_token, limit::kToken),
+                         quoted(column::kExpiredTime, expired_time, limit::kExpiredTime),
+                         quoted(column::kFlowType, flow_type, limit::kFlowType),
+                         quoted(column::kState, state, limit::kState)};
+  const std::string badAddress = addressError(ip);
+  if (!DBCheckRowMax(static_cast<unsigned long>(getTableRowMax(names::setting::kTokenMax))))
+    return OAUTH_REFUSE(kErrTableFull, "Token Table is full");
+  if (!badAddress.empty()) {
+    OAUTH_FAIL("Bad IP address[%s]", badAddress.c_str());
     return 0;
   }
-  if (!ip.empty() && ipError) {
-    OAUTH_FAIL("Bad IP address[%s]", ipError.message().c_str());
-    return 0;
-  }
-  if (!fit({{username, kUserNameLimit},
-            {client_id, kClientIdLimit},
-            {scope, kScopeLimit},
-            {refresh_token, kTokenLimit},
-            {access_token, kTokenLimit},
-            {expired_time, kExpiredTimeLimit},
-            {flow_type, kFlowTypeLimit},
-            {state, kStateLimit}}))
-    return badParameters(*this);
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
 
-  Json::Value record;
-  record[names::column::kUserName] = getSQLFormatStr(username);
-  record[names::column::kClientId] = getSQLFormatStr(client_id);
-  record[names::column::kScope] = getSQLFormatStr(scope);
-  record[names::column::kRefreshToken] = getSQLFormatStr(refresh_token);
-  record[names::column::kAccessToken] = getSQLFormatStr(access_token);
-  record[names::column::kExpiredTime] = getSQLFormatStr(expired_time);
-  record[names::column::kFlowType] = getSQLFormatStr(flow_type);
-  record[names::column::kState] = getSQLFormatStr(state);
-  record[names::column::kId] = Json::nullValue;
-  record[names::column::kIp] = getSQLFormatStr(ip);
-  result[names::column::kRefreshToken] = refresh_token;
-  result[names::column::kAccessToken] = access_token;
+  Json::Value record = newRow(fields);
+  record[column::kIp] = getSQLFormatStr(ip);
+  result[column::kRefreshToken] = refresh_token;
+  result[column::kAccessToken] = access_token;
   return DBAdd(record);
 }
 
@@ -76,24 +60,18 @@ int OAUTHDBToken::Add(const std::string& username, const std::string& client_id,
              flow_type, state, ip, result);
 }
 
-// Values as given, none quoted: unlike the form with expired_time.
+// Values as given, unlike the form with expired_time.
 int OAUTHDBToken::Edit(long long id, const std::string& username, const std::string& client_id,
                        const std::string& scope, const std::string& flow_type,
                        const std::string& state) {
   OAUTH_ENTER();
-  if (!fit({{username, kUserNameLimit},
-            {client_id, kClientIdLimit},
-            {scope, kScopeLimit},
-            {flow_type, kFlowTypeLimit},
-            {state, kStateLimit}}))
-    return badParameters(*this);
-  Json::Value request = whereId(id);
-  Json::Value& modified = request[names::request::kModified];
-  modified[names::column::kClientId] = client_id;
-  modified[names::column::kScope] = scope;
-  modified[names::column::kState] = state;
-  modified[names::column::kUserName] = username;
-  modified[names::column::kFlowType] = flow_type;
+  const Fields fields = {asGiven(column::kUserName, username, limit::kUserName),
+                         asGiven(column::kClientId, client_id, limit::kClientId),
+                         asGiven(column::kScope, scope, limit::kScope),
+                         asGiven(column::kFlowType, flow_type, limit::kFlowType),
+                         asGiven(column::kState, state, limit::kState)};
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
+  Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
 
@@ -101,21 +79,14 @@ int OAUTHDBToken::Edit(long long id, const std::string& username, const std::str
                        const std::string& scope, const std::string& expired_time,
                        const std::string& flow_type, const std::string& state) {
   OAUTH_ENTER();
-  if (!fit({{username, kUserNameLimit},
-            {client_id, kClientIdLimit},
-            {scope, kScopeLimit},
-            {expired_time, kExpiredTimeLimit},
-            {flow_type, kFlowTypeLimit},
-            {state, kStateLimit}}))
-    return badParameters(*this);
-  Json::Value request = whereId(id);
-  Json::Value& modified = request[names::request::kModified];
-  modified[names::column::kClientId] = getSQLFormatStr(client_id);
-  modified[names::column::kScope] = getSQLFormatStr(scope);
-  modified[names::column::kState] = getSQLFormatStr(state);
-  modified[names::column::kUserName] = getSQLFormatStr(username);
-  modified[names::column::kExpiredTime] = expired_time;
-  modified[names::column::kFlowType] = getSQLFormatStr(flow_type);
+  const Fields fields = {quoted(column::kUserName, username, limit::kUserName),
+                         quoted(column::kClientId, client_id, limit::kClientId),
+                         quoted(column::kScope, scope, limit::kScope),
+                         asGiven(column::kExpiredTime, expired_time, limit::kExpiredTime),
+                         quoted(column::kFlowType, flow_type, limit::kFlowType),
+                         quoted(column::kState, state, limit::kState)};
+  if (!fit(fields)) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
+  Json::Value request = changeOf(id, fields);
   return DBEdit(request);
 }
 
@@ -132,15 +103,17 @@ int OAUTHDBToken::Revoke(long long id) {
 
 int OAUTHDBToken::GetWithAccessToken(const std::string& access_token, Json::Value* out) {
   OAUTH_ENTER();
-  if (!fit({{access_token, kTokenLimit}})) return badParameters(*this);
-  Json::Value request = where(names::column::kAccessToken, getSQLFormatStr(access_token));
+  const Field field = quoted(column::kAccessToken, access_token, limit::kToken);
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
+  Json::Value request = where(field);
   return DBGet(request, out);
 }
 
 int OAUTHDBToken::GetWithRefreshToken(const std::string& refresh_token, Json::Value* out) {
   OAUTH_ENTER();
-  if (!fit({{refresh_token, kTokenLimit}})) return badParameters(*this);
-  Json::Value request = where(names::column::kRefreshToken, getSQLFormatStr(refresh_token));
+  const Field field = quoted(column::kRefreshToken, refresh_token, limit::kToken);
+  if (!fit({field})) return OAUTH_REFUSE(kErrBadParameters, "Bad parameters");
+  Json::Value request = where(field);
   return DBGet(request, out);
 }
 
@@ -176,15 +149,14 @@ int OAUTHDBToken::Verify(const std::string& access_token, Json::Value& result) {
     result[names::result::kErrCode] = GetErrCode();
     return 0;
   }
-  // No row reads as null and null as 0, so that an unknown token is reported as expired.
+  // No row reads as null, and null as 0: an unknown token is reported as expired.
   const Json::Value& row = std::as_const(rows)[0U];
   if (isExpired(row, now)) {
     result[names::result::kErrMsg] = "Access Token Expired";
     result[names::result::kErrCode] = kErrTokenExpired;
     return 0;
   }
-  for (const char* const key :
-       {names::column::kUserName, names::column::kScope, names::column::kState})
+  for (const char* const key : {column::kUserName, column::kScope, column::kState})
     result[key] = row[key];
   return 1;
 }

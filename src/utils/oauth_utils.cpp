@@ -9,6 +9,7 @@
 
 #include "host_libraries.h"
 #include "oauth_names.h"
+#include "oauth_settings.h"
 #include "oauth_syslog.h"
 #include "random_bytes.h"
 #include "settings_file.h"
@@ -21,22 +22,20 @@ constexpr int kUndecided = -1;
 thread_local int debugSwitch = kUndecided;  // then 0 or 1
 thread_local int levelMask = kUndecided;
 
-constexpr int kDefaultPeriod = 600;  // seconds
-constexpr int kDefaultRowMax = 1000, kLargestRowMax = 10000;
-
-// The integer stored under the key in the settings file, or 0. Whatever is wrong with the file
-// reads as 0, memory that runs out included.
-int readSettingInt(const std::string& key) try {
+// The value in force for the key. Where the file has no such integer, where anything is wrong with
+// the file, and where memory runs out, that is the fallback.
+int readSetting(const std::string& key, const SettingRange& range) try {
   Json::Value settings;
-  if (readSettingsFile(names::path::kSettings, settings) != SettingsState::kRead) return 0;
+  if (readSettingsFile(names::path::kSettings, settings) != SettingsState::kRead)
+    return range.fallback;
   const Json::Value& value = std::as_const(settings)[key];
-  return value.isInt() ? value.asInt() : 0;
+  return value.isInt() ? range.inForce(value.asInt()) : range.fallback;
 } catch (const std::exception&) {
-  return 0;
+  return range.fallback;
 }
 
-// What SQLite's formatter made, or the empty string if memory ran out.
-std::string taken(const SqliteText& formatted) {
+// The text that SQLite's formatter returned, or the empty string if memory ran out.
+std::string toString(const SqliteText& formatted) {
   if (formatted) return formatted.get();
   OAUTH_FAIL("Can't transfer to SQL format");
   return {};
@@ -50,20 +49,13 @@ bool isDebugEnabled() {
 }
 
 int getLogLevel() {
-  if (levelMask == kUndecided) levelMask = readSettingInt(names::setting::kLogLevel);
+  if (levelMask == kUndecided) levelMask = readSetting(names::setting::kLogLevel, kLevelMask);
   return levelMask;
 }
 
-int getExpiredPeriod(const std::string& key) {
-  const int period = readSettingInt(key);
-  return period > 0 ? period : kDefaultPeriod;
-}
+int getExpiredPeriod(const std::string& key) { return readSetting(key, kLifetime); }
 
-int getTableRowMax(const std::string& key) {
-  const int max = readSettingInt(key);
-  if (max < 1) return kDefaultRowMax;
-  return max > kLargestRowMax ? kLargestRowMax : max;
-}
+int getTableRowMax(const std::string& key) { return readSetting(key, kRowCeiling); }
 
 bool checkStrLen(const std::string& str, int minLen, int maxLen, bool allowEmpty) {
   OAUTH_DIAG(kArgument, "%s[%s]", __func__, str.c_str());
@@ -80,11 +72,11 @@ std::string getRemoteIP() {
 }
 
 std::string getSQLFormatStr(const std::string& value) {
-  return taken(SqliteText(sqlite3_mprintf("%q", value.c_str())));
+  return toString(SqliteText(sqlite3_mprintf("%q", value.c_str())));
 }
 
 std::string getSQLFormatLikeStr(const std::string& column, const std::string& value) {
-  return taken(SqliteText(sqlite3_mprintf("%s like '%%%q%%'", column.c_str(), value.c_str())));
+  return toString(SqliteText(sqlite3_mprintf("%s like '%%%q%%'", column.c_str(), value.c_str())));
 }
 
 std::string getRandomStr(unsigned int length) {

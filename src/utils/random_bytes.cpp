@@ -6,6 +6,8 @@
 
 #include <cerrno>
 
+#include "descriptor.h"
+
 namespace ZEVOOAUTHSERVER {
 namespace {
 
@@ -25,13 +27,10 @@ bool fill(unsigned char* buffer, std::size_t size, Source source) {
 }
 
 bool fillFromDevice(unsigned char* buffer, std::size_t size) {
-  const int device = open("/dev/urandom", O_RDONLY | O_CLOEXEC);
-  if (device < 0) return false;
-  const bool filled = fill(buffer, size, [device](unsigned char* rest, std::size_t missing) {
-    return read(device, rest, missing);
-  });
-  close(device);
-  return filled;
+  const Descriptor device(open("/dev/urandom", O_RDONLY | O_CLOEXEC));
+  return device.isOpen() && fill(buffer, size, [&device](unsigned char* rest, std::size_t missing) {
+           return read(device.value(), rest, missing);
+         });
 }
 
 }  // namespace

@@ -9,24 +9,12 @@
 #include <cstring>
 #include <exception>
 
+#include "descriptor.h"
+
 namespace ZEVOOAUTHSERVER {
 namespace {
 
-class Descriptor {
- public:
-  explicit Descriptor(int value) : value_(value) {}
-  ~Descriptor() {
-    if (value_ >= 0) close(value_);
-  }
-  Descriptor(const Descriptor&) = delete;
-  Descriptor& operator=(const Descriptor&) = delete;
-  int value() const { return value_; }
-
- private:
-  const int value_;
-};
-
-// Until the end, or one byte beyond what is allowed.
+// Reads to the end, or to the first byte beyond the largest size. False if a read fails.
 bool readUpToLimit(int file, std::string& text) {
   char block[4096];
   while (text.size() <= kLargestSettings) {
@@ -40,11 +28,11 @@ bool readUpToLimit(int file, std::string& text) {
   return true;
 }
 
-// kRead if the text is there, whatever it says. O_NONBLOCK: opening a pipe waits for its other end.
+// kRead if the text could be read; it need not be JSON. O_NONBLOCK: without it, opening a pipe
+// would wait for a writer.
 SettingsState load(const std::string& path, std::string& text) {
   const Descriptor file(open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
-  if (file.value() < 0)
-    return errno == ENOENT ? SettingsState::kAbsent : SettingsState::kUnreadable;
+  if (!file.isOpen()) return errno == ENOENT ? SettingsState::kAbsent : SettingsState::kUnreadable;
   struct stat status;
   if (fstat(file.value(), &status) != 0) return SettingsState::kUnreadable;
   if (!S_ISREG(status.st_mode)) return SettingsState::kNotAFile;
