@@ -1,18 +1,25 @@
-#include "content_checks.h"
+#include "checks/content_checks.h"
 
 #include <json/value.h>
 
 #include <map>
 
-#include "human_time.h"
+#include "decimal_text.h"
 #include "oauth_db_basic.h"
-#include "terminal.h"
+#include "oauth_names.h"
+#include "terminal/terminal.h"
 
 namespace oauthctl {
+
+namespace names = ZEVOOAUTHSERVER::names;
+namespace column = names::column;
+namespace table = names::table;
+
 namespace {
 
-// What SQLite keeps of the five statements that the library runs, byte for byte. Written out a
-// second time on purpose: texts taken from the library would agree with any change to it.
+// The texts that SQLite stores when the library makes its five tables, byte for byte. They are
+// written out a second time on purpose: texts taken from the library would agree with any change to
+// it.
 const std::map<std::string, std::string> kDefinitions = {
     {"oauth_meta",
      "CREATE TABLE oauth_meta"
@@ -78,7 +85,7 @@ void checkDefinitions(SqliteConnection& database, Findings& findings) {
                         "restore a backup, or run 'oauthctl status' to make an empty one"});
 }
 
-// An empty table goes unnoticed by the library, which only ever writes these rows.
+// The library writes these rows and never reads them, so it does not notice that one is missing.
 void checkVersions(SqliteConnection& database, Findings& findings) {
   if (database.rows("SELECT 1 FROM sqlite_master WHERE name = 'oauth_meta'").empty()) return;
   std::map<std::string, int> seen;
@@ -100,31 +107,38 @@ void checkVersions(SqliteConnection& database, Findings& findings) {
            "leave one row for each table in oauth_meta, with version " + version});
 }
 
-struct CipherColumn {
-  const char* table;
-  const char* column;
-};
-constexpr CipherColumn kCipherColumns[] = {{"oauth_clientInfo", "client_id"},
-                                           {"oauth_clientInfo", "client_secret"},
-                                           {"oauth_grantCode", "client_id"},
-                                           {"oauth_token", "client_id"}};
-
-// The library delivers a value that it cannot decrypt as it is stored.
-bool decrypts(const char* column, std::string stored) {
+// The library returns a value that it cannot decrypt as it is stored.
+bool canDecrypt(std::string column, std::string stored) {
   Json::Value rows(Json::arrayValue);
   char* value = stored.data();
-  std::string name = column;
-  char* columnName = name.data();
+  char* columnName = column.data();
   ZEVOOAUTHSERVER::OAUTHDBBasic::TabGetCallback(&rows, 1, &value, &columnName);
   return rows.size() == 1 && rows[0U][column].asString() != stored;
 }
 
-// A table that is missing or different has been found already.
+// False if the table is missing, too: checkStructure() finds that.
 bool hasColumn(SqliteConnection& database, const std::string& table, const std::string& column) {
   return !database
               .rows("SELECT 1 FROM pragma_table_info('" + table + "') WHERE name = '" + column +
                     "'")
               .empty();
+}
+
+void checkCipherColumn(SqliteConnection& database, const std::string& table,
+                       const std::string& column, CipherCount& count, Findings& findings) {
+  const std::vector<SqliteConnection::Row> rows =
+      database.rows("SELECT id, " + column + " FROM " + table + " ORDER BY id");
+  Progress progress("decrypting " + table + "." + column, rows.size());
+  std::vector<std::string> unreadable;
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    if (!canDecrypt(column, rows[i][1])) unreadable.push_back(rows[i][0]);
+    progress.update(i + 1);
+  }
+  count.values += static_cast<int>(rows.size());
+  count.unreadable += static_cast<int>(unreadable.size());
+  if (!unreadable.empty())
+    findings.push_back({column + " in " + table + " does not decrypt: " + rowList(unreadable),
+                        "bring back this machine's encryption key, or delete the rows"});
 }
 
 }  // namespace
@@ -147,38 +161,24 @@ Findings checkJournalMode(SqliteConnection& database) {
 
 Findings checkCiphers(SqliteConnection& database, CipherCount& count) {
   Findings findings;
-  for (const auto& [table, column] : kCipherColumns) {
-    if (!hasColumn(database, table, column)) continue;
-    const auto rows =
-        database.rows(std::string("SELECT id, ") + column + " FROM " + table + " ORDER BY id");
-    Progress progress(std::string("decrypting ") + table + "." + column, rows.size());
-    std::vector<std::string> unreadable;
-    for (std::size_t i = 0; i < rows.size(); ++i) {
-      if (!decrypts(column, rows[i][1])) unreadable.push_back(rows[i][0]);
-      progress.update(i + 1);
-    }
-    count.values += static_cast<int>(rows.size());
-    count.unreadable += static_cast<int>(unreadable.size());
-    if (!unreadable.empty())
-      findings.push_back(
-          {std::string(column) + " in " + table + " does not decrypt: " + rowList(unreadable),
-           "bring back this machine's encryption key, or delete the rows"});
-  }
+  for (const char* const name : {table::kClientInfo, table::kGrantCode, table::kToken})
+    for (const char* const encrypted : names::kEncryptedColumns)
+      if (hasColumn(database, name, encrypted))
+        checkCipherColumn(database, name, encrypted, count, findings);
   return findings;
 }
 
 Findings checkExpiries(SqliteConnection& database) {
   Findings findings;
-  for (const char* const table : {"oauth_grantCode", "oauth_token"}) {
-    if (!hasColumn(database, table, "expired_time")) continue;
+  for (const std::string name : {table::kGrantCode, table::kToken}) {
+    if (!hasColumn(database, name, column::kExpiredTime)) continue;
     std::vector<std::string> wrong;
     for (const SqliteConnection::Row& row :
-         database.rows(std::string("SELECT id, expired_time FROM ") + table + " ORDER BY id"))
-      if (!number(row[1])) wrong.push_back(row[0]);
+         database.rows("SELECT id, expired_time FROM " + name + " ORDER BY id"))
+      if (!ZEVOOAUTHSERVER::decimalNumber(row[1])) wrong.push_back(row[0]);
     if (!wrong.empty())
-      findings.push_back(
-          {std::string("expired_time in ") + table + " is no number: " + rowList(wrong),
-           "the rows count as expired long ago; purge or revoke them"});
+      findings.push_back({"expired_time in " + name + " is no number: " + rowList(wrong),
+                          "the rows count as expired long ago; purge or revoke them"});
   }
   return findings;
 }

@@ -1,25 +1,25 @@
-// Whether the contents of a database are what this system writes.
+// Checks that the contents of a database are what the library writes.
 
 #pragma once
 
-#include "finding.h"
-#include "sqlite_connection.h"
+#include "checks/finding.h"
+#include "database/sqlite_connection.h"
 
 namespace oauthctl {
 
-// Pages, table definitions, schema versions: what a file must have to be our database at all.
+// Checks pages, table definitions and schema versions: without them a file is not our database.
 Findings checkStructure(SqliteConnection& database);
 
-// The journal is the library's own kind.
+// Checks that the journal mode is the one that the library uses.
 Findings checkJournalMode(SqliteConnection& database);
 
 struct CipherCount {
   int values = 0, unreadable = 0;
 };
 
-// Every encrypted value decrypts.
+// Checks that every encrypted value decrypts, and adds to the count.
 Findings checkCiphers(SqliteConnection& database, CipherCount& count);
-// Every expiry is a number.
+// Checks that every expiry is a number.
 Findings checkExpiries(SqliteConnection& database);
 
 }  // namespace oauthctl

@@ -1,15 +1,21 @@
-#include "file_checks.h"
+#include "checks/file_checks.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <optional>
 
-#include "fixed_paths.h"
-#include "settings_report.h"
+#include "checks/settings_report.h"
+#include "database/fixed_paths.h"
+#include "descriptor.h"
+#include "oauth_names.h"
 
 namespace oauthctl {
+
+using ZEVOOAUTHSERVER::Descriptor;
+
 namespace {
 
 std::string octal(mode_t mode) {
@@ -18,7 +24,7 @@ std::string octal(mode_t mode) {
   return text;
 }
 
-std::optional<struct stat> look(const std::string& path) {
+std::optional<struct stat> lstatOf(const std::string& path) {
   struct stat status;
   if (lstat(path.c_str(), &status) != 0) return std::nullopt;
   return status;
@@ -32,34 +38,62 @@ void checkOwner(const std::string& path, const struct stat& status, const struct
                       "give both to the server's user by chown -h"});
 }
 
-// SQLite's locks for writing: one byte that says "pending", one that says "reserved", and the range
-// that readers share and a committing writer has alone.
-bool somebodyWrites(const std::string& database) {
-  const int descriptor = open(database.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
-  if (descriptor < 0) return false;
+Descriptor openToRead(const std::string& path) {
+  return Descriptor(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+}
+
+// Looks for the locks of an SQLite writer: a byte for "pending", a byte for "reserved", and the
+// range that readers share and that a writer holds alone while it commits.
+bool isBeingWritten(const std::string& database) {
+  const Descriptor file = openToRead(database);
+  if (!file.isOpen()) return false;
   struct flock lock = {};
   lock.l_type = F_RDLCK;
   lock.l_whence = SEEK_SET;
   lock.l_start = 0x40000000;
   lock.l_len = 2 + 510;
-  const bool locked = fcntl(descriptor, F_GETLK, &lock) == 0 && lock.l_type != F_UNLCK;
-  close(descriptor);
-  return locked;
+  return fcntl(file.value(), F_GETLK, &lock) == 0 && lock.l_type != F_UNLCK;
 }
 
-// SQLite takes an empty journal, or one whose first byte is 0, for no journal.
-bool holdsSomething(const std::string& journal) {
-  const int descriptor = open(journal.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
-  if (descriptor < 0) return true;  // not for us to read: suspect it
+// SQLite ignores a journal that is empty or whose first byte is 0.
+bool hasContent(const std::string& journal) {
+  const Descriptor file = openToRead(journal);
+  if (!file.isOpen()) return true;  // it cannot be read, so suspect it
   char first = 0;
-  const bool read = ::read(descriptor, &first, 1) == 1;
-  close(descriptor);
-  return read && first != 0;
+  return read(file.value(), &first, 1) == 1 && first != 0;
 }
 
-bool sameFile(const std::optional<struct stat>& a, const std::optional<struct stat>& b) {
+bool isUnchanged(const std::optional<struct stat>& a, const std::optional<struct stat>& b) {
   return a && b && a->st_ino == b->st_ino && a->st_mtim.tv_sec == b->st_mtim.tv_sec &&
          a->st_mtim.tv_nsec == b->st_mtim.tv_nsec;
+}
+
+// Owner and mode of the settings file.
+void checkSettingsFile(Findings& findings) {
+  const std::string path = fixed_paths::settings();
+  const std::optional<struct stat> file = lstatOf(path);
+  if (!file || !S_ISREG(file->st_mode)) return;
+  if ((file->st_mode & (S_IWGRP | S_IWOTH)) != 0)
+    findings.push_back(
+        {path + " has mode " + octal(file->st_mode) + ", others may write it", "chmod go-w"});
+  // The settings may also belong to root.
+  struct stat folder;
+  if (file->st_uid != 0 && stat(fixed_paths::folder().c_str(), &folder) == 0)
+    checkOwner(path, *file, folder, findings);
+}
+
+void checkSettingsContents(const SettingsReport& report, Findings& findings) {
+  const std::string path = fixed_paths::settings();
+  if (!report.problem.empty())
+    findings.push_back(
+        {path + " " + report.problem, "correct the file, or check as a user who may read it"});
+  for (const SettingInForce& setting : report.settings)
+    if (setting.isIgnored)
+      findings.push_back({"setting " + setting.name + ": " + setting.origin + " " +
+                              std::to_string(setting.value) + " applies",
+                          "correct it in " + path});
+  for (const std::string& name : report.unknownNames)
+    findings.push_back({"setting " + name + " is unknown", "correct its name in " + path});
 }
 
 }  // namespace
@@ -74,7 +108,7 @@ Findings checkFolder(const std::string& path) {
 Findings checkFiles() {
   Findings findings;
   const std::string path = fixed_paths::database(), directory = fixed_paths::folder();
-  const std::optional<struct stat> file = look(path);
+  const std::optional<struct stat> file = lstatOf(path);
   struct stat folder;
   if (!file || stat(directory.c_str(), &folder) != 0) return findings;
   if (file->st_nlink > 1)
@@ -90,10 +124,12 @@ Findings checkFiles() {
 
 Findings checkJournal() {
   const std::string path = fixed_paths::database(), journal = path + "-journal";
-  // A journal comes and goes with every change, under a lock: only one without a lock is left over.
-  if (somebodyWrites(path)) return {};
-  const std::optional<struct stat> found = look(journal);
-  if (!found || !holdsSomething(journal) || somebodyWrites(path) || !sameFile(found, look(journal)))
+  // Every change makes a journal and removes it, under a lock. A journal without a lock is left
+  // over.
+  if (isBeingWritten(path)) return {};
+  const std::optional<struct stat> found = lstatOf(journal);
+  if (!found || !hasContent(journal) || isBeingWritten(path) ||
+      !isUnchanged(found, lstatOf(journal)))
     return {};
   return {
       {journal + " is left over, of user " + std::to_string(found->st_uid) + " and mode " +
@@ -104,29 +140,14 @@ Findings checkJournal() {
 
 Findings checkSettings() {
   Findings findings;
-  const std::string path = fixed_paths::settings();
-  const std::optional<struct stat> file = look(path);
-  struct stat folder;
-  if (file && S_ISREG(file->st_mode) && (file->st_mode & (S_IWGRP | S_IWOTH)) != 0)
-    findings.push_back(
-        {path + " has mode " + octal(file->st_mode) + ", others may write it", "chmod go-w"});
-  // Root may keep the settings to himself.
-  if (file && S_ISREG(file->st_mode) && file->st_uid != 0 &&
-      stat(fixed_paths::folder().c_str(), &folder) == 0)
-    checkOwner(path, *file, folder, findings);
+  checkSettingsFile(findings);
   const SettingsReport report = readSettings();
-  if (!report.problem.empty())
-    findings.push_back(
-        {path + " " + report.problem, "correct the file, or check as a user who may read it"});
-  for (const Setting& setting : report.settings)
-    if (setting.isIgnored)
-      findings.push_back({"setting " + setting.name + ": " + setting.origin + " " +
-                              std::to_string(setting.value) + " applies",
-                          "correct it in " + path});
-  for (const std::string& name : report.unknownNames)
-    findings.push_back({"setting " + name + " is unknown", "correct its name in " + path});
-  const Setting& logLevel = report.settings.back();
-  if (logLevel.value != 0 && look(fixed_paths::debugMarker()))
+  checkSettingsContents(report, findings);
+  const bool logs =
+      std::any_of(report.settings.begin(), report.settings.end(), [](const auto& setting) {
+        return setting.name == ZEVOOAUTHSERVER::names::setting::kLogLevel && setting.value != 0;
+      });
+  if (logs && lstatOf(fixed_paths::debugMarker()))
     findings.push_back({"diagnostics are on and write secrets to the system log",
                         "set log_level to 0 and delete " + fixed_paths::debugMarker()});
   return findings;

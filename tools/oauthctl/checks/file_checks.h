@@ -1,24 +1,24 @@
-// Whether the files around the database are as they should be. Reads, and changes nothing.
+// Checks the files around the database, without changing them.
 
 #pragma once
 
 #include <string>
 
-#include "finding.h"
+#include "checks/finding.h"
 
 namespace oauthctl {
 
-// The mode of the database's folder, or of one above it.
+// Checks the mode of the database's folder, or of a folder above it.
 Findings checkFolder(const std::string& path);
 
-// Owner, mode and names of the database and its folder.
+// Checks owner, mode and names of the database and its folder.
 Findings checkFiles();
 
-// A journal that a program left behind when it died. Its rows are not all in the database, and the
-// next program to open it rolls them back, so that a check must not open it either.
+// Looks for a journal that a program left behind when it died. Not all of its changes are in the
+// database. The next program that opens the database rolls them back, so a check must not open it.
 Findings checkJournal();
 
-// The settings file, and the diagnostics that it and the marker file switch on.
+// Checks the settings file, and whether it and the marker file switch diagnostics on.
 Findings checkSettings();
 
 }  // namespace oauthctl

@@ -1,4 +1,4 @@
-// Something that a check found.
+// A problem that a check found, and what to do about it.
 
 #pragma once
 

@@ -1,4 +1,4 @@
-#include "settings_report.h"
+#include "checks/settings_report.h"
 
 #include <json/value.h>
 
@@ -6,35 +6,18 @@
 #include <cerrno>
 #include <cstring>
 
-#include "fixed_paths.h"
-#include "oauth_utils.h"
+#include "database/fixed_paths.h"
+#include "oauth_settings.h"
 #include "settings_file.h"
 
 namespace oauthctl {
 namespace {
 
+using ZEVOOAUTHSERVER::kSettings;
+using ZEVOOAUTHSERVER::Setting;
 using ZEVOOAUTHSERVER::SettingsState;
 
-constexpr int kLargestCeiling = 10000;
-
-enum class Range { kPositive, kCeiling, kAny };
-
-struct Known {
-  const char* name;
-  Range range;
-  int (*effective)(const std::string& name);
-};
-constexpr Known kKnown[] = {
-    {"client_info_max", Range::kCeiling, getTableRowMax},
-    {"grantcode_max", Range::kCeiling, getTableRowMax},
-    {"token_max", Range::kCeiling, getTableRowMax},
-    {"log_max", Range::kCeiling, getTableRowMax},
-    {"grantcode_expired", Range::kPositive, getExpiredPeriod},
-    {"token_expired", Range::kPositive, getExpiredPeriod},
-    {"log_level", Range::kAny, [](const std::string&) { return getLogLevel(); }},
-};
-
-// What is wrong with the file as a whole, "" if nothing is.
+// What is wrong with the whole file, "" if nothing is.
 std::string problemOf(SettingsState state) {
   switch (state) {
     case SettingsState::kRead:
@@ -56,14 +39,29 @@ std::string problemOf(SettingsState state) {
   return {};
 }
 
-std::string origin(const Known& known, const Json::Value& file) {
-  if (!file.isObject() || !file.isMember(known.name)) return "default";
-  const Json::Value& given = file[known.name];
-  if (!given.isInt()) return "wrong type in the file, default";
-  if (known.range != Range::kAny && given.asInt() < 1) return "below 1 in the file, default";
-  if (known.range == Range::kCeiling && given.asInt() > kLargestCeiling)
-    return "clamped from " + given.asString();
+// The value in the file, null if there is none.
+const Json::Value& valueInFile(const Setting& setting, const Json::Value& file) {
+  return file.isObject() ? file[setting.name] : Json::Value::nullSingleton();
+}
+
+std::string originOf(const Setting& setting, const Json::Value& file) {
+  if (!file.isObject() || !file.isMember(setting.name)) return "default";
+  const Json::Value& value = valueInFile(setting, file);
+  if (!value.isInt()) return "wrong type in the file, default";
+  if (value.asInt() < setting.range.smallest)
+    return "below " + std::to_string(setting.range.smallest) + " in the file, default";
+  if (value.asInt() > setting.range.largest) return "clamped from " + value.asString();
   return "file";
+}
+
+int valueOf(const Setting& setting, const Json::Value& file) {
+  const Json::Value& value = valueInFile(setting, file);
+  return value.isInt() ? setting.range.inForce(value.asInt()) : setting.range.fallback;
+}
+
+bool isSetting(const std::string& name) {
+  return std::any_of(std::begin(kSettings), std::end(kSettings),
+                     [&](const Setting& setting) { return name == setting.name; });
 }
 
 }  // namespace
@@ -74,16 +72,14 @@ SettingsReport readSettings() {
   const SettingsState state = ZEVOOAUTHSERVER::readSettingsFile(fixed_paths::settings(), file);
   report.problem = problemOf(state);
   if (state != SettingsState::kRead) file = Json::Value();
-  for (const Known& known : kKnown) {
-    const std::string from = origin(known, file);
+  for (const Setting& setting : kSettings) {
+    const std::string origin = originOf(setting, file);
     report.settings.push_back(
-        {known.name, known.effective(known.name), from, from != "file" && from != "default"});
+        {setting.name, valueOf(setting, file), origin, origin != "file" && origin != "default"});
   }
   if (!file.isObject()) return report;
   for (const std::string& name : file.getMemberNames())
-    if (std::none_of(std::begin(kKnown), std::end(kKnown),
-                     [&](const Known& known) { return name == known.name; }))
-      report.unknownNames.push_back(name);
+    if (!isSetting(name)) report.unknownNames.push_back(name);
   return report;
 }
 

@@ -1,4 +1,4 @@
-// The settings in force, and where each comes from.
+// The settings in force, and where each value comes from.
 
 #pragma once
 
@@ -7,16 +7,16 @@
 
 namespace oauthctl {
 
-struct Setting {
+struct SettingInForce {
   std::string name;
-  int value;  // as the library has it
+  int value;  // the value that the library uses
   std::string origin;
-  bool isIgnored;  // the file names it in vain
+  bool isIgnored;  // set in the file, but invalid
 };
 
 struct SettingsReport {
-  std::vector<Setting> settings;
-  // What is wrong with the file as a whole; "" if nothing is, or if there is no file.
+  std::vector<SettingInForce> settings;
+  // What is wrong with the whole file; "" if nothing is wrong or there is no file.
   std::string problem;
   std::vector<std::string> unknownNames;
 };

@@ -1,7 +1,7 @@
 #include <set>
 
-#include "command_table.h"
-#include "documents.h"
+#include "command_line/command_table.h"
+#include "command_line/documents.h"
 
 namespace oauthctl {
 namespace {
@@ -18,8 +18,8 @@ bool takesFile(const Command& command) {
   return !command.operands.empty() && command.operands.front().isFile;
 }
 
-// The words that follow this one: "list show add ..." after "client".
-std::string followers(const std::string& word) {
+// The words that can follow this one: "list show add ..." after "client".
+std::string nextWords(const std::string& word) {
   std::string words;
   for (const Command& command : commandTable()) {
     const std::string path = command.path;
@@ -40,7 +40,7 @@ std::string joined(const std::set<std::string>& words, const std::string& separa
   return text;
 }
 
-// Every beginning of a command, as the loop over the words meets it.
+// Every command and every first word of one, in the form that the loop in the script compares.
 std::string knownPaths() {
   std::set<std::string> paths;
   for (const std::string& word : firstWords()) paths.insert("' " + word + "'");
@@ -62,9 +62,9 @@ std::string wordsByPath() {
   std::string cases = "    '') words='" + joined(firstWords(), " ") + " --help --version' ;;\n";
   for (const Group& group : commandGroups())
     cases +=
-        std::string("    '") + group.word + "') words='" + followers(group.word) + "--help' ;;\n";
+        std::string("    '") + group.word + "') words='" + nextWords(group.word) + "--help' ;;\n";
   for (const Command& command : commandTable())
-    cases += std::string("    '") + command.path + "') words='" + followers(command.path) +
+    cases += std::string("    '") + command.path + "') words='" + nextWords(command.path) +
              optionsOf(command) + "'" + (takesFile(command) ? " files=yes" : "") + " ;;\n";
   return cases;
 }

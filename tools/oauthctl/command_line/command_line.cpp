@@ -1,29 +1,29 @@
-#include "command_line.h"
+#include "command_line/command_line.h"
 
 #include <CLI/CLI.hpp>
 #include <map>
 #include <sstream>
 
-#include "exit_code.h"
-#include "help_text.h"
+#include "command_line/help_text.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
 namespace {
 
 using Parsers = std::map<const CLI::App*, const Command*>;
 
-// The parser of one command; those of the words before its last one are made on the way.
+// The parser of one command. Also adds the parsers of the words before its last one.
 CLI::App* parserOf(CLI::App& program, const Command& command) {
   CLI::App* parser = &program;
   std::istringstream words(command.path);
   for (std::string word; words >> word;) {
-    const auto made = parser->get_subcommands([&](CLI::App* p) { return p->get_name() == word; });
-    parser = made.empty() ? parser->add_subcommand(word) : made.front();
+    const auto known = parser->get_subcommands([&](CLI::App* p) { return p->get_name() == word; });
+    parser = known.empty() ? parser->add_subcommand(word) : known.front();
   }
   return parser;
 }
 
-void fill(CLI::App& parser, const Command& command) {
+void addArguments(CLI::App& parser, const Command& command) {
   for (const Operand& operand : command.operands) parser.add_option(operand.name)->required();
   for (const Option& option : command.options) {
     if (option.value == nullptr)
@@ -35,9 +35,10 @@ void fill(CLI::App& parser, const Command& command) {
   }
 }
 
-CLI::App* deepest(CLI::App& parser) {
+// The parser of the last word that names a command.
+CLI::App* chosenParser(CLI::App& parser) {
   const std::vector<CLI::App*> chosen = parser.get_subcommands();
-  return chosen.empty() ? &parser : deepest(*chosen.front());
+  return chosen.empty() ? &parser : chosenParser(*chosen.front());
 }
 
 // "oauthctl token list"
@@ -46,7 +47,7 @@ std::string fullName(const CLI::App& parser) {
   return parent == nullptr ? "oauthctl" : fullName(*parent) + " " + parser.get_name();
 }
 
-[[noreturn]] void misused(const CLI::App& parser, const std::string& problem) {
+[[noreturn]] void throwUsage(const CLI::App& parser, const std::string& problem) {
   throw Failure(ExitCode::kUsage, problem + " (see '" + fullName(parser) + " --help')");
 }
 
@@ -58,28 +59,28 @@ void requireOneOf(const CLI::App& parser, const Command& command, const Invocati
     names += (names.empty() ? "" : ", ") + std::string(option.name);
     given += invocation.has(option.name) ? 1 : 0;
   }
-  if (!names.empty() && given != 1) misused(parser, "give exactly one of " + names);
+  if (!names.empty() && given != 1) throwUsage(parser, "give exactly one of " + names);
 }
 
 Invocation valuesOf(const CLI::App& parser, const Command& command) {
   std::map<std::string, std::string> values;
-  const auto take = [&](const char* name) {
+  const auto addValue = [&](const char* name) {
     const CLI::Option* const option = parser.get_option(name);
     if (option->count() > 0) values[name] = option->results().back();
   };
-  for (const Operand& operand : command.operands) take(operand.name);
-  for (const Option& option : command.options) take(option.name);
+  for (const Operand& operand : command.operands) addValue(operand.name);
+  for (const Option& option : command.options) addValue(option.name);
   return Invocation(values);
 }
 
 std::string helpFor(CLI::App& program, const Parsers& parsers) {
-  const CLI::App* const parser = deepest(program);
+  const CLI::App* const parser = chosenParser(program);
   if (parser == &program) return programHelp();
   const auto command = parsers.find(parser);
   return command == parsers.end() ? groupHelp(parser->get_name()) : commandHelp(*command->second);
 }
 
-// CLI11 explains some mistakes in several lines.
+// The parser explains some mistakes in several lines.
 std::string firstLine(const std::string& text) { return text.substr(0, text.find('\n')); }
 
 }  // namespace
@@ -91,7 +92,7 @@ std::optional<Request> parseCommandLine(int argc, char** argv, std::string& outp
   Parsers parsers;
   for (const Command& command : commandTable()) {
     CLI::App* const parser = parserOf(program, command);
-    fill(*parser, command);
+    addArguments(*parser, command);
     parsers[parser] = &command;
   }
   try {
@@ -104,11 +105,11 @@ std::optional<Request> parseCommandLine(int argc, char** argv, std::string& outp
     output += '\n';
     return std::nullopt;
   } catch (const CLI::ParseError& error) {
-    misused(*deepest(program), firstLine(error.what()));
+    throwUsage(*chosenParser(program), firstLine(error.what()));
   }
-  CLI::App* const parser = deepest(program);
+  CLI::App* const parser = chosenParser(program);
   const auto command = parsers.find(parser);
-  if (command == parsers.end()) misused(*parser, "a command is missing");
+  if (command == parsers.end()) throwUsage(*parser, "a command is missing");
   Request request{command->second, valuesOf(*parser, *command->second)};
   requireOneOf(*parser, *command->second, request.invocation);
   return request;

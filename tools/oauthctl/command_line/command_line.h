@@ -1,12 +1,12 @@
-// From the arguments of main() to a command and what was asked of it.
+// Finds the command, and the values of its operands and options, in the arguments of main().
 
 #pragma once
 
 #include <optional>
 #include <string>
 
-#include "command_table.h"
-#include "invocation.h"
+#include "command_line/command_table.h"
+#include "terminal/invocation.h"
 
 namespace oauthctl {
 
@@ -15,8 +15,8 @@ struct Request {
   Invocation invocation;
 };
 
-// Nothing where help or the version was asked for, which then stands in output. Throws a Failure
-// for arguments that make no sense.
+// If the operator asks for help or the version, returns nothing and sets output to that text.
+// Throws a Failure if the arguments are wrong.
 std::optional<Request> parseCommandLine(int argc, char** argv, std::string& output);
 
 }  // namespace oauthctl

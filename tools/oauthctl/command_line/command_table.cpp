@@ -1,12 +1,24 @@
-#include "command_table.h"
+#include "command_line/command_table.h"
 
-#include "commands.h"
+#include "commands/commands.h"
+#include "database/grants.h"
+#include "database/image.h"
 
 namespace oauthctl {
+
+namespace limit = names::limit;
+
 namespace {
 
-const Operand kClient = {
-    "CLIENT", "the client's number in 'oauthctl client list', or its identifier of 64 characters"};
+// "64", or "1 to 64"
+std::string rangeText(const names::Limit& range) {
+  const std::string largest = std::to_string(range.max);
+  return range.min == range.max ? largest : std::to_string(range.min) + " to " + largest;
+}
+
+const Operand kClient = {"CLIENT",
+                         "the client's number in 'oauthctl client list', or its identifier of " +
+                             rangeText(limit::kClientId) + " characters"};
 
 const Option kJson = {"--json", nullptr, "a JSON document instead of a table"};
 const Option kYes = {"--yes", nullptr, "do not ask; needed where nobody can answer"};
@@ -19,12 +31,19 @@ Option byUser(Need need) { return {"--user", "NAME", "those of this user", need}
 Option byClient(Need need) {
   return {"--client", "CLIENT", "those of this client, by its number or identifier", need};
 }
-Option nameOf(Need need) { return {"--name", "TEXT", "name shown to people, 1 to 64 bytes", need}; }
-Option redirectOf(Need need) {
+Option nameOption(Need need) {
+  return {"--name", "TEXT", "name shown to people, " + rangeText(limit::kDisplayName) + " bytes",
+          need};
+}
+Option redirectOption(Need need) {
   return {"--redirect-uri", "URI", "where codes are sent; kept without https:// or http://", need};
 }
-Option scopeOf(Need need) {
+Option scopeOption(Need need) {
   return {"--scope", "TEXT", "what it may ask for, separated by blanks", need};
+}
+Option graceOption(const std::string& duration) {
+  return {"--grace", "DURATION",
+          "spare what expired within 90s, 45m, 12h, 30d, 2w (default " + duration + ")"};
 }
 
 const std::vector<Command> kOverview = {
@@ -32,11 +51,12 @@ const std::vector<Command> kOverview = {
      "Show how full the tables are, the settings in force and the file",
      {},
      {kJson},
-     "Ends with 1 when clients, codes or tokens fill 80 % of their ceiling or more: at 100 % "
-     "nothing more is issued. Expired rows count until they are purged. The audit log trims "
-     "itself at its ceiling and is never a reason to warn.\n"
-     "WHERE FROM tells for each setting whether it comes from the settings file, is a default, "
-     "was clamped to its range, or has a wrong type in the file and is therefore ignored.",
+     "Ends with 1 when clients, codes or tokens fill " + std::to_string(kWarnFrom) +
+         " % of their ceiling or more: at 100 % "
+         "nothing more is issued. Expired rows count until they are purged. The audit log trims "
+         "itself at its ceiling and is never a reason to warn.\n"
+         "WHERE FROM tells for each setting whether it comes from the settings file, is a default, "
+         "was clamped to its range, or has a wrong type in the file and is therefore ignored.",
      {{"oauthctl status", "look at everything"},
       {"oauthctl status --json | jq '.tables[] | {table, used_percent}'", "feed a monitor"}},
      showStatus},
@@ -70,9 +90,12 @@ const std::vector<Command> kOverview = {
      "Checks the file first and refuses one that is damaged, foreign, or encrypted for another "
      "machine. What was there is kept beside the database, in a file whose name is told. The "
      "server may run: it sees either the old contents or the new ones. FILE must be a regular file "
-     "of at most 512 MiB, without a journal beside it, and not a link.\n"
-     "Codes and refresh tokens spent since the backup become valid again. Use --without-tokens, "
-     "which makes every user log in anew, unless you must keep the logins.",
+     "of at most " +
+         std::to_string(kLargestDatabase / 1024 / 1024) +
+         " MiB, without a journal beside it, and not a link.\n"
+         "Codes and refresh tokens spent since the backup become valid again. Use "
+         "--without-tokens, "
+         "which makes every user log in anew, unless you must keep the logins.",
      {{"oauthctl restore /var/backups/oauth-2026-11-21.db", "ask, then put it back"},
       {"oauthctl restore --without-tokens --yes clients.db", "in a script, clients only"}},
      restore},
@@ -96,11 +119,13 @@ const std::vector<Command> kClientCommands = {
     {"client add",
      "Register a client and print its identifier and secret",
      {},
-     {nameOf(Need::kRequired),
-      redirectOf(Need::kRequired),
-      scopeOf(Need::kRequired),
+     {nameOption(Need::kRequired),
+      redirectOption(Need::kRequired),
+      scopeOption(Need::kRequired),
       {"--disabled", nullptr, "register it disabled"},
-      {"--secret-from-stdin", nullptr, "a secret of 64 bytes from standard input, not a new one"},
+      {"--secret-from-stdin", nullptr,
+       "a secret of " + rangeText(limit::kClientSecret) +
+           " bytes from standard input, not a new one"},
       kJson},
      "Hand identifier and secret to the client's developer now: other commands mask the secret. "
      "Makes the database if there is none yet.",
@@ -111,7 +136,7 @@ const std::vector<Command> kClientCommands = {
     {"client edit",
      "Change a client's name, redirect URI or scope",
      {kClient},
-     {nameOf(Need::kOptional), redirectOf(Need::kOptional), scopeOf(Need::kOptional)},
+     {nameOption(Need::kOptional), redirectOption(Need::kOptional), scopeOption(Need::kOptional)},
      "What is not given stays as it is. Codes and tokens issued before keep their old scope.",
      {{"oauthctl client edit 3 --scope read", "new logins may only read"}},
      editClient},
@@ -158,9 +183,7 @@ const std::vector<Command> kCodeCommands = {
     {"code purge",
      "Delete expired authorization codes",
      {},
-     {{"--grace", "DURATION", "spare what expired within 90s, 45m, 12h, 30d, 2w (default 0)"},
-      kDryRun,
-      kYes},
+     {graceOption(kCodeGrace), kDryRun, kYes},
      "Nothing that could still be used is lost.",
      {{"oauthctl code purge --yes", "every hour, from cron"}},
      purgeCodes},
@@ -204,9 +227,7 @@ const std::vector<Command> kTokenCommands = {
     {"token purge",
      "Delete tokens that expired long ago",
      {},
-     {{"--grace", "DURATION", "spare what expired within 90s, 45m, 12h, 30d, 2w (default 30d)"},
-      kDryRun,
-      kYes},
+     {graceOption(kTokenGrace), kDryRun, kYes},
      "An expired access token is still a login if the client refreshes it: the refresh token "
      "goes with the row. Hence the 30 days, for which a login may rest unused. Where refresh "
      "tokens are not in use, --grace 0 deletes everything that has expired.",

@@ -1,31 +1,31 @@
-// The one table of commands. The parser is filled from it; the help, the bash completion and the
-// manual page are written from it.
+// The table of commands. The parser, the help, the bash completion and the manual page are all made
+// from it.
 
 #pragma once
 
 #include <string>
 #include <vector>
 
-#include "invocation.h"
+#include "terminal/invocation.h"
 
 namespace oauthctl {
 
 struct Operand {
   const char* name;  // "CLIENT"
-  const char* help;
+  std::string help;
   bool isFile = false;
 };
 
 enum class Need {
   kOptional,
   kRequired,
-  kOneOf  // exactly one of the options that say so
+  kOneOf  // exactly one of the options with this need
 };
 
 struct Option {
   const char* name;   // "--user"
   const char* value;  // "NAME", or nullptr for a switch
-  const char* help;
+  std::string help;
   Need need = Need::kOptional;
 };
 
@@ -39,13 +39,13 @@ struct Command {
   const char* summary;  // one line, no full stop
   std::vector<Operand> operands;
   std::vector<Option> options;
-  const char* details;  // paragraphs, one line each
+  std::string details;  // paragraphs, one line each
   std::vector<Example> examples;
-  // Throws a Failure for every other end than a good one.
+  // Throws a Failure unless all is well.
   void (*run)(const Invocation& invocation);
 };
 
-// Words that begin commands of several words.
+// The first word of several commands.
 struct Group {
   const char* word;
   const char* summary;

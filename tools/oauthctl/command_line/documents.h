@@ -1,4 +1,4 @@
-// Files that are made from the table of commands, and kept beside it.
+// The files that oauthctl_documents makes from the table of commands.
 
 #pragma once
 
@@ -6,7 +6,10 @@
 
 namespace oauthctl {
 
-std::string bashCompletion();  // oauthctl.bash
-std::string manualPage();      // oauthctl.1
+// The contents of oauthctl.bash.
+std::string bashCompletion();
+
+// The contents of oauthctl.1, from those of oauthctl.1.in.
+std::string manualPage(std::string pageTemplate);
 
 }  // namespace oauthctl

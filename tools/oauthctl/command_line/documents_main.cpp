@@ -1,17 +1,25 @@
-// Prints one of the files that are made from the table of commands:
+// Prints a file that is made from the table of commands. In the folder tools/oauthctl:
 //
-//   oauthctl_documents completion > tools/oauthctl/oauthctl.bash
-//   oauthctl_documents manual > tools/oauthctl/oauthctl.1
+//   oauthctl_documents completion > oauthctl.bash
+//   oauthctl_documents manual < oauthctl.1.in > oauthctl.1
 
 #include <cstdio>
+#include <iostream>
+#include <iterator>
 #include <string>
 
-#include "documents.h"
+#include "command_line/documents.h"
 
 int main(int argc, char** argv) {
   const std::string wanted = argc == 2 ? argv[1] : "";
-  if (wanted == "completion") return std::fputs(oauthctl::bashCompletion().c_str(), stdout) < 0;
-  if (wanted == "manual") return std::fputs(oauthctl::manualPage().c_str(), stdout) < 0;
-  std::fputs("usage: oauthctl_documents completion|manual\n", stderr);
-  return 2;
+  if (wanted == "completion") {
+    std::cout << oauthctl::bashCompletion();
+  } else if (wanted == "manual") {
+    const std::istreambuf_iterator<char> begin(std::cin), end;
+    std::cout << oauthctl::manualPage({begin, end});
+  } else {
+    std::cerr << "usage: oauthctl_documents completion|manual\n";
+    return 2;
+  }
+  return std::cout.flush() ? 0 : 1;
 }

@@ -1,4 +1,4 @@
-#include "help_text.h"
+#include "command_line/help_text.h"
 
 #include <algorithm>
 #include <sstream>
@@ -9,19 +9,13 @@ namespace {
 
 using Entries = std::vector<std::pair<std::string, std::string>>;
 
-std::string spelling(const Option& option) {
-  std::string text = option.name;
-  if (option.value != nullptr) text.append(" ").append(option.value);
-  return text;
-}
-
 std::string aligned(const Entries& entries) {
   std::size_t width = 0;
   for (const auto& entry : entries) width = std::max(width, entry.first.size());
   std::string text;
   for (const auto& [name, meaning] : entries)
-    text +=
-        "  " + name + std::string(width - name.size() + 2, ' ') + filled(meaning, width + 4) + "\n";
+    text += "  " + name + std::string(width - name.size() + 2, ' ') + wrapped(meaning, width + 4) +
+            "\n";
   return text;
 }
 
@@ -38,7 +32,7 @@ Entries commandsOf(const std::string& word) {
 
 }  // namespace
 
-std::string filled(const std::string& text, std::size_t indent, std::size_t width) {
+std::string wrapped(const std::string& text, std::size_t indent, std::size_t width) {
   std::istringstream words(text);
   std::string result, word;
   std::size_t column = indent;
@@ -56,6 +50,12 @@ std::string filled(const std::string& text, std::size_t indent, std::size_t widt
   return result;
 }
 
+std::string spelling(const Option& option) {
+  std::string text = option.name;
+  if (option.value != nullptr) text.append(" ").append(option.value);
+  return text;
+}
+
 std::string usageLine(const Command& command) {
   std::string line = std::string("oauthctl ") + command.path;
   for (const Operand& operand : command.operands) line.append(" ").append(operand.name);
@@ -71,7 +71,8 @@ std::string usageLine(const Command& command) {
 }
 
 std::string commandHelp(const Command& command) {
-  std::string text = "Usage: " + filled(usageLine(command), 7) + "\n\n" + command.summary + ".\n\n";
+  std::string text =
+      "Usage: " + wrapped(usageLine(command), 7) + "\n\n" + command.summary + ".\n\n";
   Entries entries;
   for (const Operand& operand : command.operands) entries.emplace_back(operand.name, operand.help);
   for (const Option& option : command.options) entries.emplace_back(spelling(option), option.help);
@@ -79,7 +80,7 @@ std::string commandHelp(const Command& command) {
   text += aligned(entries);
   std::istringstream details(command.details);
   for (std::string paragraph; std::getline(details, paragraph);)
-    text += "\n" + filled(paragraph, 0) + "\n";
+    text += "\n" + wrapped(paragraph, 0) + "\n";
   text += command.examples.size() == 1 ? "\nExample:\n" : "\nExamples:\n";
   for (const Example& example : command.examples)
     text += std::string("  ") + example.line + "\n      " + example.meaning + "\n";

@@ -1,12 +1,15 @@
-// The help, as it is written from the table of commands.
+// The help, made from the table of commands.
 
 #pragma once
 
 #include <string>
 
-#include "command_table.h"
+#include "command_line/command_table.h"
 
 namespace oauthctl {
+
+// "--user NAME"
+std::string spelling(const Option& option);
 
 // "oauthctl token list [--user NAME] ..."
 std::string usageLine(const Command& command);
@@ -15,7 +18,8 @@ std::string programHelp();
 std::string groupHelp(const std::string& word);
 std::string commandHelp(const Command& command);
 
-// Lines of at most this width, each but the first after this many blanks. Words are not broken.
-std::string filled(const std::string& text, std::size_t indent, std::size_t width = 80);
+// Breaks the text into lines of at most this width. Every line but the first is indented. Words are
+// not broken.
+std::string wrapped(const std::string& text, std::size_t indent, std::size_t width = 80);
 
 }  // namespace oauthctl

@@ -1,26 +1,27 @@
 #include <utility>
 
-#include "backup_file.h"
-#include "commands.h"
-#include "database_access.h"
-#include "database_folder.h"
-#include "database_image.h"
-#include "exit_code.h"
-#include "fixed_paths.h"
-#include "live_replacement.h"
-#include "new_file.h"
-#include "terminal.h"
+#include "checks/content_checks.h"
+#include "commands/commands.h"
+#include "database/access.h"
+#include "database/backup_file.h"
+#include "database/fixed_paths.h"
+#include "database/folder.h"
+#include "database/image.h"
+#include "database/live_replacement.h"
+#include "database/new_file.h"
+#include "terminal/exit_code.h"
+#include "terminal/terminal.h"
 
 namespace oauthctl {
 namespace {
 
-std::string operand(const Invocation& invocation) {
+std::string fileOperand(const Invocation& invocation) {
   std::string path = invocation.value("FILE");
   if (path.empty()) throw Failure(ExitCode::kUsage, "FILE is empty");
   return path;
 }
 
-std::string firstOf(const Findings& findings) {
+std::string summaryOf(const Findings& findings) {
   const std::size_t others = findings.size() - 1;
   return findings.front().problem +
          (others == 0 ? "" : " (and " + std::to_string(others) + " more)");
@@ -42,27 +43,29 @@ DatabaseImage readLive() try {
 void requireSound(const NewFile& file) {
   Findings problems;
   try {
-    problems = DatabaseImage::ofBytes(file.contents()).problems();
+    DatabaseImage copy = DatabaseImage::ofBytes(file.contents());
+    problems = checkStructure(copy.connection());
   } catch (const SqliteError& error) {
     problems = {{error.what(), ""}};
   }
   if (!problems.empty())
     throw Failure(ExitCode::kAttention,
-                  "the copy is not sound, no backup was made: " + firstOf(problems));
+                  "the copy is not sound, no backup was made: " + summaryOf(problems));
 }
 
-void refuseTheDatabaseItself(const BackupFile& backup, const std::string& path) {
-  const auto live = DatabaseFolder::enter().look(nameOf(fixed_paths::database()));
+void requireAnotherFile(const BackupFile& backup, const std::string& path) {
+  const auto live = DatabaseFolder::enter().lstatOf(nameOf(fixed_paths::database()));
   if (live && live->st_dev == backup.status.st_dev && live->st_ino == backup.status.st_ino)
     throw Failure(ExitCode::kUsage, path + " is the database itself");
 }
 
-// The image of the backup, if it is one of this machine.
+// The image of the backup. Throws unless the backup is sound and of this machine.
 DatabaseImage imageOf(BackupFile backup, const std::string& path) try {
   DatabaseImage image = DatabaseImage::ofBytes(std::move(backup.bytes));
-  const Findings problems = image.problems();
-  if (!problems.empty()) refuseBackup(path, firstOf(problems));
-  const CipherCount ciphers = image.countCiphers();
+  const Findings problems = checkStructure(image.connection());
+  if (!problems.empty()) refuseBackup(path, summaryOf(problems));
+  CipherCount ciphers;
+  checkCiphers(image.connection(), ciphers);
   if (ciphers.values > 0 && ciphers.unreadable == ciphers.values)
     refuseBackup(path, "it was encrypted on another machine, or this one has lost its key");
   image.compact();
@@ -73,9 +76,9 @@ DatabaseImage imageOf(BackupFile backup, const std::string& path) try {
 
 DatabaseImage liveImage(bool withoutTokens) {
   DatabaseImage image = readLive();
-  if (const Findings problems = image.problems(); !problems.empty())
+  if (const Findings problems = checkStructure(image.connection()); !problems.empty())
     throw Failure(ExitCode::kAttention, "the database is not sound, no backup was made: " +
-                                            firstOf(problems) + "; see 'oauthctl check'");
+                                            summaryOf(problems) + "; see 'oauthctl check'");
   image.compact();
   if (withoutTokens) image.dropGrants();
   return image;
@@ -83,11 +86,12 @@ DatabaseImage liveImage(bool withoutTokens) {
 
 }  // namespace
 
-// The file is the operator's: it is made before root becomes the owner of the database's folder.
+// The backup belongs to the operator, so it is made before root takes the ids of the folder's
+// owner.
 void backUp(const Invocation& invocation) {
-  const std::string target = operand(invocation);
+  const std::string target = fileOperand(invocation);
   NewFile file(target);
-  DatabaseFolder::enter(Return::kByActingAs);  // The file gets its name with the operator's ids.
+  DatabaseFolder::enter(RootIds::kKeep);  // publish() needs the operator's ids
   requireDatabase(Access::kRead);
   DatabaseImage image = liveImage(invocation.has("--without-tokens"));
   file.append(image.bytes());
@@ -96,12 +100,13 @@ void backUp(const Invocation& invocation) {
   say("wrote " + target + ": " + image.summary());
 }
 
-// The backup is read before root takes the owner's ids: it is the operator's.
+// The backup belongs to the operator, so it is read before root takes the ids of the folder's
+// owner.
 void restore(const Invocation& invocation) {
-  const std::string source = operand(invocation);
+  const std::string source = fileOperand(invocation);
   BackupFile backup = readBackupFile(source);
   requireDatabase(Access::kMake);
-  refuseTheDatabaseItself(backup, source);
+  requireAnotherFile(backup, source);
   DatabaseImage image = imageOf(std::move(backup), source);
   if (invocation.has("--without-tokens")) image.dropGrants();
   confirm(invocation, "Replace everything in the database by " + image.summary() + "?");

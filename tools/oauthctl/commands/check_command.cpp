@@ -1,12 +1,12 @@
-#include "commands.h"
-#include "content_checks.h"
-#include "database_access.h"
-#include "database_folder.h"
-#include "exit_code.h"
-#include "file_checks.h"
-#include "fixed_paths.h"
-#include "table_output.h"
-#include "terminal.h"
+#include "checks/content_checks.h"
+#include "checks/file_checks.h"
+#include "commands/commands.h"
+#include "database/access.h"
+#include "database/fixed_paths.h"
+#include "database/folder.h"
+#include "terminal/exit_code.h"
+#include "terminal/table_output.h"
+#include "terminal/terminal.h"
 
 namespace oauthctl {
 namespace {
@@ -15,9 +15,9 @@ void append(Findings& all, const Findings& more) {
   all.insert(all.end(), more.begin(), more.end());
 }
 
-// Reading one damaged page must not hide what the others hold.
+// Runs a check. If it reads a damaged page, the other checks still run.
 template <class Check>
-void collect(Findings& findings, Check check) {
+void runCheck(Findings& findings, Check check) {
   try {
     append(findings, check());
   } catch (const SqliteError& error) {
@@ -33,10 +33,10 @@ void collect(Findings& findings, Check check) {
 void checkContents(Findings& findings) {
   SqliteConnection database(fixed_paths::database(), SQLITE_OPEN_READONLY);
   CipherCount count;
-  collect(findings, [&] { return checkStructure(database); });
-  collect(findings, [&] { return checkJournalMode(database); });
-  collect(findings, [&] { return checkCiphers(database, count); });
-  collect(findings, [&] { return checkExpiries(database); });
+  runCheck(findings, [&] { return checkStructure(database); });
+  runCheck(findings, [&] { return checkJournalMode(database); });
+  runCheck(findings, [&] { return checkCiphers(database, count); });
+  runCheck(findings, [&] { return checkExpiries(database); });
 }
 
 void print(const Findings& findings, bool asJson) {
@@ -56,7 +56,7 @@ void print(const Findings& findings, bool asJson) {
 }
 
 Findings findAll() {
-  // Root looks no further: others may have put anything there.
+  // Root goes no further: others may have put any file there.
   if (const std::string unsafe = DatabaseFolder::enter().unsafeForRoot(); !unsafe.empty())
     return checkFolder(unsafe);
   requireDatabase(Access::kRead);

@@ -1,46 +1,45 @@
+#include <sqlite3.h>
+
 #include <cctype>
 
-#include "commands.h"
-#include "exit_code.h"
-#include "grants.h"
-#include "human_time.h"
+#include "commands/commands.h"
+#include "database/grants.h"
+#include "database/registry.h"
+#include "decimal_text.h"
 #include "oauth_clientInfo.h"
 #include "oauth_utils.h"
-#include "registry.h"
-#include "table_output.h"
-#include "terminal.h"
+#include "redirect_uri.h"
+#include "terminal/exit_code.h"
+#include "terminal/table_output.h"
+#include "terminal/terminal.h"
 
 namespace oauthctl {
 
 using ZEVOOAUTHSERVER::OAUTHDBClientInfo;
 
+namespace column = names::column;
+namespace limit = names::limit;
+
 namespace {
 
-// Columns that the operator may give, their options and lengths in bytes.
+// Columns that the operator may set.
 struct Field {
   const char* option;
   const char* column;
-  int shortest, longest;
+  names::Limit limit;
 };
-constexpr Field kName = {"--name", "display_name", 1, 64};
-constexpr Field kRedirectUri = {"--redirect-uri", "redirect_uri", 3, 2048};
-constexpr Field kScope = {"--scope", "scope", 1, 2048};
-
-// As the library does when it registers a client, and not when it edits one: the two would not
-// compare equal.
-std::string withoutScheme(const std::string& uri) {
-  for (const std::string scheme : {"https://", "http://"})
-    if (uri.compare(0, scheme.size(), scheme) == 0) return uri.substr(scheme.size());
-  return uri;
-}
+constexpr Field kName = {"--name", column::kDisplayName, limit::kDisplayName};
+constexpr Field kRedirectUri = {"--redirect-uri", column::kRedirectUri, limit::kRedirectUri};
+constexpr Field kScope = {"--scope", column::kScope, limit::kScope};
 
 std::string fieldValue(const Invocation& invocation, const Field& field) {
   std::string value = invocation.value(field.option);
-  if (field.option == kRedirectUri.option) value = withoutScheme(value);
-  if (!checkStrLen(value, field.shortest, field.longest, false))
+  // The library removes the scheme when it registers a client, but not when it edits one.
+  if (field.option == kRedirectUri.option) value = ZEVOOAUTHSERVER::withoutScheme(value);
+  if (!checkStrLen(value, field.limit.min, field.limit.max, false))
     throw Failure(ExitCode::kUsage, std::string(field.option) + " must have " +
-                                        std::to_string(field.shortest) + " to " +
-                                        std::to_string(field.longest) + " bytes, not " +
+                                        std::to_string(field.limit.min) + " to " +
+                                        std::to_string(field.limit.max) + " bytes, not " +
                                         std::to_string(value.size()));
   for (const char c : value)
     if (std::iscntrl(static_cast<unsigned char>(c)) != 0)
@@ -48,42 +47,45 @@ std::string fieldValue(const Invocation& invocation, const Field& field) {
   return value;
 }
 
-struct Made {
+struct Credentials {
   std::string identifier, secret;
 };
 
 [[noreturn]] void throwWhyNotAdded(OAUTHDBClientInfo& clients) {
   if (clients.GetErrCode() != ZEVOOAUTHSERVER::kErrTableFull)
     throwReason(clients, "register the client");
-  // The library calls a table full also when it could not count its rows.
-  const int ceiling = getTableRowMax("client_info_max");
-  clients.SetErrCode(0);
+  // The library reports a full table also if it cannot count the rows.
+  const int ceiling = getTableRowMax(names::setting::kClientInfoMax);
+  clients.SetErrCode(SQLITE_OK);
   clients.DBCheckRowMax(static_cast<unsigned long>(ceiling));
-  if (clients.GetErrCode() != 0) throwReason(clients, "register the client");
+  if (clients.GetErrCode() != SQLITE_OK) throwReason(clients, "register the client");
   throw Failure(ExitCode::kAttention, "the registry is full: it holds " + std::to_string(ceiling) +
-                                          " clients, the setting client_info_max");
+                                          " clients, the setting " +
+                                          names::setting::kClientInfoMax);
 }
 
-Made registerClient(const Invocation& invocation, const std::string& secret) {
-  OAUTHDBClientInfo clients(kClientTable);
+Credentials registerClient(const Invocation& invocation, const std::string& secret) {
+  OAUTHDBClientInfo clients(names::table::kClientInfo);
   requireReady(clients);
-  clients.SetErrCode(0);
-  Json::Value made;
-  const std::string identifier = getRandomStr(64);
-  if (clients.Add(identifier, secret.empty() ? getRandomStr(64) : secret,
+  clients.SetErrCode(SQLITE_OK);
+  Json::Value added;
+  const std::string identifier = getRandomStr(limit::kClientId.max);
+  if (clients.Add(identifier, secret.empty() ? getRandomStr(limit::kClientSecret.max) : secret,
                   fieldValue(invocation, kRedirectUri), fieldValue(invocation, kScope),
                   fieldValue(invocation, kName), invocation.has("--disabled") ? "0" : "1",
-                  made) == 0)
+                  added) == 0)
     throwWhyNotAdded(clients);
-  return {made["client_id"].asString(), made["client_secret"].asString()};
+  return {added[column::kClientId].asString(), added[column::kClientSecret].asString()};
 }
 
-std::string callersSecret(const Invocation& invocation) {
+// The secret from standard input, "" if the library is to make one.
+std::string secretFromInput(const Invocation& invocation) {
   if (!invocation.has("--secret-from-stdin")) return {};
   std::string secret = readSecret("client secret");
-  if (!checkStrLen(secret, 64, 64, false))
-    throw Failure(ExitCode::kUsage,
-                  "a client secret has 64 bytes, not " + std::to_string(secret.size()));
+  if (!checkStrLen(secret, limit::kClientSecret.min, limit::kClientSecret.max, false))
+    throw Failure(ExitCode::kUsage, "a client secret has " +
+                                        std::to_string(limit::kClientSecret.max) + " bytes, not " +
+                                        std::to_string(secret.size()));
   return secret;
 }
 
@@ -91,13 +93,13 @@ void setEnabled(const Invocation& invocation, bool enabled) {
   Database database(Access::kWrite);
   const Json::Value row = findClient(database, invocation.value("CLIENT"));
   const long long id = idForChange(row);
-  OAUTHDBClientInfo clients(kClientTable);
+  OAUTHDBClientInfo clients(names::table::kClientInfo);
   requireReady(clients);
   const bool changed = attempt(clients, "change the client", [&] {
     return (enabled ? clients.Enable(id) : clients.Disable(id)) != 0;
   });
   if (!changed) throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
-  say("client " + row["id"].asString() + (enabled ? " is enabled" : " is disabled"));
+  say("client " + row[column::kId].asString() + (enabled ? " is enabled" : " is disabled"));
 }
 
 }  // namespace
@@ -106,7 +108,7 @@ void listClients(const Invocation& invocation) {
   Database database(Access::kRead);
   const bool showSecrets = invocation.has("--show-secrets");
   Json::Value documents(Json::arrayValue);
-  for (const Json::Value& row : database.rows(kClientTable))
+  for (const Json::Value& row : database.rows(names::table::kClientInfo))
     documents.append(clientDocument(row, showSecrets));
   if (invocation.has("--json")) {
     printJson(documents);
@@ -132,7 +134,7 @@ void listClients(const Invocation& invocation) {
 void showClient(const Invocation& invocation) {
   Database database(Access::kRead);
   const Json::Value row = findClient(database, invocation.value("CLIENT"));
-  const std::string identifier = row["client_id"].asString();
+  const std::string identifier = row[column::kClientId].asString();
   Json::Value document = clientDocument(row, invocation.has("--show-secrets"));
   document["codes"] = countOfClient(database, kCodes, identifier);
   document["tokens"] = countOfClient(database, kTokens, identifier);
@@ -154,23 +156,24 @@ void showClient(const Invocation& invocation) {
 void addClient(const Invocation& invocation) {
   for (const Field& field : {kName, kRedirectUri, kScope}) fieldValue(invocation, field);
   requireDatabase(Access::kMake);
-  const std::string secret = callersSecret(invocation);
-  const Made made = registerClient(invocation, secret);
+  const std::string secret = secretFromInput(invocation);
+  const Credentials added = registerClient(invocation, secret);
   Database database(Access::kRead);
-  const Json::Value id = findClient(database, made.identifier)["id"];
+  const Json::Value id = findClient(database, added.identifier)[column::kId];
   if (invocation.has("--json")) {
     Json::Value document;
-    document["id"] = static_cast<Json::Int64>(number(id.asString()).value_or(0));
-    document["client_id"] = made.identifier;
-    document["client_secret"] = made.secret;
+    document["id"] =
+        static_cast<Json::Int64>(ZEVOOAUTHSERVER::decimalNumber(id.asString()).value_or(0));
+    document["client_id"] = added.identifier;
+    document["client_secret"] = added.secret;
     printJson(document);
     return;
   }
   printPairs(
-      {{"id", id.asString()}, {"client_id", made.identifier}, {"client_secret", made.secret}});
+      {{"id", id.asString()}, {"client_id", added.identifier}, {"client_secret", added.secret}});
 }
 
-// Only the columns given: what another process changes in the others meanwhile is not undone.
+// Changes only the columns given: another process may change the others meanwhile.
 void editClient(const Invocation& invocation) {
   Json::Value modified;
   for (const Field& field : {kName, kRedirectUri, kScope})
@@ -180,9 +183,9 @@ void editClient(const Invocation& invocation) {
     throw Failure(ExitCode::kUsage, "nothing to change: give --name, --redirect-uri or --scope");
   Database database(Access::kWrite);
   const Json::Value row = findClient(database, invocation.value("CLIENT"));
-  if (!database.edit(kClientTable, idForChange(row), modified))
+  if (!database.edit(names::table::kClientInfo, idForChange(row), modified))
     throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
-  say("client " + row["id"].asString() + " is changed");
+  say("client " + row[column::kId].asString() + " is changed");
 }
 
 void enableClient(const Invocation& invocation) { setEnabled(invocation, true); }
@@ -192,26 +195,26 @@ void deleteClient(const Invocation& invocation) {
   Database database(Access::kWrite);
   const Json::Value row = findClient(database, invocation.value("CLIENT"));
   const long long id = idForChange(row);
-  const std::string identifier = row["client_id"].asString();
+  const std::string identifier = row[column::kClientId].asString();
   const bool withTokens = invocation.has("--with-tokens");
   const auto grants = [&](int codes, int tokens) {
-    return counted(codes, kCodes) + " and " + counted(tokens, kTokens);
+    return countText(codes, kCodes) + " and " + countText(tokens, kTokens);
   };
   const std::string held = grants(countOfClient(database, kCodes, identifier),
                                   countOfClient(database, kTokens, identifier));
-  confirm(invocation, "Delete client " + row["id"].asString() + ", '" +
-                          asGiven(row["display_name"].asString()) + "'" +
+  confirm(invocation, "Delete client " + row[column::kId].asString() + ", '" +
+                          originalText(row[column::kDisplayName].asString()) + "'" +
                           (withTokens ? ", with its " + held : "; its " + held + " stay valid") +
                           "?");
   int codes = 0, tokens = 0;
   database.inTransaction([&] {
-    if (!database.remove(kClientTable, id))
+    if (!database.remove(names::table::kClientInfo, id))
       throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
     if (!withTokens) return;
     codes = removeOfClient(database, kCodes, identifier);
     tokens = removeOfClient(database, kTokens, identifier);
   });
-  say("deleted client " + row["id"].asString() +
+  say("deleted client " + row[column::kId].asString() +
       (withTokens ? ", " + grants(codes, tokens)
                   : "; its " + held + " stay valid, 'oauthctl token revoke --client " + identifier +
                         "' ends its logins"));

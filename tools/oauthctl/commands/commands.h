@@ -2,9 +2,12 @@
 
 #pragma once
 
-#include "invocation.h"
+#include "terminal/invocation.h"
 
 namespace oauthctl {
+
+// From this percentage of its ceiling on, showStatus() warns about a table.
+inline constexpr int kWarnFrom = 80;
 
 void showStatus(const Invocation& invocation);
 void checkSoundness(const Invocation& invocation);

@@ -3,20 +3,23 @@
 #include <algorithm>
 #include <vector>
 
-#include "commands.h"
-#include "exit_code.h"
-#include "fixed_paths.h"
-#include "grants.h"
-#include "human_time.h"
+#include "checks/settings_report.h"
+#include "commands/commands.h"
+#include "database/fixed_paths.h"
+#include "database/grants.h"
 #include "oauth_utils.h"
-#include "settings_report.h"
-#include "table_output.h"
-#include "terminal.h"
+#include "terminal/exit_code.h"
+#include "terminal/human_time.h"
+#include "terminal/table_output.h"
+#include "terminal/terminal.h"
+#include "unix_time.h"
 
 namespace oauthctl {
-namespace {
 
-constexpr int kWarnFrom = 80;  // percent
+namespace setting = names::setting;
+namespace table = names::table;
+
+namespace {
 
 struct TableFacts {
   const char* name;
@@ -44,13 +47,13 @@ void readExpiries(Database& database, TableFacts& facts, std::int64_t now) {
 }
 
 std::vector<TableFacts> readTables(Database& database, std::int64_t now) {
-  std::vector<TableFacts> tables = {{"clients", "client_info_max", false, kClientTable},
-                                    {"codes", "grantcode_max", false, kCodeTable},
-                                    {"tokens", "token_max", false, kTokenTable},
-                                    {"log", "log_max", true, kLogTable}};
+  std::vector<TableFacts> tables = {{"clients", setting::kClientInfoMax, false, table::kClientInfo},
+                                    {"codes", setting::kGrantCodeMax, false, table::kGrantCode},
+                                    {"tokens", setting::kTokenMax, false, table::kToken},
+                                    {"log", setting::kLogMax, true, table::kLog}};
   for (TableFacts& facts : tables) {
     facts.ceiling = getTableRowMax(facts.setting);
-    facts.expires = facts.table == kCodeTable || facts.table == kTokenTable;
+    facts.expires = facts.table == table::kGrantCode || facts.table == table::kToken;
     if (facts.expires)
       readExpiries(database, facts, now);
     else
@@ -96,7 +99,7 @@ void printTables(const std::vector<TableFacts>& tables, std::int64_t now) {
 void printSettings(const SettingsReport& report) {
   if (!report.problem.empty()) say(fixed_paths::settings() + " " + report.problem);
   Table table({{"SETTING"}, {"VALUE", true}, {"WHERE FROM"}});
-  for (const Setting& setting : report.settings)
+  for (const SettingInForce& setting : report.settings)
     table.add({setting.name, std::to_string(setting.value), setting.origin},
               setting.isIgnored ? Tone::kWarning : Tone::kPlain);
   table.print();
@@ -128,7 +131,7 @@ Json::Value settingsDocument(const SettingsReport& report) {
   Json::Value document;
   document["file"] = fixed_paths::settings();
   document["problem"] = report.problem.empty() ? Json::Value() : Json::Value(report.problem);
-  for (const Setting& setting : report.settings) {
+  for (const SettingInForce& setting : report.settings) {
     document["values"][setting.name]["value"] = setting.value;
     document["values"][setting.name]["from"] = setting.origin;
   }
@@ -142,7 +145,7 @@ struct FileFacts {
 };
 
 FileFacts readFile(Database& database) {
-  FileFacts facts = {fixed_paths::database(), 0, database.rows(kMetaTable)};
+  FileFacts facts = {fixed_paths::database(), 0, database.rows(table::kMeta)};
   struct stat status;
   if (stat(facts.path.c_str(), &status) == 0) facts.bytes = status.st_size;
   return facts;
@@ -171,7 +174,7 @@ Json::Value fileDocument(const FileFacts& facts) {
 }  // namespace
 
 void showStatus(const Invocation& invocation) {
-  const std::int64_t now = unixNow();
+  const std::int64_t now = ZEVOOAUTHSERVER::unixNow();
   Database database(Access::kRead);
   const std::vector<TableFacts> tables = readTables(database, now);
   const FileFacts file = readFile(database);

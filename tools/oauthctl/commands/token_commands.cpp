@@ -1,33 +1,37 @@
 #include <utility>
 
-#include "commands.h"
-#include "exit_code.h"
-#include "grants.h"
-#include "human_time.h"
+#include "commands/commands.h"
+#include "database/grants.h"
 #include "oauth_token.h"
-#include "table_output.h"
-#include "terminal.h"
+#include "terminal/exit_code.h"
+#include "terminal/table_output.h"
+#include "terminal/terminal.h"
+#include "unix_time.h"
 
 namespace oauthctl {
 
 using ZEVOOAUTHSERVER::OAUTHDBToken;
+using ZEVOOAUTHSERVER::unixNow;
 
 namespace {
 
-constexpr std::size_t kTokenLength = 64;
+bool hasTokenLength(const std::string& text) {
+  const auto length = static_cast<int>(text.size());
+  return length >= names::limit::kToken.min && length <= names::limit::kToken.max;
+}
 
 // The row of the token, null if there is none.
 Json::Value rowOf(OAUTHDBToken& tokens, const std::string& token) {
   Json::Value rows;
-  if (token.size() != kTokenLength) return {};
+  if (!hasTokenLength(token)) return {};
   attempt(tokens, "look the token up",
           [&] { return tokens.GetWithAccessToken(token, &rows) != 0; });
   return std::as_const(rows)[0U];
 }
 
-// Whether the library takes the token; a look-up that failed is not an answer.
+// Whether the library accepts the token. Throws if the look-up fails.
 bool isValid(OAUTHDBToken& tokens, const std::string& token) {
-  if (token.size() != kTokenLength) return false;
+  if (!hasTokenLength(token)) return false;
   Json::Value answer;
   return attempt(tokens, "verify the token", [&] { return tokens.Verify(token, answer) != 0; });
 }
@@ -37,8 +41,8 @@ std::vector<std::pair<std::string, std::string>> pairsOf(const Json::Value& docu
                                                          const Registry& registry) {
   return {{"id", document["id"].asString()},
           {"user", document["username"].asString()},
-          {"client", registry.describe(row["client_id"].asString())},
-          {"client_id", row["client_id"].asString()},
+          {"client", registry.describe(row[names::column::kClientId].asString())},
+          {"client_id", row[names::column::kClientId].asString()},
           {"scope", document["scope"].asString()},
           {"state", document["state"].asString()},
           {"flow_type", document["flow_type"].asString()},
@@ -50,15 +54,11 @@ std::vector<std::pair<std::string, std::string>> pairsOf(const Json::Value& docu
 
 }  // namespace
 
-void listTokens(const Invocation& invocation) { listGrants(kTokens, invocation); }
-void revokeTokens(const Invocation& invocation) { revokeGrants(kTokens, invocation); }
-void purgeTokens(const Invocation& invocation) { purgeGrants(kTokens, invocation); }
-
 void showToken(const Invocation& invocation) {
   Json::Value condition;
-  condition["id"] = static_cast<Json::Int64>(rowNumber(invocation.value("N")));
+  condition[names::column::kId] = static_cast<Json::Int64>(rowNumber(invocation.value("N")));
   Database database(Access::kRead);
-  const Json::Value rows = database.rows(kTokenTable, condition);
+  const Json::Value rows = database.rows(names::table::kToken, condition);
   if (rows.empty())
     throw Failure(ExitCode::kAttention, "there is no token " + invocation.value("N"));
   const Registry registry(database);
@@ -74,7 +74,7 @@ void verifyToken(const Invocation& invocation) {
   requireDatabase(Access::kRead);
   const std::string token = readSecret("access token");
   Database database(Access::kRead);
-  OAUTHDBToken tokens(kTokenTable);
+  OAUTHDBToken tokens(names::table::kToken);
   requireReady(tokens);
   const bool valid = isValid(tokens, token);
   const Json::Value row = rowOf(tokens, token);

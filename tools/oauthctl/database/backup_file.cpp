@@ -1,22 +1,25 @@
-#include "backup_file.h"
+#include "database/backup_file.h"
 
 #include <fcntl.h>
 
 #include <cerrno>
 #include <cstring>
 
-#include "database_image.h"
+#include "database/image.h"
 #include "descriptor.h"
-#include "exit_code.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
+
+using ZEVOOAUTHSERVER::Descriptor;
+
 namespace {
 
-[[noreturn]] void cannotRead(const std::string& path) {
+[[noreturn]] void throwUnreadable(const std::string& path) {
   throw Failure(ExitCode::kAttention, "cannot read " + path + ": " + std::strerror(errno));
 }
 
-// SQLite takes an empty journal, or one whose first byte is 0, for no journal.
+// SQLite ignores a journal that is empty or whose first byte is 0.
 void requireNoJournal(const std::string& path) {
   for (const char* const suffix : {"-journal", "-wal"}) {
     const Descriptor journal(
@@ -34,7 +37,7 @@ std::string readWhole(const Descriptor& file, std::size_t size, const std::strin
   while (done < size) {
     const ssize_t count = read(file.value(), bytes.data() + done, size - done);
     if (count < 0 && errno == EINTR) continue;
-    if (count < 0) cannotRead(path);
+    if (count < 0) throwUnreadable(path);
     if (count == 0) break;
     done += static_cast<std::size_t>(count);
   }
@@ -49,11 +52,11 @@ void refuseBackup(const std::string& path, const std::string& why) {
 }
 
 BackupFile readBackupFile(const std::string& path) {
-  // Not through a link, and without waiting for a writer should it be a pipe.
+  // Follow no link. If it is a pipe, do not wait for a writer.
   const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
   if (!file.isOpen() && errno == ELOOP) refuseBackup(path, "it is a link, name the file itself");
   BackupFile backup;
-  if (!file.isOpen() || fstat(file.value(), &backup.status) != 0) cannotRead(path);
+  if (!file.isOpen() || fstat(file.value(), &backup.status) != 0) throwUnreadable(path);
   if (!S_ISREG(backup.status.st_mode)) refuseBackup(path, "it is not a file");
   if (backup.status.st_size > kLargestDatabase) refuseBackup(path, "it is too large for a backup");
   requireNoJournal(path);

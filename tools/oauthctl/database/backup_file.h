@@ -1,4 +1,4 @@
-// The backup that the operator names for a restore.
+// The backup file of a restore.
 
 #pragma once
 
@@ -13,12 +13,12 @@ struct BackupFile {
   struct stat status;
 };
 
-// Opens the file once, with the ids that the process has now, and reads it whole. Throws a Failure
-// if it is no regular file, larger than any database of ours, or half of a database whose other
-// half is a journal beside it.
+// Opens the file once, with the current ids of the process, and reads all of it. Throws a Failure
+// if it is not a regular file, is too large, or has a journal beside it: a database and its journal
+// belong together.
 BackupFile readBackupFile(const std::string& path);
 
-// Throws that the file is refused.
+// Throws the Failure that says why the file is refused.
 [[noreturn]] void refuseBackup(const std::string& path, const std::string& why);
 
 }  // namespace oauthctl

@@ -1,14 +1,18 @@
-#include "database.h"
+#include "database/database.h"
 
 #include <sqlite3.h>
 
-#include "exit_code.h"
-#include "fixed_paths.h"
-#include "human_time.h"
+#include "database/fixed_paths.h"
+#include "decimal_text.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
 
+using ZEVOOAUTHSERVER::decimalNumber;
 using ZEVOOAUTHSERVER::OAUTHDBBasic;
+
+namespace column = names::column;
+namespace request = names::request;
 
 void requireReady(const OAUTHDBBasic& store) {
   if (store.GetErrCode() == ZEVOOAUTHSERVER::kErrNone) return;
@@ -28,9 +32,9 @@ void throwReason(const OAUTHDBBasic& store, const std::string& operation) {
 }
 
 bool attempt(OAUTHDBBasic& store, const std::string& operation, const std::function<bool()>& body) {
-  store.SetErrCode(0);  // a missing row records no error, and a success clears none
+  store.SetErrCode(SQLITE_OK);  // a missing row sets no error, a success clears none
   if (body()) return true;
-  if (store.GetErrCode() == 0) return false;
+  if (store.GetErrCode() == SQLITE_OK) return false;
   throwReason(store, operation);
 }
 
@@ -42,33 +46,33 @@ Database::Database(Access access) {
 
 Json::Value Database::rows(const char* table, const Json::Value& condition) {
   store_->SetTabName(table);
-  Json::Value request, result;
-  request["condition"] = condition;
-  attempt(*store_, std::string("read ") + table, [&] { return store_->DBGet(request, &result); });
+  Json::Value document, result;
+  document[request::kCondition] = condition;
+  attempt(*store_, std::string("read ") + table, [&] { return store_->DBGet(document, &result); });
   return result;
 }
 
 int Database::rowCount(const char* table) {
   store_->SetTabName(table);
-  Json::Value counted;
-  attempt(*store_, std::string("count ") + table, [&] { return store_->DBGetRowCount(&counted); });
-  return static_cast<int>(number(counted[0U].asString()).value_or(0));
+  Json::Value count;
+  attempt(*store_, std::string("count ") + table, [&] { return store_->DBGetRowCount(&count); });
+  return static_cast<int>(decimalNumber(count[0U].asString()).value_or(0));
 }
 
 bool Database::remove(const char* table, long long id) {
   store_->SetTabName(table);
-  Json::Value request;
-  request["condition"]["id"] = static_cast<Json::Int64>(id);
+  Json::Value document;
+  document[request::kCondition][column::kId] = static_cast<Json::Int64>(id);
   return attempt(*store_, std::string("delete from ") + table,
-                 [&] { return store_->DBDel(request); });
+                 [&] { return store_->DBDel(document); });
 }
 
 bool Database::edit(const char* table, long long id, const Json::Value& modified) {
   store_->SetTabName(table);
-  Json::Value request;
-  request["condition"]["id"] = static_cast<Json::Int64>(id);
-  request["modified"] = modified;
-  return attempt(*store_, std::string("change ") + table, [&] { return store_->DBEdit(request); });
+  Json::Value document;
+  document[request::kCondition][column::kId] = static_cast<Json::Int64>(id);
+  document[request::kModified] = modified;
+  return attempt(*store_, std::string("change ") + table, [&] { return store_->DBEdit(document); });
 }
 
 void Database::run(const std::string& sql) {
@@ -87,7 +91,7 @@ void Database::inTransaction(const std::function<void()>& body) {
   }
 }
 
-std::string asGiven(const std::string& stored) {
+std::string originalText(const std::string& stored) {
   std::string text;
   for (std::size_t i = 0; i < stored.size(); ++i) {
     text += stored[i];
@@ -96,16 +100,18 @@ std::string asGiven(const std::string& stored) {
   return text;
 }
 
-long long idOf(const Json::Value& row) { return number(row["id"].asString()).value_or(0); }
+long long idOf(const Json::Value& row) {
+  return decimalNumber(row[column::kId].asString()).value_or(0);
+}
 
 Json::Value idValue(const Json::Value& row) {
-  const auto result = number(row["id"].asString());
-  return result ? Json::Value(static_cast<Json::Int64>(*result)) : row["id"];
+  const auto result = decimalNumber(row[column::kId].asString());
+  return result ? Json::Value(static_cast<Json::Int64>(*result)) : row[column::kId];
 }
 
 long long idForChange(const Json::Value& row) {
-  const std::string id = row["id"].asString();
-  const auto result = number(id);
+  const std::string id = row[column::kId].asString();
+  const auto result = decimalNumber(id);
   if (!result)
     throw Failure(ExitCode::kAttention,
                   "nothing changed, the row's id '" + id + "' is no number: see 'oauthctl check'");

@@ -1,5 +1,4 @@
-// The database through the library: one connection for the command at hand, whose failures are
-// thrown.
+// The database through the library: one connection for one command. Failures are thrown.
 
 #pragma once
 
@@ -9,20 +8,17 @@
 #include <memory>
 #include <string>
 
-#include "database_access.h"
+#include "database/access.h"
 #include "oauth_db_basic.h"
+#include "oauth_names.h"
 
 namespace oauthctl {
 
-inline constexpr char kClientTable[] = "oauth_clientInfo";
-inline constexpr char kCodeTable[] = "oauth_grantCode";
-inline constexpr char kTokenTable[] = "oauth_token";
-inline constexpr char kLogTable[] = "oauth_log";
-inline constexpr char kMetaTable[] = "oauth_meta";
+namespace names = ZEVOOAUTHSERVER::names;
 
-// Throws unless the store is ready for use.
+// Throws a Failure unless the store is ready for use.
 void requireReady(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
-// Why the store's last operation failed.
+// Throws a Failure that says why the last operation of the store failed.
 [[noreturn]] void throwReason(const ZEVOOAUTHSERVER::OAUTHDBBasic& store,
                               const std::string& operation);
 // Runs an operation of a store. True if it succeeded, false if there was no such row; throws if it
@@ -34,16 +30,16 @@ class Database {
  public:
   explicit Database(Access access);
 
-  // Every row, or those whose columns have these values; a text goes through the library's quoting
-  // first, as it did when it was stored.
+  // Every row, or those whose columns have these values. Quote a text as the library did before it
+  // stored it.
   Json::Value rows(const char* table, const Json::Value& condition = Json::nullValue);
   int rowCount(const char* table);
   // False if there is no such row.
   bool remove(const char* table, long long id);
   bool edit(const char* table, long long id, const Json::Value& modified);
 
-  // All or nothing, and under the write lock from the start: no row comes or goes between the look
-  // and the change.
+  // Commits all changes of the body, or none if it throws. Takes the write lock first: no other
+  // program changes a row between a read and a change in the body.
   void inTransaction(const std::function<void()>& body);
 
  private:
@@ -52,15 +48,15 @@ class Database {
   std::unique_ptr<ZEVOOAUTHSERVER::OAUTHDBBasic> store_;
 };
 
-// A stored text as it was given: the library keeps every single quote doubled.
-std::string asGiven(const std::string& stored);
+// The text before the library doubled its single quotes.
+std::string originalText(const std::string& stored);
 
-// A row's id, which comes as decimal text; 0 if it is no number.
+// A row's id, which is stored as decimal text; 0 if it is not a number.
 long long idOf(const Json::Value& row);
-// The id for a document: a number, or the text that somebody put there.
+// The id for a document: a number, or the stored text if it is not a number.
 Json::Value idValue(const Json::Value& row);
-// The id of a row that is to be changed or deleted. Throws if it is no number: idOf()
-// gives 0 then, which may be another row's id.
+// The id of a row that is to be changed or deleted. Throws if it is not a number: idOf() returns 0
+// then, which may be the id of another row.
 long long idForChange(const Json::Value& row);
 
 }  // namespace oauthctl

@@ -1,4 +1,4 @@
-#include "effective_ids.h"
+#include "database/effective_ids.h"
 
 #include <grp.h>
 #include <pwd.h>
@@ -8,15 +8,15 @@
 #include <cstring>
 #include <string>
 
-#include "exit_code.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
 namespace {
 
 constexpr uid_t kRoot = 0, kKeep = static_cast<uid_t>(-1);
 
-// Changes the group first, as root: only root may change it.
-bool take(Ids ids) {
+// Becomes root first: only root may change the group.
+bool setEffectiveIds(Ids ids) {
   const Ids now = effectiveIds();
   if (now.user == ids.user && now.group == ids.group) return true;
   return (now.user == kRoot || setresuid(kKeep, kRoot, kKeep) == 0) &&
@@ -27,21 +27,21 @@ bool take(Ids ids) {
 
 Ids effectiveIds() { return {geteuid(), getegid()}; }
 
-void becomeUser(uid_t user, gid_t fallback, Return way) {
+void becomeUser(uid_t user, gid_t fallback, RootIds rootIds) {
   const passwd* const known = getpwuid(user);
   const gid_t group = known == nullptr ? fallback : known->pw_gid;
   const bool joined =
       known == nullptr ? setgroups(1, &group) == 0 : initgroups(known->pw_name, group) == 0;
-  const auto leave = [&] {
+  const auto setAllIds = [&] {
     return setresgid(group, group, group) == 0 && setresuid(user, user, user) == 0;
   };
-  if (!joined || !(way == Return::kNever ? leave() : take({user, group})))
+  if (!joined || !(rootIds == RootIds::kGiveUp ? setAllIds() : setEffectiveIds({user, group})))
     throw Failure(ExitCode::kUnavailable, "cannot take the ids of user " + std::to_string(user) +
                                               ": " + std::strerror(errno));
 }
 
 ActingAs::ActingAs(Ids ids) : before_(effectiveIds()) {
-  if (!take(ids))
+  if (!setEffectiveIds(ids))
     throw Failure(
         ExitCode::kUnavailable,
         "cannot take the ids of user " + std::to_string(ids.user) + ": " + std::strerror(errno));
@@ -49,7 +49,7 @@ ActingAs::ActingAs(Ids ids) : before_(effectiveIds()) {
 
 ActingAs::~ActingAs() {
   const int error = errno;
-  if (!take(before_)) {
+  if (!setEffectiveIds(before_)) {
     constexpr char kLine[] = "oauthctl: cannot give up the ids of root\n";
     static_cast<void>(!write(STDERR_FILENO, kLine, sizeof kLine - 1));
     _exit(static_cast<int>(ExitCode::kUnavailable));

@@ -1,4 +1,4 @@
-// The effective user and group of this process, which decide what it may do with files.
+// The effective user and group of this process: they decide what it may do with files.
 
 #pragma once
 
@@ -13,17 +13,18 @@ struct Ids {
 
 Ids effectiveIds();
 
-enum class Return {
-  kNever,       // not even the library can raise its ids any more
-  kByActingAs,  // real and saved ids stay root's; the user can neither signal nor trace this
-                // process
+// What becomes of root's ids when root takes those of another user.
+enum class RootIds {
+  kGiveUp,  // root's rights are lost, for the library too
+  kKeep     // real and saved ids stay root's; the user can neither signal nor trace this process
 };
 
-// Takes the ids and the groups of this user until the program ends. fallback is the group of a user
-// whom the system does not know. Throws a Failure if any of that is refused.
-void becomeUser(uid_t user, gid_t fallback, Return way);
+// Takes the ids and the groups of this user until the program ends. A user whom the system does not
+// know gets the group fallback. Throws a Failure if the system refuses.
+void becomeUser(uid_t user, gid_t fallback, RootIds rootIds);
 
-// Has these ids while it lives, then those from before. Ends the program if they do not come back.
+// The process has these ids during the life of the object, and then its former ids again. If they
+// cannot be restored, the program ends.
 class ActingAs {
  public:
   explicit ActingAs(Ids ids);

@@ -1,10 +1,14 @@
-#include "fixed_paths.h"
+#include "database/fixed_paths.h"
+
+#include "oauth_names.h"
 
 namespace oauthctl::fixed_paths {
 
-std::string folder() { return "/var/packages/Keyloft/target/etc"; }
-std::string database() { return folder() + "/oauth.db"; }
-std::string settings() { return folder() + "/oauth.cfg"; }
-std::string debugMarker() { return "/tmp/zevooauth_debug"; }
+namespace path = ZEVOOAUTHSERVER::names::path;
+
+std::string folder() { return path::kFolder; }
+std::string database() { return path::kDatabase; }
+std::string settings() { return path::kSettings; }
+std::string debugMarker() { return path::kDebugMarker; }
 
 }  // namespace oauthctl::fixed_paths

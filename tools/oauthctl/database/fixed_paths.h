@@ -1,5 +1,5 @@
-// The files of the machine. They are fixed, as in the library, because this program runs as root;
-// the tests link other answers.
+// The paths of the library's files. They are fixed because this program runs as root. The tests
+// link other functions instead of these.
 
 #pragma once
 
@@ -7,7 +7,7 @@
 
 namespace oauthctl::fixed_paths {
 
-std::string folder();       // of the two files below
+std::string folder();       // of the database and the settings
 std::string database();     // "oauth.db"
 std::string settings();     // "oauth.cfg"
 std::string debugMarker();  // switches diagnostics on

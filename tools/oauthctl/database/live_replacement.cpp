@@ -1,4 +1,4 @@
-#include "live_replacement.h"
+#include "database/live_replacement.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -9,18 +9,21 @@
 #include <cstring>
 #include <ctime>
 
-#include "database_access.h"
-#include "database_folder.h"
+#include "database/access.h"
+#include "database/fixed_paths.h"
+#include "database/folder.h"
+#include "database/new_file.h"
 #include "descriptor.h"
-#include "exit_code.h"
-#include "fixed_paths.h"
-#include "human_time.h"
-#include "new_file.h"
+#include "terminal/exit_code.h"
+#include "unix_time.h"
 
 namespace oauthctl {
+
+using ZEVOOAUTHSERVER::Descriptor;
+
 namespace {
 
-// Everything below happens in the folder of the database, with its owner's ids.
+// Every function below works in the folder of the database, with the ids of its owner.
 int folder() { return DatabaseFolder::enter().descriptor(); }
 std::string liveName() { return nameOf(fixed_paths::database()); }
 
@@ -29,14 +32,14 @@ Descriptor openLive() {
       openat(folder(), liveName().c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
 }
 
-[[noreturn]] void cannotKeep(const std::string& path) {
+[[noreturn]] void throwCannotKeep(const std::string& path) {
   throw Failure(ExitCode::kAttention, "nothing changed, cannot keep what was there in " + path +
                                           ": " + std::strerror(errno));
 }
 
-// ".../oauth.db.before-restore-20261121-093000", with a number behind if that is taken.
-std::string freeName() {
-  const auto now = static_cast<std::time_t>(unixNow());
+// ".../oauth.db.before-restore-20261121-093000", with "-2" and so on added if that name is taken.
+std::string freePath() {
+  const auto now = static_cast<std::time_t>(ZEVOOAUTHSERVER::unixNow());
   std::tm parts = {};
   char stamp[32] = "";
   if (localtime_r(&now, &parts) != nullptr)
@@ -44,7 +47,7 @@ std::string freeName() {
   const std::string name = fixed_paths::database() + ".before-restore-" + stamp;
   for (int n = 1;; ++n) {
     std::string candidate = n == 1 ? name : name + "-" + std::to_string(n);
-    if (!DatabaseFolder::enter().look(nameOf(candidate))) return candidate;
+    if (!DatabaseFolder::enter().lstatOf(nameOf(candidate))) return candidate;
   }
 }
 
@@ -52,29 +55,31 @@ void copyBytes(const Descriptor& from, NewFile& to, const std::string& path) {
   char block[65536];
   off_t offset = 0;
   for (ssize_t count = 0; (count = pread(from.value(), block, sizeof block, offset)) != 0;) {
-    if (count < 0) cannotKeep(path);
+    if (count < 0) throwCannotKeep(path);
     to.append(block, static_cast<std::size_t>(count));
     offset += count;
   }
 }
 
-// Never in another file's place.
+// Renames the database, or its file with this suffix. Never replaces a file.
 bool moveTo(const std::string& kept, const std::string& suffix) {
   const std::string from = liveName() + suffix, to = nameOf(kept) + suffix;
   if (renameat2(folder(), from.c_str(), folder(), to.c_str(), RENAME_NOREPLACE) == 0) return true;
-  // An older kernel or file system: a second name does the same.
+  // An older kernel or file system does not know the flag: give a second name, then remove the
+  // first.
   return (errno == EINVAL || errno == ENOSYS) &&
          linkat(folder(), from.c_str(), folder(), to.c_str(), 0) == 0 &&
          unlinkat(folder(), from.c_str(), 0) == 0;
 }
 
-// A file that no SQLite can open any more, and its journal, which must not reach the new one.
+// Moves away a file that SQLite can no longer open, and its journal, which must not be applied to
+// the new file. Returns the new path.
 std::string moveAside() {
-  const Descriptor ruined = openLive();
-  std::string kept = freeName();
-  if (!ruined.isOpen()) cannotKeep(kept);
-  fchmod(ruined.value(), S_IRUSR | S_IWUSR);
-  if (!moveTo(kept, "")) cannotKeep(kept);
+  const Descriptor damaged = openLive();
+  std::string kept = freePath();
+  if (!damaged.isOpen()) throwCannotKeep(kept);
+  fchmod(damaged.value(), S_IRUSR | S_IWUSR);
+  if (!moveTo(kept, "")) throwCannotKeep(kept);
   moveTo(kept, "-journal");
   return kept;
 }
@@ -85,26 +90,27 @@ void makeNew(const DatabaseImage& image) {
   file.publish();
 }
 
-// A copy of the bytes under a name of its own.
-std::string keep(const Descriptor& bytes) {
-  std::string kept = freeName();
+// Copies the bytes to a new file, and returns its path.
+std::string keepCopy(const Descriptor& bytes) {
+  std::string kept = freePath();
   NewFile file(folder(), kept);
   copyBytes(bytes, file, kept);
   file.publish();
   return kept;
 }
 
-// Under the exclusive lock that the copy holds, the bytes of the file are one moment of it. The
-// descriptor was opened before the connection and is closed after it: closing any descriptor of a
-// file gives up all locks that the process has on it.
+// The copy holds the exclusive lock, so the bytes of the file do not change meanwhile. The
+// descriptor is opened before the connection and closed after it: closing any descriptor of a file
+// releases all locks that the process has on it.
 std::string replaceContents(DatabaseImage& image) {
   const Descriptor bytes = openLive();
   SqliteConnection live(fixed_paths::database(), SQLITE_OPEN_READWRITE);
   DatabaseCopy copy(image.connection(), live);
   copy.lockTarget();
   struct stat status;
-  if (!bytes.isOpen() || fstat(bytes.value(), &status) != 0) cannotKeep(fixed_paths::database());
-  std::string kept = status.st_size == 0 ? "" : keep(bytes);
+  if (!bytes.isOpen() || fstat(bytes.value(), &status) != 0)
+    throwCannotKeep(fixed_paths::database());
+  std::string kept = status.st_size == 0 ? "" : keepCopy(bytes);
   try {
     copy.finish();
   } catch (const SqliteError&) {
@@ -128,7 +134,7 @@ std::string replaceLiveDatabase(DatabaseImage& image) {
       throw Failure(ExitCode::kAttention,
                     std::string("cannot restore, nothing changed: ") + error.what());
   }
-  // Too damaged to be written into, hence of no use to any program either.
+  // The file is too damaged to be written, so no program can use it either.
   std::string kept = moveAside();
   makeNew(image);
   return kept;

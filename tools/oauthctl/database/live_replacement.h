@@ -1,16 +1,18 @@
-// Puts other contents into the database that programs are using.
+// Replaces the contents of the database while programs use it.
 
 #pragma once
 
 #include <string>
 
-#include "database_image.h"
+#include "database/image.h"
 
 namespace oauthctl {
 
-// In one go: other programs see either all the old rows or all the new ones. What was there is kept
-// first, beside the database; returns that file's path, "" if there was nothing. Throws a Failure,
-// with nothing changed, if the database is busy for longer than the library would wait.
+// Replaces everything at once: other programs see either all the old rows or all the new ones.
+// Before that it copies the old file to a new one beside the database; returns the path of the
+// copy,
+// "" if there was nothing to keep. If the database stays busy for longer than the library would
+// wait, throws a Failure and changes nothing.
 std::string replaceLiveDatabase(DatabaseImage& image);
 
 }  // namespace oauthctl

@@ -1,4 +1,4 @@
-#include "new_file.h"
+#include "database/new_file.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -7,17 +7,20 @@
 #include <cstring>
 #include <utility>
 
-#include "database_folder.h"
-#include "exit_code.h"
+#include "database/folder.h"
 #include "oauth_utils.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
+
+using ZEVOOAUTHSERVER::Descriptor;
+
 namespace {
 
 constexpr int kFolderFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC;
 constexpr mode_t kMode = S_IRUSR | S_IWUSR;
 
-[[noreturn]] void cannot(const std::string& what) {
+[[noreturn]] void throwCannot(const std::string& what) {
   throw Failure(ExitCode::kAttention, "cannot " + what + ": " + std::strerror(errno));
 }
 
@@ -27,8 +30,8 @@ std::string folderOf(const std::string& path) {
   return slash == 0 ? "/" : path.substr(0, slash);
 }
 
-// Where the kernel shows a file that has no name.
-std::string shownAs(const Descriptor& file) {
+// The path of an open file that has no name.
+std::string procPath(const Descriptor& file) {
   return "/proc/self/fd/" + std::to_string(file.value());
 }
 
@@ -60,7 +63,7 @@ NewFile::NewFile(int folder, const std::string& path)
 
 NewFile::NewFile(const std::string& path, Descriptor folder)
     : path_(path), name_(nameOf(path)), maker_(effectiveIds()), folder_(std::move(folder)) {
-  if (!folder_.isOpen()) cannot("make a file beside " + path_);
+  if (!folder_.isOpen()) throwCannot("make a file beside " + path_);
   requireFreeName();
   makeUnnamed();
 }
@@ -80,15 +83,15 @@ void NewFile::requireFreeName() const {
     throw Failure(ExitCode::kUsage, path_ + " exists, and no file is ever replaced");
 }
 
-// The kernel removes such a file when the process ends. publish() names it through /proc; without
-// /proc makeNamed() is used.
+// The kernel removes such a file when the process ends. publish() names it through /proc; if there
+// is no /proc, makeNamed() makes the file.
 void NewFile::makeUnnamed() {
   Descriptor file(openat(folder_.value(), ".", O_TMPFILE | O_RDWR | O_CLOEXEC, kMode));
   struct stat status;
-  if (file.isOpen() && stat(shownAs(file).c_str(), &status) == 0)
+  if (file.isOpen() && stat(procPath(file).c_str(), &status) == 0)
     file_ = std::move(file);
   else if (!file.isOpen() && errno != EOPNOTSUPP && errno != EISDIR && errno != EINVAL)
-    cannot("make a file beside " + path_);
+    throwCannot("make a file beside " + path_);
 }
 
 void NewFile::makeNamed() {
@@ -98,7 +101,7 @@ void NewFile::makeNamed() {
   const ActingAs maker(maker_);
   file_ = Descriptor(openat(folder_.value(), temporary_.c_str(),
                             O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kMode));
-  if (!file_.isOpen()) cannot("make a file beside " + path_);
+  if (!file_.isOpen()) throwCannot("make a file beside " + path_);
 }
 
 void NewFile::append(const char* bytes, std::size_t count) {
@@ -106,7 +109,7 @@ void NewFile::append(const char* bytes, std::size_t count) {
   while (count > 0) {
     const ssize_t written = write(file_.value(), bytes, count);
     if (written < 0 && errno == EINTR) continue;
-    if (written <= 0) cannot("write " + path_);
+    if (written <= 0) throwCannot("write " + path_);
     bytes += written;
     count -= static_cast<std::size_t>(written);
   }
@@ -118,33 +121,33 @@ std::string NewFile::contents() const {
   ssize_t count = 0;
   while ((count = pread(file_.value(), block, sizeof block, static_cast<off_t>(bytes.size()))) > 0)
     bytes.append(block, static_cast<std::size_t>(count));
-  if (count < 0) cannot("read " + path_ + " again");
+  if (count < 0) throwCannot("read " + path_ + " again");
   return bytes;
 }
 
 void NewFile::publish() {
-  if (fsync(file_.value()) != 0) cannot("bring " + path_ + " to the disk");
+  if (fsync(file_.value()) != 0) throwCannot("bring " + path_ + " to the disk");
   if (!temporary_.empty() && isInterrupted())
     throw Failure(ExitCode::kAttention, "interrupted, " + path_ + " was not made");
   {
     const ActingAs maker(maker_);
-    if (!name() && (errno == EEXIST || !nameTemporary())) {
+    if (!linkByDescriptor() && (errno == EEXIST || !renameTemporary())) {
       if (errno == EEXIST) requireFreeName();
-      cannot("name the file " + path_);
+      throwCannot("name the file " + path_);
     }
   }
-  if (fsync(folder_.value()) != 0) cannot("bring " + path_ + " to the disk");
+  if (fsync(folder_.value()) != 0) throwCannot("bring " + path_ + " to the disk");
 }
 
-// By the descriptor: a temporary name may be somebody else's file by now.
-bool NewFile::name() const {
-  return linkat(AT_FDCWD, shownAs(file_).c_str(), folder_.value(), name_.c_str(),
+// Uses the descriptor: the temporary name may belong to another file by now.
+bool NewFile::linkByDescriptor() const {
+  return linkat(AT_FDCWD, procPath(file_).c_str(), folder_.value(), name_.c_str(),
                 AT_SYMLINK_FOLLOW) == 0;
 }
 
-// For a file system where no file has two names, and where there is no /proc. Checks
-// afterwards that the name leads to our file.
-bool NewFile::nameTemporary() {
+// For a file system without second names, or a system without /proc. Checks afterwards that the
+// name is that of our file.
+bool NewFile::renameTemporary() {
   const int folder = folder_.value();
   const char *const from = temporary_.c_str(), *const to = name_.c_str();
   if (temporary_.empty() || (renameat2(folder, from, folder, to, RENAME_NOREPLACE) != 0 &&

@@ -1,51 +1,53 @@
-// A file that appears under its name only when it is whole, and never in another one's place.
+// A new file that gets its name only when it is complete, and never replaces another file.
 //
-// It is written and read through the descriptor that made it, and named relative to a folder that
-// stays open. So nobody who can write to that folder can put another file in its place.
+// It is written and read through one descriptor, and named relative to a folder that stays open. So
+// nobody who can write to that folder can put another file in its place.
 
 #pragma once
 
 #include <csignal>
 #include <string>
 
+#include "database/effective_ids.h"
 #include "descriptor.h"
-#include "effective_ids.h"
 
 namespace oauthctl {
 
 class NewFile {
  public:
-  // A file of mode 0600, made and named with the ids that the process has now. Throws if the name
-  // is taken.
+  // Makes a file of mode 0600. It is made and named with the current ids of the process. Throws if
+  // the name is taken.
   explicit NewFile(const std::string& path);
-  // The same in a folder that is open already; the path is for messages, its last part the name.
+  // The same in a folder that is open already. The last part of the path is the name; messages show
+  // all of it.
   NewFile(int folder, const std::string& path);
-  // Removes it, unless it was published. A signal that ends the program leaves nothing either.
+  // Removes the file, unless it was published. A signal that ends the program leaves nothing
+  // either.
   ~NewFile();
   NewFile(const NewFile&) = delete;
   NewFile& operator=(const NewFile&) = delete;
 
   void append(const char* bytes, std::size_t count);
   void append(const std::string& bytes) { append(bytes.data(), bytes.size()); }
-  // What a reader will find in it.
+  // Reads the file again.
   std::string contents() const;
-  // Brings its contents to the disk and gives it its name. Throws if the name has been taken.
+  // Writes the contents to the disk and gives the file its name. Throws if the name has been taken.
   void publish();
 
  private:
-  NewFile(const std::string& path, Descriptor folder);
+  NewFile(const std::string& path, ZEVOOAUTHSERVER::Descriptor folder);
   void requireFreeName() const;
   void makeUnnamed();
   void makeNamed();
-  bool name() const;
-  bool nameTemporary();
+  bool linkByDescriptor() const;
+  bool renameTemporary();
 
   const std::string path_, name_;
   const Ids maker_;
-  const Descriptor folder_;
-  Descriptor file_;
-  // Its temporary name, where the file system cannot make a file without one. Signals that end the
-  // program are held until that name is gone.
+  const ZEVOOAUTHSERVER::Descriptor folder_;
+  ZEVOOAUTHSERVER::Descriptor file_;
+  // The temporary name, if the file system cannot make a file without a name. Signals that end the
+  // program are blocked until that name is gone.
   std::string temporary_;
   sigset_t signalsBefore_ = {};
 };

@@ -1,52 +1,59 @@
-#include "registry.h"
+#include "database/registry.h"
 
-#include "exit_code.h"
-#include "human_time.h"
-#include "masking.h"
+#include "decimal_text.h"
 #include "oauth_utils.h"
+#include "terminal/escaping.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
+
+namespace column = names::column;
+
 namespace {
 
-constexpr std::size_t kIdentifierLength = 64, kLongestNumber = 18;
-
 bool isRowNumber(const std::string& text) {
-  return !text.empty() && text.size() <= kLongestNumber &&
+  constexpr std::size_t kLongest = 18;  // digits
+  return !text.empty() && text.size() <= kLongest &&
          text.find_first_not_of("0123456789") == std::string::npos;
 }
 
-}  // namespace
+bool isClientIdentifier(const std::string& text) {
+  return text.size() == static_cast<std::size_t>(names::limit::kClientId.max);
+}
 
-bool isClientIdentifier(const std::string& text) { return text.size() == kIdentifierLength; }
+bool isEnabled(const Json::Value& row) { return row[column::kEnable].asString() == "1"; }
+
+}  // namespace
 
 long long rowNumber(const std::string& text) {
   if (!isRowNumber(text))
     throw Failure(ExitCode::kUsage, "'" + text + "' is no row number: give one from the list");
-  return *number(text);
+  return *ZEVOOAUTHSERVER::decimalNumber(text);
 }
 
 Json::Value findClient(Database& database, const std::string& text) {
   Json::Value condition;
   if (isClientIdentifier(text))
-    condition["client_id"] = getSQLFormatStr(text);
+    condition[column::kClientId] = getSQLFormatStr(text);
   else if (isRowNumber(text))
-    condition["id"] = text;
+    condition[column::kId] = text;
   else
-    throw Failure(ExitCode::kUsage,
-                  "'" + text + "' names no client: give its number or its 64 characters");
-  const Json::Value rows = database.rows(kClientTable, condition);
+    throw Failure(ExitCode::kUsage, "'" + text + "' names no client: give its number or its " +
+                                        std::to_string(names::limit::kClientId.max) +
+                                        " characters");
+  const Json::Value rows = database.rows(names::table::kClientInfo, condition);
   if (rows.empty()) throw Failure(ExitCode::kAttention, "there is no client " + text);
   return rows[0U];
 }
 
 std::string clientIdentifier(Database& database, const std::string& text) {
   if (isClientIdentifier(text)) return text;
-  return findClient(database, text)["client_id"].asString();
+  return findClient(database, text)[column::kClientId].asString();
 }
 
 Registry::Registry(Database& database) {
-  for (const Json::Value& row : database.rows(kClientTable))
-    rows_[row["client_id"].asString()] = row;
+  for (const Json::Value& row : database.rows(names::table::kClientInfo))
+    rows_[row[column::kClientId].asString()] = row;
 }
 
 const Json::Value& Registry::row(const std::string& identifier) const {
@@ -57,18 +64,18 @@ const Json::Value& Registry::row(const std::string& identifier) const {
 std::string Registry::describe(const std::string& identifier) const {
   const Json::Value& client = row(identifier);
   if (client.isNull()) return "not registered";
-  return asGiven(client["display_name"].asString()) + " (" + client["id"].asString() +
-         (client["enable"].asString() == "1" ? ")" : ", disabled)");
+  return originalText(client[column::kDisplayName].asString()) + " (" +
+         client[column::kId].asString() + (isEnabled(client) ? ")" : ", disabled)");
 }
 
 Json::Value clientDocument(const Json::Value& row, bool showSecrets) {
   Json::Value document;
   document["id"] = idValue(row);
-  document["enabled"] = row["enable"].asString() == "1";
-  document["client_id"] = row["client_id"];
-  document["client_secret"] = masked(row["client_secret"].asString(), showSecrets);
-  for (const char* const column : {"display_name", "redirect_uri", "scope"})
-    document[column] = asGiven(row[column].asString());
+  document["enabled"] = isEnabled(row);
+  document["client_id"] = row[column::kClientId];
+  document["client_secret"] = masked(row[column::kClientSecret].asString(), showSecrets);
+  for (const char* const name : {column::kDisplayName, column::kRedirectUri, column::kScope})
+    document[name] = originalText(row[name].asString());
   return document;
 }
 

@@ -1,4 +1,4 @@
-// The registered clients, as the other commands ask for them.
+// The registered clients, as the other commands need them.
 
 #pragma once
 
@@ -7,19 +7,16 @@
 #include <map>
 #include <string>
 
-#include "database.h"
+#include "database/database.h"
 
 namespace oauthctl {
 
-// An operator names a client by its row number, 1 to 18 digits, or by its identifier, 64
-// characters: no text can be both.
-bool isClientIdentifier(const std::string& text);
-
-// The client's row; throws if there is none or the text names none.
+// The row of a client; throws if there is none. The operator gives its row number, of 1 to 18
+// digits, or its identifier, which is longer: no text can be both.
 Json::Value findClient(Database& database, const std::string& text);
 
-// The identifier for a condition on codes or tokens. One of 64 characters need not be registered:
-// codes and tokens survive their client.
+// The identifier for a condition on codes or tokens. An identifier need not be registered: codes
+// and tokens may outlive their client.
 std::string clientIdentifier(Database& database, const std::string& text);
 
 // Rows by identifier.
@@ -39,7 +36,7 @@ class Registry {
 // The row as a document: numbers as numbers, the secret masked unless it is to be shown.
 Json::Value clientDocument(const Json::Value& row, bool showSecrets);
 
-// A number that the operator gave, as in "token show N".
+// A row number that the operator gave, as in "token show N".
 long long rowNumber(const std::string& text);
 
 }  // namespace oauthctl

@@ -1,4 +1,4 @@
-#include "sqlite_connection.h"
+#include "database/sqlite_connection.h"
 
 #include <chrono>
 #include <thread>
@@ -6,11 +6,11 @@
 namespace oauthctl {
 namespace {
 
-// SQLite's own waiting sleeps up to a tenth of a second at a time, in which programs that write all
-// the time pass the lock to one another. One operator may ask more often.
-constexpr int kPause = 2, kLongest = 5000;  // milliseconds
+// SQLite's own busy handler sleeps up to a tenth of a second at a time. Meanwhile programs that
+// write all the time could pass the lock to one another, so this one asks more often.
+constexpr int kPause = 2, kLongestWait = 5000;  // milliseconds
 int waitForLock(void* /*context*/, int times) {
-  if (times >= kLongest / kPause) return 0;
+  if (times >= kLongestWait / kPause) return 0;
   std::this_thread::sleep_for(std::chrono::milliseconds(kPause));
   return 1;
 }
@@ -26,7 +26,7 @@ SqliteConnection::SqliteConnection(const std::string& path, int flags) {
   const int code = sqlite3_open_v2(path.c_str(), &handle, flags, nullptr);
   handle_.reset(handle);
   if (code != SQLITE_OK) fail(code);
-  // Whoever made the file also wrote its schema.
+  // The schema may be hostile: it comes with the file.
   sqlite3_db_config(handle, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
   sqlite3_db_config(handle, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
   sqlite3_busy_handler(handle, waitForLock, nullptr);

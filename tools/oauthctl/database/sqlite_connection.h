@@ -1,5 +1,5 @@
-// A connection of SQLite's own, for what the library does not offer: copying and checking whole
-// databases.
+// A direct connection to SQLite, to copy and check whole databases. The library offers no such
+// operation.
 
 #pragma once
 
@@ -26,13 +26,14 @@ class SqliteError : public std::runtime_error {
 
 class SqliteConnection {
  public:
-  // Waits for other programs about as long as the library does. flags as for sqlite3_open_v2().
+  // Waits for other programs about as long as the library does. The flags are those of
+  // sqlite3_open_v2().
   SqliteConnection(const std::string& path, int flags);
 
   sqlite3* handle() const { return handle_.get(); }
 
   void run(const std::string& sql);
-  // Rows of texts; an SQL NULL is "".
+  // Rows of texts; an SQL NULL becomes "".
   using Row = std::vector<std::string>;
   std::vector<Row> rows(const std::string& sql);
   // The first value of the first row, "" if there is none.

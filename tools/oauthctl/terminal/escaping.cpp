@@ -1,4 +1,4 @@
-#include "escaping.h"
+#include "terminal/escaping.h"
 
 #include <langinfo.h>
 
@@ -10,10 +10,10 @@
 namespace oauthctl {
 namespace {
 
-bool terminalTakesUtf8() { return std::strcmp(nl_langinfo(CODESET), "UTF-8") == 0; }
+bool terminalUsesUtf8() { return std::strcmp(nl_langinfo(CODESET), "UTF-8") == 0; }
 
-// "\\x1b": a backslash, what kind of number follows, and its hexadecimal digits.
-std::string spelt(char kind, int digits, unsigned value) {
+// A backslash, the letter for the kind of number, and hexadecimal digits: "\x1b".
+std::string escapeSequence(char kind, int digits, unsigned value) {
   char buffer[16];
   std::snprintf(buffer, sizeof buffer, "\\%c%0*x", kind, digits, value);
   return buffer;
@@ -24,8 +24,9 @@ struct Character {
   int length;  // bytes; 0 if there is no valid character
 };
 
-// Neither overlong forms, nor surrogates, nor anything beyond Unicode.
-Character decoded(const char* text, const char* end) {
+// The first character of the text. Overlong forms, surrogates and numbers beyond Unicode are not
+// valid.
+Character firstCharacter(const char* text, const char* end) {
   const auto first = static_cast<unsigned char>(*text);
   if (first < 0x80) return {first, 1};
   const int length = first >= 0xF0 ? 4 : first >= 0xE0 ? 3 : 2;
@@ -42,14 +43,15 @@ Character decoded(const char* text, const char* end) {
   return {code, length};
 }
 
-// Directions, joiners, byte-order marks: they show nothing and make other text lie.
+// Direction marks, joiners and byte-order marks: a terminal shows nothing for them, and they can
+// change how other text looks.
 bool isInvisible(unsigned code) {
   return (code >= 0x200B && code <= 0x200F) || (code >= 0x2028 && code <= 0x202E) ||
          (code >= 0x2060 && code <= 0x206F) || code == 0xFEFF || code == 0x061C || code == 0x00AD ||
          (code >= 0xE0000 && code <= 0xE0FFF);
 }
 
-std::string shown(Character character, const char* bytes) {
+std::string printableForm(Character character, const char* bytes) {
   switch (character.code) {
     case '\n':
       return "\\n";
@@ -62,12 +64,14 @@ std::string shown(Character character, const char* bytes) {
     default:
       break;
   }
-  if (character.code < 0x20 || character.code == 0x7F) return spelt('x', 2, character.code);
+  if (character.code < 0x20 || character.code == 0x7F)
+    return escapeSequence('x', 2, character.code);
   const bool printable =
-      character.code < 0x7F || (terminalTakesUtf8() && !isInvisible(character.code) &&
+      character.code < 0x7F || (terminalUsesUtf8() && !isInvisible(character.code) &&
                                 std::iswprint(static_cast<std::wint_t>(character.code)) != 0);
   if (printable) return {bytes, static_cast<std::size_t>(character.length)};
-  return character.code > 0xFFFF ? spelt('U', 8, character.code) : spelt('u', 4, character.code);
+  return character.code > 0xFFFF ? escapeSequence('U', 8, character.code)
+                                 : escapeSequence('u', 4, character.code);
 }
 
 }  // namespace
@@ -76,15 +80,21 @@ std::string escaped(const std::string& text) {
   std::string result;
   const char* const end = text.data() + text.size();
   for (const char* at = text.data(); at != end;) {
-    const Character character = decoded(at, end);
+    const Character character = firstCharacter(at, end);
     if (character.length == 0) {
-      result += spelt('x', 2, static_cast<unsigned char>(*at++));
+      result += escapeSequence('x', 2, static_cast<unsigned char>(*at++));
       continue;
     }
-    result += shown(character, at);
+    result += printableForm(character, at);
     at += character.length;
   }
   return result;
+}
+
+std::string masked(const std::string& secret, bool show) {
+  constexpr std::size_t kShown = 4, kLongEnough = 32;
+  if (show) return secret;
+  return (secret.size() < kLongEnough ? std::string() : secret.substr(0, kShown)) + "...";
 }
 
 void useTextEncoding() { std::setlocale(LC_CTYPE, "C.UTF-8"); }

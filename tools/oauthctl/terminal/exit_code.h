@@ -1,4 +1,4 @@
-// How a command ends: it returns, or it throws a Failure that says why not.
+// How a command ends: it returns, or it throws a Failure that says what went wrong.
 
 #pragma once
 
@@ -10,11 +10,11 @@ namespace oauthctl {
 enum class ExitCode {
   kFine = 0,
   kAttention = 1,   // something needs attention, or was not found
-  kUsage = 2,       // the command cannot be meant like this
+  kUsage = 2,       // wrong usage
   kUnavailable = 3  // the database is busy or cannot be opened
 };
 
-// The one line for standard error, without the program's name.
+// Holds the one line for standard error, without the program's name.
 class Failure : public std::runtime_error {
  public:
   Failure(ExitCode code, const std::string& line) : std::runtime_error(line), code_(code) {}

@@ -1,5 +1,5 @@
-// What the operator asked for: the values of one command's operands and options, by the names that
-// the table of commands gives them.
+// What the operator asked for: the values of one command's operands and options, by their names in
+// the table of commands.
 
 #pragma once
 

@@ -1,4 +1,4 @@
-#include "table_output.h"
+#include "terminal/table_output.h"
 
 #include <json/writer.h>
 #include <libsmartcols.h>
@@ -8,8 +8,8 @@
 #include <memory>
 #include <new>
 
-#include "escaping.h"
-#include "terminal.h"
+#include "terminal/escaping.h"
+#include "terminal/terminal.h"
 
 namespace oauthctl {
 namespace {
@@ -19,7 +19,7 @@ struct FreeTable {
 };
 
 template <class T>
-T* made(T* object) {
+T* orBadAlloc(T* object) {
   if (object == nullptr) throw std::bad_alloc();
   return object;
 }
@@ -35,30 +35,30 @@ const char* colourOf(Tone tone) {
   }
 }
 
-std::string cell(const std::string& text) { return text.empty() ? "-" : escaped(text); }
+std::string cellText(const std::string& text) { return text.empty() ? "-" : escaped(text); }
 
 }  // namespace
 
 void Table::print() const {
   if (rows_.empty()) return;
-  const std::unique_ptr<libscols_table, FreeTable> table(made(scols_new_table()));
+  const std::unique_ptr<libscols_table, FreeTable> table(orBadAlloc(scols_new_table()));
   scols_table_enable_colors(table.get(), wantsColour() ? 1 : 0);
-  // Cells are escaped already, in a way of our own.
+  // Cells are escaped already.
   scols_table_enable_noencoding(table.get(), 1);
   bool headings = false;
   for (const Column& column : columns_) {
     headings |= *column.heading != '\0';
     const int flags = column.rightAligned ? SCOLS_FL_RIGHT : SCOLS_FL_WRAP;
     libscols_column* const added =
-        made(scols_table_new_column(table.get(), column.heading, 0, flags));
+        orBadAlloc(scols_table_new_column(table.get(), column.heading, 0, flags));
     scols_cell_set_color(scols_column_get_header(added), "\x1b[1m");
   }
   scols_table_enable_noheadings(table.get(), headings ? 0 : 1);
   for (const Row& row : rows_) {
-    libscols_line* const line = made(scols_table_new_line(table.get(), nullptr));
+    libscols_line* const line = orBadAlloc(scols_table_new_line(table.get(), nullptr));
     if (const char* const colour = colourOf(row.tone)) scols_line_set_color(line, colour);
     for (std::size_t i = 0; i < row.cells.size(); ++i)
-      if (scols_line_set_data(line, i, cell(row.cells[i]).c_str()) != 0) throw std::bad_alloc();
+      if (scols_line_set_data(line, i, cellText(row.cells[i]).c_str()) != 0) throw std::bad_alloc();
   }
   scols_print_table(table.get());
 }
@@ -74,7 +74,7 @@ void printJson(const Json::Value& document) {
   builder["indentation"] = "  ";
   builder["enableYAMLCompatibility"] = true;  // "key": value
   std::string text = Json::writeString(builder, document);
-  // The one control character that the writer leaves as it is.
+  // The writer escapes every other control character.
   for (std::size_t at = 0; (at = text.find('\x7f', at)) != std::string::npos;)
     text.replace(at, 1, "\\u007f");
   std::printf("%s\n", text.c_str());

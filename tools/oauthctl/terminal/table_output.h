@@ -1,4 +1,4 @@
-// What a command shows: a table for people, or a JSON document for programs.
+// The output of a command: a table for people, or a JSON document for programs.
 
 #pragma once
 
@@ -16,7 +16,7 @@ struct Column {
 
 enum class Tone { kPlain, kFaint, kWarning };
 
-// Columns are aligned, and on a terminal wrapped to its width. Cells are escaped.
+// Columns are aligned, and wrapped to the width of a terminal. Cells are escaped.
 class Table {
  public:
   explicit Table(std::vector<Column> columns) : columns_(std::move(columns)) {}
@@ -24,7 +24,7 @@ class Table {
   void add(std::vector<std::string> cells, Tone tone = Tone::kPlain) {
     rows_.push_back({std::move(cells), tone});
   }
-  // Nothing at all if there is no row.
+  // Prints nothing if there is no row.
   void print() const;
 
  private:
@@ -36,10 +36,10 @@ class Table {
   std::vector<Row> rows_;
 };
 
-// Pairs of a name and a value, one on each line.
+// Prints pairs of a name and a value, one on each line.
 void printPairs(const std::vector<std::pair<std::string, std::string>>& pairs);
 
-// The document in printable ASCII: whatever bytes a value has, what comes out is valid JSON.
+// Prints the document as valid JSON in printable ASCII, whatever bytes its values have.
 void printJson(const Json::Value& document);
 
 }  // namespace oauthctl

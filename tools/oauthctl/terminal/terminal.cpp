@@ -1,4 +1,4 @@
-#include "terminal.h"
+#include "terminal/terminal.h"
 
 #include <termios.h>
 #include <unistd.h>
@@ -7,15 +7,16 @@
 #include <cstdlib>
 #include <utility>
 
-#include "escaping.h"
-#include "exit_code.h"
+#include "terminal/escaping.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
 namespace {
 
-bool somebodyCanAnswer() { return isatty(STDIN_FILENO) != 0 && isatty(STDERR_FILENO) != 0; }
+bool isInteractive() { return isatty(STDIN_FILENO) != 0 && isatty(STDERR_FILENO) != 0; }
 
-// A line without its end; false at the end of the input. Longer lines than any secret are cut.
+// Reads a line without its end; false at the end of the input. A line longer than any secret is
+// cut.
 bool readLine(std::string& line) {
   constexpr std::size_t kLongest = 4096;
   line.clear();
@@ -27,19 +28,19 @@ bool readLine(std::string& line) {
   return true;
 }
 
-class UnseenTyping {
+class EchoOff {
  public:
-  UnseenTyping() {
+  EchoOff() {
     if (tcgetattr(STDIN_FILENO, &before_) != 0) return;
-    termios unseen = before_;
-    unseen.c_lflag &= ~static_cast<tcflag_t>(ECHO);
-    changed_ = tcsetattr(STDIN_FILENO, TCSAFLUSH, &unseen) == 0;
+    termios silent = before_;
+    silent.c_lflag &= ~static_cast<tcflag_t>(ECHO);
+    changed_ = tcsetattr(STDIN_FILENO, TCSAFLUSH, &silent) == 0;
   }
-  ~UnseenTyping() {
+  ~EchoOff() {
     if (changed_) tcsetattr(STDIN_FILENO, TCSAFLUSH, &before_);
   }
-  UnseenTyping(const UnseenTyping&) = delete;
-  UnseenTyping& operator=(const UnseenTyping&) = delete;
+  EchoOff(const EchoOff&) = delete;
+  EchoOff& operator=(const EchoOff&) = delete;
 
  private:
   termios before_ = {};
@@ -57,7 +58,7 @@ void say(const std::string& line) { std::printf("%s\n", escaped(line).c_str()); 
 
 void confirm(const Invocation& invocation, const std::string& question) {
   if (invocation.has("--yes")) return;
-  if (!somebodyCanAnswer())
+  if (!isInteractive())
     throw Failure(ExitCode::kUsage, "nobody is there to ask \"" + question + "\": add --yes");
   std::fprintf(stderr, "%s [y/N] ", escaped(question).c_str());
   std::string answer;
@@ -68,22 +69,22 @@ void confirm(const Invocation& invocation, const std::string& question) {
 
 std::string readSecret(const std::string& prompt) {
   std::string secret;
-  if (!somebodyCanAnswer()) {
+  if (!isInteractive()) {
     readLine(secret);
   } else {
-    const UnseenTyping unseen;
+    const EchoOff echoOff;
     std::fprintf(stderr, "%s: ", prompt.c_str());
     readLine(secret);
     std::fputc('\n', stderr);
   }
   if (secret.empty()) throw Failure(ExitCode::kUsage, "standard input holds no " + prompt);
-  // The library takes a text to end there.
+  // For the library a text ends at its first NUL byte.
   if (secret.find('\0') != std::string::npos)
     throw Failure(ExitCode::kUsage, "the " + prompt + " on standard input holds a NUL byte");
   return secret;
 }
 
-constexpr std::size_t kLongWork = 500;  // steps; less is over before it can be read
+constexpr std::size_t kLongWork = 500;  // steps; shorter work ends before anybody can read the line
 
 Progress::Progress(std::string label, std::size_t total)
     : label_(std::move(label)),

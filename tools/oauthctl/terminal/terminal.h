@@ -1,4 +1,4 @@
-// Dealing with the person at the terminal, if there is one.
+// Talks with the person at the terminal, if there is one.
 
 #pragma once
 
@@ -6,25 +6,26 @@
 #include <cstddef>
 #include <string>
 
-#include "invocation.h"
+#include "terminal/invocation.h"
 
 namespace oauthctl {
 
-// Standard output is a terminal that wants colour: NO_COLOR is unset or empty.
+// Whether standard output is a terminal, and NO_COLOR is unset or empty.
 bool wantsColour();
 
 // Writes one line to standard output, escaped.
 void say(const std::string& line);
 
-// Returns if the operator agrees to what is about to happen, given as a question: by --yes, or by
-// answering on the terminal. Throws otherwise, and where there is nobody to ask.
+// Asks the question, and returns if the operator agrees, by --yes or on the terminal. Throws
+// otherwise, and where there is nobody to ask.
 void confirm(const Invocation& invocation, const std::string& question);
 
-// A secret from standard input, its line end removed: typed unseen on a terminal, or piped. Throws
-// if there is none, or if it holds a NUL byte.
+// Reads a secret from standard input, without its line end. A terminal does not show what is typed.
+// Throws if there is no secret, or if it holds a NUL byte.
 std::string readSecret(const std::string& prompt);
 
-// How far long work has come, on standard error while that is a terminal; gone when it is done.
+// Shows the progress of long work on standard error, if that is a terminal. The destructor erases
+// the line.
 class Progress {
  public:
   Progress(std::string label, std::size_t total);

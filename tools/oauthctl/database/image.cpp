@@ -1,15 +1,19 @@
-#include "database_image.h"
+#include "database/image.h"
 
 #include <memory>
 
-#include "human_time.h"
-#include "terminal.h"
+#include "decimal_text.h"
+#include "oauth_names.h"
+#include "terminal/terminal.h"
 
 namespace oauthctl {
+
+namespace table = ZEVOOAUTHSERVER::names::table;
+
 namespace {
 
-// The two bytes of the header that tell the journal mode. In memory there is no other mode, and
-// what somebody did to a backup must not change how the server's journal works.
+// Sets the two bytes of the header that hold the journal mode. SQLite opens no write-ahead database
+// in memory, and a backup must not change the journal mode of the server.
 void chooseRollbackJournal(std::string& bytes) {
   constexpr std::size_t kWriteVersion = 18, kReadVersion = 19;
   constexpr char kRollback = 1, kWriteAhead = 2;
@@ -20,7 +24,7 @@ void chooseRollbackJournal(std::string& bytes) {
 void requireFittingSize(SqliteConnection& source) {
   const std::string bytes =
       source.value("SELECT page_count * page_size FROM pragma_page_count, pragma_page_size");
-  if (number(bytes).value_or(0) > kLargestDatabase)
+  if (ZEVOOAUTHSERVER::decimalNumber(bytes).value_or(0) > kLargestDatabase)
     throw SqliteError(SQLITE_TOOBIG, "it is too large for a database of the server");
 }
 
@@ -54,8 +58,8 @@ void DatabaseCopy::finish() {
 
 DatabaseImage::DatabaseImage() : memory_(":memory:", SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE) {}
 
-// The source stays in one read transaction: otherwise every commit of another program between two
-// steps would start the copy anew.
+// The source stays in one read transaction: otherwise the copy would start again after every commit
+// of another program.
 DatabaseImage DatabaseImage::ofFile(const std::string& path) {
   DatabaseImage image;
   SqliteConnection source(path, SQLITE_OPEN_READONLY);
@@ -80,25 +84,20 @@ DatabaseImage DatabaseImage::ofBytes(std::string bytes) {
 }
 
 void DatabaseImage::dropGrants() {
-  memory_.run("DELETE FROM oauth_grantCode; DELETE FROM oauth_token;");
+  for (const std::string table : {table::kGrantCode, table::kToken})
+    memory_.run("DELETE FROM " + table);
   compact();
 }
 
 void DatabaseImage::compact() { memory_.run("PRAGMA temp_store = MEMORY; VACUUM;"); }
 
-CipherCount DatabaseImage::countCiphers() {
-  CipherCount count;
-  checkCiphers(memory_, count);
-  return count;
-}
-
 std::string DatabaseImage::summary() {
-  const auto counted = [this](const char* table, const char* word) {
+  const auto countOf = [this](const char* table, const char* word) {
     const std::string count = memory_.value(std::string("SELECT COUNT(*) FROM ") + table);
     return count + " " + word + (count == "1" ? "" : "s");
   };
-  return counted("oauth_clientInfo", "client") + ", " + counted("oauth_grantCode", "code") + ", " +
-         counted("oauth_token", "token") + ", " + counted("oauth_log", "log line");
+  return countOf(table::kClientInfo, "client") + ", " + countOf(table::kGrantCode, "code") + ", " +
+         countOf(table::kToken, "token") + ", " + countOf(table::kLog, "log line");
 }
 
 std::string DatabaseImage::bytes() const {

@@ -1,4 +1,4 @@
-#include "database_folder.h"
+#include "database/folder.h"
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -7,13 +7,13 @@
 #include <cstring>
 #include <sstream>
 
-#include "exit_code.h"
-#include "fixed_paths.h"
+#include "database/fixed_paths.h"
+#include "terminal/exit_code.h"
 
 namespace oauthctl {
 namespace {
 
-[[noreturn]] void unavailable(const std::string& line) {
+[[noreturn]] void throwUnavailable(const std::string& line) {
   throw Failure(ExitCode::kUnavailable, line);
 }
 
@@ -22,36 +22,38 @@ int openFolder(int parent, const std::string& name) {
   if (descriptor >= 0) return descriptor;
   const std::string path = fixed_paths::folder();
   if (errno == ENOENT || errno == ENOTDIR)
-    unavailable("there is no folder " + path + " for the database: is the server installed?");
+    throwUnavailable("there is no folder " + path + " for the database: is the server installed?");
   if (errno == EACCES)
-    unavailable("you may not look into " + path + ": run oauthctl as root or as the server's user");
-  unavailable("cannot open the folder " + path + ": " + std::strerror(errno));
+    throwUnavailable("you may not look into " + path +
+                     ": run oauthctl as root or as the server's user");
+  throwUnavailable("cannot open the folder " + path + ": " + std::strerror(errno));
 }
 
 }  // namespace
 
-// Step by step from the first folder: whoever owns a folder on the way can replace what is below.
-DatabaseFolder::DatabaseFolder(Return way) {
+// Opens one folder after the other, from the first one on: the owner of a folder can replace
+// everything below it.
+DatabaseFolder::DatabaseFolder(RootIds rootIds) {
   std::istringstream names(fixed_paths::folder());
   std::string path;
   for (std::string name; std::getline(names, name, '/');) {
     if (name.empty()) continue;
     path += "/" + name;
     const bool isFirst = !descriptor_.isOpen();
-    descriptor_ =
-        Descriptor(isFirst ? openFolder(AT_FDCWD, path) : openFolder(descriptor_.value(), name));
-    enterFolder(path, way);
+    descriptor_ = ZEVOOAUTHSERVER::Descriptor(isFirst ? openFolder(AT_FDCWD, path)
+                                                      : openFolder(descriptor_.value(), name));
+    enterFolder(path, rootIds);
   }
-  // Others can put files beside the database, whom the folder's sticky bit does not hinder.
+  // Others can put files beside the database. The sticky bit does not prevent that.
   if (isOpenToOthers()) unsafe_ = path;
 }
 
-void DatabaseFolder::enterFolder(const std::string& path, Return way) {
+void DatabaseFolder::enterFolder(const std::string& path, RootIds rootIds) {
   if (fstat(descriptor_.value(), &status_) != 0)
-    unavailable("cannot look at " + path + ": " + std::strerror(errno));
+    throwUnavailable("cannot look at " + path + ": " + std::strerror(errno));
   if (geteuid() != 0) return;
   if (status_.st_uid != 0) {
-    becomeUser(status_.st_uid, status_.st_gid, way);
+    becomeUser(status_.st_uid, status_.st_gid, rootIds);
     user_ = status_.st_uid;
   } else if (isOpenToOthers() && (status_.st_mode & S_ISVTX) == 0) {
     unsafe_ = path;
@@ -62,19 +64,19 @@ bool DatabaseFolder::isOpenToOthers() const { return (status_.st_mode & (S_IWGRP
 
 std::string DatabaseFolder::unsafeForRoot() const { return geteuid() == 0 ? unsafe_ : ""; }
 
-const DatabaseFolder& DatabaseFolder::enter(Return way) {
-  static const DatabaseFolder folder(way);
+const DatabaseFolder& DatabaseFolder::enter(RootIds rootIds) {
+  static const DatabaseFolder folder(rootIds);
   return folder;
 }
 
-std::optional<struct stat> DatabaseFolder::look(const std::string& name) const {
+std::optional<struct stat> DatabaseFolder::lstatOf(const std::string& name) const {
   struct stat status;
   if (fstatat(descriptor_.value(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0)
     return std::nullopt;
   return status;
 }
 
-bool DatabaseFolder::may(const std::string& name, int mode) const {
+bool DatabaseFolder::mayAccess(const std::string& name, int mode) const {
   return faccessat(descriptor_.value(), name.c_str(), mode, AT_EACCESS) == 0;
 }
 
