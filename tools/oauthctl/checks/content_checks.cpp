@@ -17,9 +17,9 @@ namespace table = names::table;
 
 namespace {
 
-// The texts that SQLite stores when the library makes its five tables, byte for byte. They are
-// written out a second time on purpose: texts taken from the library would agree with any change to
-// it.
+// The texts that SQLite stores when the library makes its five tables, byte for byte, and the
+// schema versions. They are written out a second time on purpose: values taken from the library
+// would agree with any change to it.
 const std::map<std::string, std::string> kDefinitions = {
     {"oauth_meta",
      "CREATE TABLE oauth_meta"
@@ -170,14 +170,15 @@ Findings checkCiphers(SqliteConnection& database, CipherCount& count) {
 
 Findings checkExpiries(SqliteConnection& database) {
   Findings findings;
+  const std::string expiry = column::kExpiredTime;
   for (const std::string name : {table::kGrantCode, table::kToken}) {
-    if (!hasColumn(database, name, column::kExpiredTime)) continue;
+    if (!hasColumn(database, name, expiry)) continue;
     std::vector<std::string> wrong;
     for (const SqliteConnection::Row& row :
-         database.rows("SELECT id, expired_time FROM " + name + " ORDER BY id"))
+         database.rows("SELECT id, " + expiry + " FROM " + name + " ORDER BY id"))
       if (!ZEVOOAUTHSERVER::decimalNumber(row[1])) wrong.push_back(row[0]);
     if (!wrong.empty())
-      findings.push_back({"expired_time in " + name + " is no number: " + rowList(wrong),
+      findings.push_back({expiry + " in " + name + " is no number: " + rowList(wrong),
                           "the rows count as expired long ago; purge or revoke them"});
   }
   return findings;

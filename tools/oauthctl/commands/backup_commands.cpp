@@ -33,10 +33,9 @@ DatabaseImage readLive() try {
   if (error.isDamage())
     throw Failure(ExitCode::kAttention, fixed_paths::database() + " is damaged (" + error.what() +
                                             "), no backup was made: see 'oauthctl check'");
-  throw Failure(ExitCode::kUnavailable,
-                error.isBusy() ? "the database is busy, no backup was made: try again"
-                               : std::string("cannot read the database (") + error.what() +
-                                     "), no backup was made: see 'oauthctl check'");
+  throwUnavailable(error.isBusy() ? "the database is busy, no backup was made: try again"
+                                  : std::string("cannot read the database (") + error.what() +
+                                        "), no backup was made: see 'oauthctl check'");
 }
 
 // Reads the new file back and checks that it is a sound database.

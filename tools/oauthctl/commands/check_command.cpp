@@ -21,10 +21,9 @@ void runCheck(Findings& findings, Check check) {
   try {
     append(findings, check());
   } catch (const SqliteError& error) {
-    if (error.isBusy()) throw Failure(ExitCode::kUnavailable, "the database is busy, try again");
+    if (error.isBusy()) throwUnavailable("the database is busy, try again");
     if (!error.isDamage())
-      throw Failure(ExitCode::kUnavailable,
-                    "cannot read " + fixed_paths::database() + ": " + error.what());
+      throwUnavailable("cannot read " + fixed_paths::database() + ": " + error.what());
     const Finding damage = {std::string("cannot be read: ") + error.what(), "restore a backup"};
     if (findings.empty() || findings.back().problem != damage.problem) findings.push_back(damage);
   }

@@ -102,18 +102,11 @@ void setEnabled(const Invocation& invocation, bool enabled) {
   say("client " + row[column::kId].asString() + (enabled ? " is enabled" : " is disabled"));
 }
 
-}  // namespace
+std::string grantsText(int codes, int tokens) {
+  return countText(codes, kCodes) + " and " + countText(tokens, kTokens);
+}
 
-void listClients(const Invocation& invocation) {
-  Database database(Access::kRead);
-  const bool showSecrets = invocation.has("--show-secrets");
-  Json::Value documents(Json::arrayValue);
-  for (const Json::Value& row : database.rows(names::table::kClientInfo))
-    documents.append(clientDocument(row, showSecrets));
-  if (invocation.has("--json")) {
-    printJson(documents);
-    return;
-  }
+void printClients(const Json::Value& documents, bool showSecrets) {
   std::vector<Column> columns = {{"ID", true}, {"NAME"}, {"ENABLED"}, {"REDIRECT URI"}, {"SCOPE"}};
   if (showSecrets) columns.insert(columns.end(), {{"CLIENT ID"}, {"CLIENT SECRET"}});
   Table table(columns);
@@ -128,6 +121,21 @@ void listClients(const Invocation& invocation) {
     table.add(cells, enabled ? Tone::kPlain : Tone::kFaint);
   }
   table.print();
+}
+
+}  // namespace
+
+void listClients(const Invocation& invocation) {
+  Database database(Access::kRead);
+  const bool showSecrets = invocation.has("--show-secrets");
+  Json::Value documents(Json::arrayValue);
+  for (const Json::Value& row : database.rows(names::table::kClientInfo))
+    documents.append(clientDocument(row, showSecrets));
+  if (invocation.has("--json")) {
+    printJson(documents);
+    return;
+  }
+  printClients(documents, showSecrets);
   if (documents.empty()) say("no clients");
 }
 
@@ -197,11 +205,8 @@ void deleteClient(const Invocation& invocation) {
   const long long id = idForChange(row);
   const std::string identifier = row[column::kClientId].asString();
   const bool withTokens = invocation.has("--with-tokens");
-  const auto grants = [&](int codes, int tokens) {
-    return countText(codes, kCodes) + " and " + countText(tokens, kTokens);
-  };
-  const std::string held = grants(countOfClient(database, kCodes, identifier),
-                                  countOfClient(database, kTokens, identifier));
+  const std::string held = grantsText(countOfClient(database, kCodes, identifier),
+                                      countOfClient(database, kTokens, identifier));
   confirm(invocation, "Delete client " + row[column::kId].asString() + ", '" +
                           originalText(row[column::kDisplayName].asString()) + "'" +
                           (withTokens ? ", with its " + held : "; its " + held + " stay valid") +
@@ -215,7 +220,7 @@ void deleteClient(const Invocation& invocation) {
     tokens = removeOfClient(database, kTokens, identifier);
   });
   say("deleted client " + row[column::kId].asString() +
-      (withTokens ? ", " + grants(codes, tokens)
+      (withTokens ? ", " + grantsText(codes, tokens)
                   : "; its " + held + " stay valid, 'oauthctl token revoke --client " + identifier +
                         "' ends its logins"));
 }

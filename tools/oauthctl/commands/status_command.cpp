@@ -171,6 +171,12 @@ Json::Value fileDocument(const FileFacts& facts) {
   return document;
 }
 
+Json::Value stringArray(const std::vector<std::string>& texts) {
+  Json::Value array(Json::arrayValue);
+  for (const std::string& text : texts) array.append(text);
+  return array;
+}
+
 }  // namespace
 
 void showStatus(const Invocation& invocation) {
@@ -185,8 +191,7 @@ void showStatus(const Invocation& invocation) {
     document["database"] = fileDocument(file);
     document["tables"] = tableDocuments(tables);
     document["settings"] = settingsDocument(settings);
-    document["warnings"] = Json::arrayValue;
-    for (const std::string& warning : warnings) document["warnings"].append(warning);
+    document["warnings"] = stringArray(warnings);
     printJson(document);
   } else {
     printTables(tables, now);

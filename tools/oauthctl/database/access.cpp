@@ -14,10 +14,6 @@
 namespace oauthctl {
 namespace {
 
-[[noreturn]] void throwUnavailable(const std::string& line) {
-  throw Failure(ExitCode::kUnavailable, line);
-}
-
 // The remedy is for root, who works here with the ids of the folder's owner.
 [[noreturn]] void throwNotAllowed(const std::string& what, const std::string& remedy) {
   const DatabaseFolder& folder = DatabaseFolder::enter();

@@ -16,19 +16,16 @@ namespace request = names::request;
 
 void requireReady(const OAUTHDBBasic& store) {
   if (store.GetErrCode() == ZEVOOAUTHSERVER::kErrNone) return;
-  throw Failure(ExitCode::kUnavailable, fixed_paths::database() + " is busy or cannot be used (" +
-                                            store.GetErrMsg() +
-                                            "): try again, then 'oauthctl check'");
+  throwUnavailable(fixed_paths::database() + " is busy or cannot be used (" + store.GetErrMsg() +
+                   "): try again, then 'oauthctl check'");
 }
 
 void throwReason(const OAUTHDBBasic& store, const std::string& operation) {
   const int code = store.GetErrCode();
   if (code == SQLITE_BUSY || code == SQLITE_LOCKED)
-    throw Failure(ExitCode::kUnavailable,
-                  "the database is busy, nothing changed: cannot " + operation + ", try again");
-  throw Failure(ExitCode::kUnavailable, "cannot " + operation + ": " + store.GetErrMsg() + " [" +
-                                            std::to_string(code) +
-                                            "], see the system log and 'oauthctl check'");
+    throwUnavailable("the database is busy, nothing changed: cannot " + operation + ", try again");
+  throwUnavailable("cannot " + operation + ": " + store.GetErrMsg() + " [" + std::to_string(code) +
+                   "], see the system log and 'oauthctl check'");
 }
 
 bool attempt(OAUTHDBBasic& store, const std::string& operation, const std::function<bool()>& body) {

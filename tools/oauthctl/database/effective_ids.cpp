@@ -23,6 +23,11 @@ bool setEffectiveIds(Ids ids) {
          setresgid(kKeep, ids.group, kKeep) == 0 && setresuid(kKeep, ids.user, kKeep) == 0;
 }
 
+[[noreturn]] void throwRefused(uid_t user) {
+  throwUnavailable("cannot take the ids of user " + std::to_string(user) + ": " +
+                   std::strerror(errno));
+}
+
 }  // namespace
 
 Ids effectiveIds() { return {geteuid(), getegid()}; }
@@ -36,15 +41,11 @@ void becomeUser(uid_t user, gid_t fallback, RootIds rootIds) {
     return setresgid(group, group, group) == 0 && setresuid(user, user, user) == 0;
   };
   if (!joined || !(rootIds == RootIds::kGiveUp ? setAllIds() : setEffectiveIds({user, group})))
-    throw Failure(ExitCode::kUnavailable, "cannot take the ids of user " + std::to_string(user) +
-                                              ": " + std::strerror(errno));
+    throwRefused(user);
 }
 
 ActingAs::ActingAs(Ids ids) : before_(effectiveIds()) {
-  if (!setEffectiveIds(ids))
-    throw Failure(
-        ExitCode::kUnavailable,
-        "cannot take the ids of user " + std::to_string(ids.user) + ": " + std::strerror(errno));
+  if (!setEffectiveIds(ids)) throwRefused(ids.user);
 }
 
 ActingAs::~ActingAs() {

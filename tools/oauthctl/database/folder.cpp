@@ -13,10 +13,6 @@
 namespace oauthctl {
 namespace {
 
-[[noreturn]] void throwUnavailable(const std::string& line) {
-  throw Failure(ExitCode::kUnavailable, line);
-}
-
 int openFolder(int parent, const std::string& name) {
   const int descriptor = openat(parent, name.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
   if (descriptor >= 0) return descriptor;

@@ -128,8 +128,7 @@ std::string replaceLiveDatabase(DatabaseImage& image) {
     makeNew(image);
     return {};
   } catch (const SqliteError& error) {
-    if (error.isBusy())
-      throw Failure(ExitCode::kUnavailable, "the database is busy, nothing changed: try again");
+    if (error.isBusy()) throwUnavailable("the database is busy, nothing changed: try again");
     if (!error.isDamage())
       throw Failure(ExitCode::kAttention,
                     std::string("cannot restore, nothing changed: ") + error.what());

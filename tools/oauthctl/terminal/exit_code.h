@@ -24,4 +24,8 @@ class Failure : public std::runtime_error {
   ExitCode code_;
 };
 
+[[noreturn]] inline void throwUnavailable(const std::string& line) {
+  throw Failure(ExitCode::kUnavailable, line);
+}
+
 }  // namespace oauthctl
