@@ -1,14 +1,14 @@
-// Times every operation beside its floor, or counts their instructions under callgrind.
+// Measures the time of every operation and its floor, or counts their instructions under callgrind.
 //
-//   bench [GOOGLE BENCHMARK OPTION...]   median of the wall times, in microseconds
-//   bench --instructions [NAME...]       the operations named, or all: prints the name, and leaves
-//                                        a dump "<operation>/<side>/<runs>" of callgrind for each
-//                                        side
-//   bench --sizes                        the same at more sizes, for the plot
+//   bench [GOOGLE BENCHMARK OPTION...]   prints the median of the wall times, in microseconds
+//   bench --instructions [NAME...]       counts the named operations, or all: prints each name, and
+//                                        leaves a dump "<operation>/<side>/<runs>" of callgrind for
+//                                        each side
+//   bench --sizes                        counts operations at more sizes, for the plot
 //
-// Both sides of an operation, "<operation>/library" and "<operation>/floor", run in one process,
-// each operation in a process of its own: what it costs depends on what the heap went through, and
-// callers are short-lived programs. scripts/bench.sh runs all of it.
+// Both sides of an operation, "<operation>/library" and "<operation>/floor", run in one process.
+// Each operation runs in a process of its own, because its cost depends on what happened in the
+// heap before, and callers are short-lived programs. scripts/bench.sh runs all of it.
 
 #include <benchmark/benchmark.h>
 #include <sys/wait.h>
@@ -26,7 +26,7 @@ namespace {
 
 using Run = std::function<bool()>;
 
-// Runs the body, which answers an exit code, in a child process; false unless that is 0.
+// Runs the body in a child process. The body returns an exit code; returns false unless that is 0.
 template <class Body>
 bool inChild(Body body) {
   const pid_t child = fork();
@@ -39,13 +39,13 @@ bool inChild(Body body) {
     } catch (const std::exception& error) {
       std::cerr << "bench: " << error.what() << '\n';
     }
-    _exit(code);  // without the destructors, which are the parent's
+    _exit(code);  // runs no destructors, which are the parent's
   }
   int status = 0;
   return waitpid(child, &status, 0) == child && WIFEXITED(status) && WEXITSTATUS(status) == 0;
 }
 
-// Measures each operation in a child process, and has its database made in another one before.
+// Measures each operation in a child process. Another child process makes its database before.
 template <class Measure>
 bool eachInChild(Sandbox& sandbox, const std::vector<Operation>& all, Measure measure) {
   for (const Operation& operation : all) {
@@ -70,7 +70,7 @@ class Medians : public benchmark::BenchmarkReporter {
   }
 };
 
-// Times only run(), not what puts the database back.
+// Measures only the time of run(), not of restoring the database.
 void time(benchmark::State& state, Sandbox& sandbox, const Operation& operation,
           const Side& side) try {
   sandbox.layOut(operation.rows);
@@ -104,12 +104,12 @@ int timeBothSides(Sandbox& sandbox, const Operation& operation, int argc, char**
 
 // --- Instructions ---
 
-// What makes the counts the same from run to run: rows, their secrets and those that are drawn
-// while counting are fixed, every run starts from a fresh copy of the database, and a run that is
-// not counted goes before, which binds symbols and fills what is made once. Several runs even out
-// what the allocator makes of the holes in its heap, about 1 %. Instructions are those of the
-// process: neither the kernel's nor its caches' state shows, and callgrind places the process alike
-// every time.
+// The counts are the same from run to run for these reasons. The rows, their secrets, and the
+// secrets that are drawn while counting are fixed. Every run starts from a fresh copy of the
+// database. A first run, which is not counted, binds symbols and makes what is made only once.
+// Several runs even out the allocator's search in its heap, about 1 %. Only instructions of the
+// process are counted, so the kernel and its caches have no effect, and callgrind gives the process
+// the same addresses every time.
 void count(Sandbox& sandbox, const Operation& operation, const Side& side) {
   sandbox.layOut(operation.rows);
   const Work work = side.prepare();
@@ -134,7 +134,7 @@ int countBothSides(Sandbox& sandbox, const Operation& operation) {
   return 0;
 }
 
-// The operations with these names; all without names.
+// The operations with these names, or all if there are no names.
 std::vector<Operation> named(const std::vector<std::string>& names) {
   if (names.empty()) return operations();
   std::vector<Operation> result;

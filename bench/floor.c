@@ -118,7 +118,7 @@ static const char* text_of(sqlite3_stmt* statement, int column) {
   return (const char*)sqlite3_column_text(statement, column);
 }
 
-/* Copies the columns wanted of the row that the statement stands on. */
+/* Copies the wanted columns of the statement's current row. */
 static int add_row(sqlite3_stmt* statement, const int* wanted, int columns,
                    struct floor_rows* rows) {
   const char* text[FLOOR_COLUMNS];
@@ -151,7 +151,7 @@ void floor_free(struct floor_rows* rows) {
   memset(rows, 0, sizeof *rows);
 }
 
-/* Every row that the statement delivers, all columns. */
+/* Copies every row that the statement delivers, with all columns. */
 static int collect(sqlite3_stmt* statement, struct floor_rows* out) {
   static const int all[FLOOR_COLUMNS] = {0, 1, 2, 3, 4, 5, 6, 7, 8, 9};
   const int columns = sqlite3_column_count(statement);
@@ -236,8 +236,8 @@ int floor_read_tokens(sqlite3* db, struct floor_rows* out) {
   return collect_where(db, "SELECT * FROM oauth_token;", NULL, out);
 }
 
-/* First all the expired rows, then the deletions, as the library does it: no row is deleted below
- * a statement that still reads. */
+/* Finds all expired rows before the first deletion, as the library does. So no row is deleted while
+ * a statement still reads. */
 static int find_expired(sqlite3* db, sqlite3_int64** ids, size_t* count) {
   const sqlite3_int64 now = time(NULL);
   sqlite3_stmt* read = NULL;
@@ -257,7 +257,7 @@ static int find_expired(sqlite3* db, sqlite3_int64** ids, size_t* count) {
   return finalize(read, code == SQLITE_DONE);
 }
 
-/* Each row by a statement of its own, as the library does it. */
+/* Deletes each row by a statement of its own, as the library does. */
 static int delete_rows(sqlite3* db, const sqlite3_int64* ids, size_t count) {
   char sql[64];
   int done = 1;

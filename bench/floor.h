@@ -1,5 +1,5 @@
-/* What the library does, by hand: a C program that runs the same statements on the same file with
- * the same durability, and leaves out JSON, settings, encryption, checks of arguments and logging.
+/* Does by hand what the library does: runs the same statements on the same file with the same
+ * durability. It has no JSON, settings, encryption, checks of arguments or logging.
  *
  * Functions return 1 on success and 0 on failure. */
 
@@ -12,13 +12,13 @@
 extern "C" {
 #endif
 
-/* Opens the database and makes sure of the tables; NULL on failure. */
+/* Opens the database and creates missing tables; NULL on failure. */
 sqlite3* floor_open(void);
 int floor_close(sqlite3* db);
 
-/* 64 hexadecimal digits and a NUL byte: two version-4 UUIDs without hyphens. */
+/* Writes 64 hexadecimal digits and a NUL byte: two version-4 UUIDs without hyphens. */
 int floor_random(char out[65]);
-/* Reads the settings file whole and looks at nothing in it. */
+/* Reads the whole settings file and does not parse it. */
 int floor_settings(void);
 
 struct floor_grant {
@@ -28,10 +28,10 @@ struct floor_client {
   const char *redirect_uri, *scope, *display_name;
 };
 
-/* Rows in memory: the columns' texts, one after another in a block of the row's own. */
+/* Rows in memory. Each row has one block, which holds the texts of its columns. */
 enum { FLOOR_COLUMNS = 10 };
 struct floor_row {
-  char* column[FLOOR_COLUMNS]; /* the first one is the block */
+  char* column[FLOOR_COLUMNS]; /* the first one points to the block */
 };
 struct floor_rows {
   struct floor_row* row;
@@ -39,7 +39,7 @@ struct floor_rows {
 };
 void floor_free(struct floor_rows* rows);
 
-/* User, scope and state of a token that is still valid: one row of three columns. */
+/* Delivers user, scope and state of a valid token: one row of three columns. */
 int floor_verify(sqlite3* db, const char* access_token, struct floor_rows* out);
 int floor_issue(sqlite3* db, const struct floor_grant* grant, int row_max);
 int floor_find_refresh_token(sqlite3* db, const char* refresh_token, struct floor_rows* out);
@@ -50,7 +50,7 @@ int floor_issue_code(sqlite3* db, const struct floor_grant* grant, int row_max, 
 int floor_find_code(sqlite3* db, const char* code, struct floor_rows* out);
 int floor_log(sqlite3* db, const char* message, int log_max);
 
-/* The statements of a program that holds the database open and prepares them once. */
+/* The statements of a program that keeps the database open and prepares them once. */
 struct floor_statements {
   sqlite3_stmt *verify, *count, *issue;
 };

@@ -1,8 +1,8 @@
-// Counts what every operation asks of the machine, one line each with tabs between:
+// Counts what every operation needs from the machine. Prints one line for each, with tabs:
 //
 //   <operation>/<side>  disk syncs  allocations  bytes of memory at the peak
 //
-// and, as the last line, what there is to compare the peak of reading with:
+// The last line is for comparison with the peak of reading all rows:
 //
 //   text of 10000 rows  bytes
 
@@ -21,7 +21,7 @@
 #include "operations.h"
 
 extern "C" {
-// NOLINTBEGIN(bugprone-reserved-identifier): their names are given
+// NOLINTBEGIN(bugprone-reserved-identifier): the C library gives these names
 void* __libc_malloc(std::size_t size) noexcept;
 void* __libc_calloc(std::size_t count, std::size_t size) noexcept;
 void* __libc_realloc(void* block, std::size_t size) noexcept;
@@ -33,17 +33,19 @@ namespace {
 
 struct Footprint {
   long syncs = 0, allocations = 0;
-  std::ptrdiff_t memory = 0, peak = 0;  // above what there was at the beginning
+  std::ptrdiff_t memory = 0, peak = 0;  // bytes more than at the beginning
 };
 Footprint now;
 
-void* taken(void* block) {
+void* counted(void* block) {
   ++now.allocations;
   now.memory += static_cast<std::ptrdiff_t>(malloc_usable_size(block));
   now.peak = std::max(now.peak, now.memory);
   return block;
 }
-void given(void* block) { now.memory -= static_cast<std::ptrdiff_t>(malloc_usable_size(block)); }
+void countFreed(void* block) {
+  now.memory -= static_cast<std::ptrdiff_t>(malloc_usable_size(block));
+}
 
 Footprint measured(const std::function<bool()>& run, bool& done) {
   now = Footprint();
@@ -55,7 +57,7 @@ void print(Sandbox& sandbox, const Operation& operation, const Side& side) {
   sandbox.layOut(operation.rows);
   const Work work = side.prepare();
   Footprint footprint;
-  for (int i = 0; i < 2; ++i)  // the first one makes what is made once
+  for (int i = 0; i < 2; ++i)  // the first run makes what is made only once
     runOnce(sandbox, operation, work, [&footprint](const std::function<bool()>& run) {
       bool done = false;
       footprint = measured(run, done);
@@ -65,7 +67,7 @@ void print(Sandbox& sandbox, const Operation& operation, const Side& side) {
             << footprint.allocations << '\t' << footprint.peak << '\n';
 }
 
-// The rows as a JSON text without blanks.
+// Returns the size of the rows as a JSON text without blanks.
 std::size_t textOfRows(Sandbox& sandbox, int rows) {
   Rows tokens;
   tokens.tokens = rows;
@@ -89,16 +91,16 @@ int main() try {
   return 1;
 }
 
-extern "C" void* malloc(std::size_t size) noexcept { return taken(__libc_malloc(size)); }
+extern "C" void* malloc(std::size_t size) noexcept { return counted(__libc_malloc(size)); }
 extern "C" void* calloc(std::size_t count, std::size_t size) noexcept {
-  return taken(__libc_calloc(count, size));
+  return counted(__libc_calloc(count, size));
 }
 extern "C" void* realloc(void* block, std::size_t size) noexcept {
-  given(block);
-  return taken(__libc_realloc(block, size));
+  countFreed(block);
+  return counted(__libc_realloc(block, size));
 }
 extern "C" void free(void* block) noexcept {
-  given(block);
+  countFreed(block);
   __libc_free(block);
 }
 

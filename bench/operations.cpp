@@ -30,7 +30,7 @@ Side side(const char* name, const Run& run) {
   return {name, [run] { return Work{run, nullptr}; }};
 }
 
-// Opens, runs the body, closes.
+// Opens the database, runs the body, and closes the database.
 template <class Body>
 bool onFloor(Body body) {
   sqlite3* const db = floor_open();
@@ -39,7 +39,7 @@ bool onFloor(Body body) {
   return floor_close(db) == 1 && done;
 }
 
-// The body delivers so many rows.
+// The body must deliver count rows.
 template <class Body>
 bool rowsOnFloor(std::size_t count, Body body) {
   return onFloor([&](sqlite3* db) {
@@ -132,7 +132,7 @@ Operation readAll(int rows) {
       atRows("read all", rows), {rows}, "", 0, {side("library", library), side("floor", floor)}, 1};
 }
 
-// Every other row has expired.
+// Every second row has expired.
 Operation purge(const std::string& name, int rows) {
   const auto library = [] { return OAUTHDBToken(names::table::kToken).Purge() == 1; };
   const auto floor = [] {
@@ -221,7 +221,7 @@ Operation setting() {
 
 // --- A store held open ---
 
-// The floor's connection, with its statements where it keeps them.
+// The floor's connection, with its prepared statements.
 class HeldFloor {
  public:
   HeldFloor() : db_(floor_open()) {
@@ -242,7 +242,7 @@ class HeldFloor {
   sqlite3* const db_;
 };
 
-// Each side on a store of its own, held open; both statements take it.
+// A side that keeps its own store open. Both body and undo use that store.
 template <class Held, class Body>
 Side heldSide(const char* name, std::function<std::shared_ptr<Held>()> open, Body body,
               std::function<void(Held&)> undo) {
@@ -287,7 +287,7 @@ Operation verifyHeld(int rows) {
 }
 
 Operation issueHeld(int rows) {
-  // By the connection that wrote, which then need not read the file again.
+  // The connection that wrote also deletes, so it need not read the file again.
   const std::string undo = "DELETE FROM oauth_token WHERE id>" + std::to_string(rows) + ";";
   const std::function<void(OAUTHDBToken&)> undoInStore = [undo](OAUTHDBToken& tokens) {
     tokens.DBCmd(undo, nullptr, nullptr);

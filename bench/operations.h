@@ -1,4 +1,4 @@
-// What is measured: each operation as callers feel it (construct, operate, destroy), by the library
+// The operations to measure: each as callers see it (construct, operate, destroy), by the library
 // and by hand.
 
 #pragma once
@@ -10,33 +10,33 @@
 
 #include "sandbox.h"
 
-// An operation made ready, with what it holds open; run() is what is measured.
+// An operation that is ready to run, with what it keeps open. run() is measured.
 struct Work {
   std::function<bool()> run;   // true on success
-  std::function<void()> undo;  // of a store held open, where it changes the database
+  std::function<void()> undo;  // for a store held open that changes the database
 };
 
 struct Side {
-  std::string name;  // "library", "floor", or "prepared": the floor with its statements kept
+  std::string name;  // "library", "floor", or "prepared" (the floor with prepared statements)
   std::function<Work()> prepare;
 };
 
 struct Operation {
   std::string name;
   Rows rows;
-  std::string changedTable;  // empty: none
-  int rowsAfter = 0;         // of that table
+  std::string changedTable;  // empty means none
+  int rowsAfter = 0;         // rows of that table
   std::vector<Side> sides;
-  int countedRuns = 20;  // fewer where one run does so much that chance has no share in it
+  int countedRuns = 20;  // fewer if one run is so long that chance has no effect
 };
 
-// Those of the table in docs/performance.md.
+// The operations of the table in docs/performance.md.
 std::vector<Operation> operations();
 // The same at more sizes, for the plot.
 std::vector<Operation> sizes();
 
-// Measures around run(), which must succeed and leave the table as it should; then puts the
-// database back. Throws what went wrong.
+// Measures run(), which must succeed and leave the right number of rows, then restores the
+// database. Throws if something goes wrong.
 template <class Measure>
 void runOnce(Sandbox& sandbox, const Operation& operation, const Work& work, Measure measure) {
   if (!measure(work.run)) throw std::runtime_error(operation.name + ": failed");

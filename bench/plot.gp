@@ -1,4 +1,4 @@
-# Cost against rows, from lines of "operation <tab> rows <tab> library <tab> floor".
+# Plots cost against rows, from lines of "operation <tab> rows <tab> library <tab> floor".
 #
 #   gnuplot -e "data='FILE'; out='FILE.svg'" plot.gp
 

@@ -33,7 +33,7 @@ bool entropyIsFixed = false;
 
 [[noreturn]] void fail(const std::string& what) { throw std::runtime_error("cannot " + what); }
 
-// 64 hexadecimal digits, scattered like those of an entropy source.
+// Returns 64 hexadecimal digits that look random.
 std::string secret(std::uint64_t table, std::uint64_t row) {
   std::string digits;
   std::uint64_t state = (table << 32) + 4 * row;
@@ -51,7 +51,7 @@ std::string secret(std::uint64_t table, std::uint64_t row) {
 
 std::string clientId(int row) { return secret(3, static_cast<std::uint64_t>(row)); }
 
-// Fills one table, a row for each number below count.
+// Fills tables with rows.
 class Filler {
  public:
   explicit Filler(const std::string& path) {
@@ -63,7 +63,7 @@ class Filler {
   Filler(const Filler&) = delete;
   Filler& operator=(const Filler&) = delete;
 
-  // values: the columns of a row in the table's order, without the id
+  // Adds count rows. values(row) gives the columns of a row in the table's order, without the id.
   template <class Values>
   void fill(const char* table, int count, Values values) {
     for (int row = 0; row < count; ++row) {
@@ -91,7 +91,7 @@ void fillTables(const Rows& rows) {
   Filler filler(database);
   const auto user = [](int row) { return "user" + std::to_string(row); };
   filler.fill(names::table::kToken, rows.tokens, [&](int row) {
-    // Expired and valid ones take turns as long as there are expired ones.
+    // Expired and valid tokens alternate until all expired ones are there.
     const bool expired = row % 2 == 0 && row / 2 < rows.expiredTokens;
     return Values{user(row),        clientId(row % 50),
                   "read write",     refreshToken(row),
@@ -106,7 +106,7 @@ void fillTables(const Rows& rows) {
   filler.commit();
 }
 
-// To the disk, so that no write of this is left for what is measured.
+// Writes the copy to the disk, so that no such write happens during a measurement.
 void copy(const std::string& from, const std::string& to) {
   std::filesystem::copy_file(from, to, std::filesystem::copy_options::overwrite_existing);
   const int file = open(to.c_str(), O_RDWR | O_CLOEXEC);
@@ -119,7 +119,8 @@ Function* next(const char* name, Function*) {
   return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
 }
 
-// The database is opened by SQLite alone, whose call is replaced as a whole.
+// The path under which the file is really opened. The database is not here, because only SQLite
+// opens it, and sqlite3_open() is replaced below.
 const char* redirected(const char* path) {
   if (std::strcmp(path, names::path::kSettings) == 0) return settings.c_str();
   if (entropyIsFixed && std::strcmp(path, kEntropyDevice) == 0) return entropy.c_str();
@@ -132,11 +133,11 @@ std::string accessToken(int row) { return secret(1, static_cast<std::uint64_t>(r
 std::string refreshToken(int row) { return secret(2, static_cast<std::uint64_t>(row)); }
 
 Sandbox::Sandbox() {
-  // Decided once per thread: outside of all measurements.
+  // Each thread decides this once. Decide it here, before all measurements.
   if (ZEVOOAUTHSERVER::isDebugEnabled())
     fail(std::string("measure while diagnostics are on: ") + names::path::kDebugMarker);
-  // A folder that lies on a disk, where /tmp may be memory; as deep on every machine, since SQLite
-  // looks at each part of the path.
+  // /tmp may be in memory, so use a folder on a disk. The path has the same depth on every machine,
+  // because SQLite looks at each part of it.
   char path[] = "/var/tmp/zevooauth-bench-XXXXXX";
   if (mkdtemp(path) == nullptr) fail(std::string("make ") + path);
   directory = path;
@@ -195,12 +196,12 @@ extern "C" int open64(const char* path, int flags, ...) {
   static const auto real = next("open64", open64);
   va_list arguments;
   va_start(arguments, flags);
-  const auto mode = va_arg(arguments, unsigned);  // unused by a call that gives none
+  const auto mode = va_arg(arguments, unsigned);  // unused if the call gives no mode
   va_end(arguments);
   return real(redirected(path), flags, mode);
 }
 
-// A cipher that costs next to nothing: what is measured is the library and not the host's.
+// This cipher costs almost nothing: the library is measured, not the host's cipher.
 extern "C" int ZOCLCryptSzEncrypt(const char* plain, char* out, int outSize) {
   const std::size_t size = std::strlen(plain) + 1;
   if (size > static_cast<std::size_t>(outSize)) return 0;
@@ -212,5 +213,5 @@ extern "C" int ZOCLCryptSzDecrypt(const char* cipher, char* out, int outSize) {
 }
 
 extern "C" void syslog(int, const char*, ...) {}
-// What the compiler calls instead where _FORTIFY_SOURCE is set.
+// The compiler calls this one instead if _FORTIFY_SOURCE is set.
 extern "C" void __syslog_chk(int, int, const char*, ...) {}

@@ -1,5 +1,5 @@
-// The main job of the library as a short story: a client, a code and three tokens live their
-// lives on the real database file, and leave it as it was.
+// Shows the main work of the library: creates, uses and ends a client, a code and three tokens in
+// the real database file, and leaves the file as it was.
 
 #include <sqlite3.h>
 #include <unistd.h>
@@ -25,7 +25,7 @@ constexpr char kIp[] = "192.0.2.7";
 
 volatile std::sig_atomic_t interrupted = 0;
 
-// Why the story cannot go on.
+// Why the demo must stop.
 struct Trouble : std::runtime_error {
   using std::runtime_error::runtime_error;
 };
@@ -52,7 +52,7 @@ std::string secondsFromNow(long seconds) {
   return std::to_string(static_cast<long long>(std::time(nullptr)) + seconds);
 }
 
-// Deletes by value, never by row id: an id that is free again may have become somebody else's.
+// Deletes by value, never by row id: the id may have been given to another program's row.
 // True if no such row is left.
 bool removeRow(const std::string& table, const std::string& column, const std::string& value) {
   OAUTHDBBasic store;
@@ -62,7 +62,7 @@ bool removeRow(const std::string& table, const std::string& column, const std::s
   return store.DBDel(request) || store.GetErrCode() == kErrNone;
 }
 
-// The rows that the story made, removed on every way out.
+// The rows that the demo made. The destructor removes them.
 class Traces {
  public:
   ~Traces() { remove(); }
@@ -91,7 +91,7 @@ class Traces {
   std::vector<Row> rows_;
 };
 
-// One row as it lies in the file, encrypted columns and all, past the library.
+// Prints one row as it is stored, with its encrypted columns. Reads the file without the library.
 void showRow(const std::string& table, long long id) {
   sqlite3* db = nullptr;
   sqlite3_open(kDatabase, &db);
@@ -106,7 +106,7 @@ void showRow(const std::string& table, long long id) {
   sqlite3_close(db);
 }
 
-// The newest audit line would push out the oldest one of somebody else.
+// In a full log, the demo's line would push out the oldest line of another program.
 void checkRoomInLog() {
   OAUTHDBLog log("oauth_log");
   const int max = getTableRowMax("log_max");
@@ -200,7 +200,7 @@ void verify(const std::string& who, const Json::Value& accessToken) {
     say(who + ": no, " + result["err_msg"].asString() + " [" + result["err_code"].asString() + "]");
 }
 
-// A refresh token is rotated: whoever revokes the old row may issue the new one.
+// Rotates the refresh token: the process that revokes the old row may issue the new one.
 Json::Value refresh(Traces& traces, const Client& client, const Json::Value& old) {
   title("The album trades its refresh token for new ones");
   {
@@ -216,8 +216,8 @@ Json::Value refresh(Traces& traces, const Client& client, const Json::Value& old
   return issued;
 }
 
-// True if a sweep could take another row too: one that has expired, will within the next minute,
-// or names no plain number.
+// True if a purge could delete another row too: one that has expired, will expire within the next
+// minute, or has an expiry that is not a plain number.
 bool othersMayExpire(OAUTHDBToken& tokens, const std::string& ownAccessToken) {
   Json::Value rows;
   if (!tokens.Get(&rows)) giveUp(tokens, "read the tokens");
@@ -275,7 +275,7 @@ void showLog(const Client& client) {
   }
 }
 
-// True if the story was told and nothing of it is left in the file.
+// True if the demo ran to its end and none of its rows is left in the file.
 bool tell() {
   checkRoomInLog();
   Traces traces;
@@ -305,7 +305,7 @@ bool tell() {
 }  // namespace
 
 int main() {
-  // The rows are removed also when somebody stops the demo or closes its output.
+  // The rows are also removed when somebody stops the demo or closes its output.
   for (const int signal : {SIGINT, SIGTERM, SIGHUP})
     std::signal(signal, [](int) { interrupted = 1; });
   std::signal(SIGPIPE, SIG_IGN);

@@ -14,8 +14,8 @@ namespace ZEVOOAUTHSERVER {
 /// "display_name", "id". Identifier and secret are encrypted in the file and plain in results.
 ///
 /// Lengths in bytes: client_id and client_secret 64; redirect_uri 3 to 2048; scope 1 to 2048;
-/// display_name 1 to 64. Anything else is kErrBadParameters. Refuse texts with a NUL byte before
-/// you call: they are cut there.
+/// display_name 1 to 64. Any other length is kErrBadParameters. Refuse texts with a NUL byte before
+/// you call: the store keeps only the part before it.
 class OAUTHDBClientInfo : public OAUTHDBBasic {
  public:
   /// Opens the database; tabName is "oauth_clientInfo".
@@ -25,15 +25,15 @@ class OAUTHDBClientInfo : public OAUTHDBBasic {
   ///
   /// A leading "https://" or "http://" is removed from redirect_uri before it is checked and
   /// stored. enable is "1" or "0". result gets {"client_id": string, "client_secret": string},
-  /// also when the insert then fails. A full table is kErrTableFull, before any argument is
-  /// looked at.
+  /// even if the insert then fails. A full table is kErrTableFull, which is checked before the
+  /// arguments.
   int Add(const std::string& client_id, const std::string& client_secret,
           const std::string& redirect_uri, const std::string& scope,
           const std::string& display_name, const std::string& enable, Json::Value& result);
-  /// The same for an enabled client, identifier and secret generated.
+  /// The same for an enabled client; identifier and secret are generated.
   int Add(const std::string& redirect_uri, const std::string& scope,
           const std::string& display_name, Json::Value& result);
-  /// The same with the caller's secret; only the identifier is generated.
+  /// The same for an enabled client with the caller's secret; only the identifier is generated.
   int Add(const std::string& client_secret, const std::string& redirect_uri,
           const std::string& scope, const std::string& display_name, Json::Value& result);
 
@@ -55,7 +55,7 @@ class OAUTHDBClientInfo : public OAUTHDBBasic {
   /// Reads every row.
   int Get(Json::Value* out);
 
-  /// Row id of the client, its low 32 bits; 0 for an unknown client or a failed look-up.
+  /// Returns the low 32 bits of the client's row id; 0 for an unknown client or a failed look-up.
   int GetIndex(const std::string& client_id);
 };
 

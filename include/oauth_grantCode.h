@@ -15,8 +15,8 @@ namespace ZEVOOAUTHSERVER {
 ///
 /// Lengths in bytes: username 1 to 256; client_id and code 64; scope and state 1 to 2048;
 /// expired_time 1 to 128. ip is empty or an IPv4 or IPv6 address, with or without a zone after "%".
-/// Refuse texts with a NUL byte before you call: what is quoted is cut there. A code is expired
-/// once the current time is greater than its expired_time.
+/// Refuse texts with a NUL byte before you call: of a quoted text only the part before it is kept.
+/// A code is expired when the current time is greater than its expired_time.
 class OAUTHDBGrantCode : public OAUTHDBBasic {
  public:
   /// Opens the database; tabName is "oauth_grantCode".
@@ -24,8 +24,8 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
 
   /// Issues a new code that lives for the setting "grantcode_expired" in seconds.
   ///
-  /// result gets {"code": string}, also when the insert then fails. A full table is kErrTableFull,
-  /// before any argument is looked at; a bad address or length is log only.
+  /// result gets {"code": string}, even if the insert then fails. A full table is kErrTableFull,
+  /// which is checked before the arguments; a bad address or length is log only.
   int Add(const std::string& username, const std::string& client_id, const std::string& scope,
           const std::string& state, const std::string& ip, Json::Value& result);
   /// The same with the caller's code and expiry.
@@ -33,14 +33,15 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
           const std::string& code, const std::string& expired_time, const std::string& state,
           const std::string& ip, Json::Value& result);
 
-  /// Rewrites the columns named; a bad length is log only. A single quote is stored as it is.
+  /// Rewrites the columns of the arguments; a bad length is log only. A single quote is stored as
+  /// it is.
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& state);
-  /// The same with the expiry. A single quote is stored doubled, as Add() does.
+  /// The same with the expiry. Except in the expiry, a single quote is stored doubled, as by Add().
   int Edit(long long id, const std::string& username, const std::string& client_id,
            const std::string& scope, const std::string& expired_time, const std::string& state);
 
-  /// Spends the code: of several processes that try, one succeeds. The id may then be given to a
+  /// Spends the code: if several processes try, exactly one succeeds. The id may then be given to a
   /// new row, so find and delete in one transaction, as docs/operations.md shows.
   int Del(long long id);
 
@@ -52,17 +53,17 @@ class OAUTHDBGrantCode : public OAUTHDBBasic {
   /// Reads every row.
   int Get(Json::Value* out);
 
-  /// Row id of the code, its low 32 bits; 0 for an unknown code or a failed look-up.
+  /// Returns the low 32 bits of the code's row id; 0 for an unknown code or a failed look-up.
   int GetIndex(const std::string& code);
 
   /// Sets the expiry to now; the code counts as expired from the next second on. This claims
-  /// nothing: of several processes that try, all succeed.
+  /// nothing: if several processes try, all succeed.
   int Revoke(long long id);
 
-  /// Deletes every expired code, in one transaction. Where the disk has no room for that, it
-  /// commits row by row, and the error of the first attempt stays. Inside a transaction of the
-  /// caller it is a part of that one, and fails if SQLite ends it. 0 only if a row could not be
-  /// deleted: a failed read deletes nothing and is a success, though it leaves its error.
+  /// Deletes every expired code, in one transaction. If the disk has no room for that, it commits
+  /// row by row, and the error of the first attempt stays. Inside a transaction of the caller it
+  /// becomes part of that transaction, and fails if SQLite ends it. Returns 0 only if a row could
+  /// not be deleted. A failed read deletes nothing and counts as a success, but leaves its error.
   int Purge();
 };
 

@@ -1,5 +1,5 @@
-// Stand-in for the host's web-request library, for machines other than the appliance: takes the
-// client's address from where the Common Gateway Interface (RFC 3875) puts it.
+// Stand-in for the host's web-request library, for machines other than the appliance. It reads the
+// client's address from the variable of the Common Gateway Interface (RFC 3875).
 
 #include <cstdlib>
 #include <cstring>

@@ -1,5 +1,5 @@
-// Stand-in for the host's core library, for machines other than the appliance: string encryption
-// under a key of its own. What one machine encrypts another cannot read.
+// Stand-in for the host's core library, for machines other than the appliance. It encrypts strings
+// with a key of its own. One machine cannot decrypt what another machine encrypted.
 
 #include <cstring>
 #include <exception>
@@ -11,7 +11,7 @@
 
 namespace {
 
-// Copies the text with its NUL byte; 0 and nothing written if it does not fit.
+// Copies the text with its NUL byte. If it does not fit, returns 0 and writes nothing.
 int deliver(const std::string& text, char* out, int outSize) {
   if (outSize <= 0 || text.size() >= static_cast<std::size_t>(outSize)) return 0;
   std::memcpy(out, text.c_str(), text.size() + 1);

@@ -15,9 +15,9 @@ namespace {
 
 using ZEVOOAUTHSERVER::Descriptor;
 
-// Nothing on any failure, with errno ENOENT only if there is no such file.
+// Returns nothing on any failure; errno is then ENOENT only if there is no such file.
 std::optional<Key> readKey(const std::string& path) {
-  // Not through a link, and without waiting for a writer should it be a pipe.
+  // Do not follow a link, and do not wait for a writer if it is a pipe.
   const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
   if (!file.isOpen()) return std::nullopt;
   errno = EINVAL;
@@ -37,9 +37,9 @@ bool writeRandomKey(int descriptor) {
          fsync(descriptor) == 0;
 }
 
-// Writes a temporary file and links it into place, which fails where a key exists already: the
-// first process wins, the others use its key. A process killed in between leaves its temporary
-// file behind, of mode 0600 like the key.
+// Writes a temporary file and links it to the key's name. The link fails if a key exists already,
+// so the first process wins and the others use its key. A process that is killed before the end
+// leaves its temporary file behind, with mode 0600 like the key.
 void makeKey(const std::string& directory, const std::string& path) {
   std::string temporary = directory + "/.zevocore.key.XXXXXX";
   const Descriptor file(mkostemp(temporary.data(), O_CLOEXEC));

@@ -9,11 +9,11 @@
 
 namespace zevocore {
 
-// Reads the key from "zevocore.key" in the directory, making it on first use. Processes that make
-// it at once end up with the same one.
+// Reads the key from "zevocore.key" in the directory, and makes the file on first use. Processes
+// that make it at the same time get the same key.
 //
-// Nothing if the file cannot be read or made, or is no regular file of the right size. A file
-// that exists is never replaced: what was sealed under it would be lost.
+// Returns nothing if the file cannot be read or made, or is not a regular file of the right size.
+// An existing file is never replaced, because everything sealed with its key would be lost.
 std::optional<Key> loadKey(const std::string& directory);
 
 }  // namespace zevocore

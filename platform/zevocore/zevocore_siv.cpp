@@ -12,8 +12,8 @@ using Bytes = std::vector<std::uint8_t>;
 
 static_assert(std::tuple_size<Key>::value == SIV_CMAC_AES256_KEY_SIZE);
 
-// A constant instead of a nonce, since equal texts must give equal results; it also keeps texts
-// apart that another program seals under the same key.
+// A constant is used instead of a nonce, because equal texts must give equal results. It also
+// distinguishes our texts from those that another program seals with the same key.
 constexpr std::uint8_t kLabel[] = {'z', 'e', 'v', 'o', 'c', 'o', 'r', 'e'};
 
 siv_cmac_aes256_ctx contextFor(const Key& key) {
@@ -26,7 +26,7 @@ const std::uint8_t* bytesOf(const std::string& text) {
   return reinterpret_cast<const std::uint8_t*>(text.data());
 }
 
-std::string printed(const Bytes& bytes) {
+std::string toBase64Url(const Bytes& bytes) {
   base64_encode_ctx context;
   base64url_encode_init(&context);
   std::string text(BASE64_ENCODE_LENGTH(bytes.size()) + BASE64_ENCODE_FINAL_LENGTH, '\0');
@@ -37,9 +37,9 @@ std::string printed(const Bytes& bytes) {
   return text;
 }
 
-// Nothing unless the text is exactly what printed() makes of the bytes: a lenient decoder would
-// accept several spellings of one value.
-std::optional<Bytes> parsed(const std::string& text) {
+// Returns nothing unless the text is exactly what toBase64Url() makes from the bytes. A lenient
+// decoder would accept several spellings of one value.
+std::optional<Bytes> fromBase64Url(const std::string& text) {
   base64_decode_ctx context;
   base64url_decode_init(&context);
   const std::string padded = text + std::string((4 - text.size() % 4) % 4, '=');
@@ -49,7 +49,7 @@ std::optional<Bytes> parsed(const std::string& text) {
       !base64_decode_final(&context))
     return std::nullopt;
   bytes.resize(length);
-  if (printed(bytes) != text) return std::nullopt;
+  if (toBase64Url(bytes) != text) return std::nullopt;
   return bytes;
 }
 
@@ -60,11 +60,11 @@ std::string seal(const Key& key, const std::string& plain) {
   Bytes sealed(SIV_DIGEST_SIZE + plain.size());
   siv_cmac_aes256_encrypt_message(&context, sizeof kLabel, kLabel, 0, nullptr, sealed.size(),
                                   sealed.data(), bytesOf(plain));
-  return printed(sealed);
+  return toBase64Url(sealed);
 }
 
 std::optional<std::string> unseal(const Key& key, const std::string& sealed) {
-  const std::optional<Bytes> bytes = parsed(sealed);
+  const std::optional<Bytes> bytes = fromBase64Url(sealed);
   if (!bytes || bytes->size() < SIV_DIGEST_SIZE) return std::nullopt;
   const siv_cmac_aes256_ctx context = contextFor(key);
   std::string plain(bytes->size() - SIV_DIGEST_SIZE, '\0');

@@ -12,10 +12,10 @@ namespace zevocore {
 
 using Key = std::array<std::uint8_t, 64>;
 
-// The same text under the same key always gives the same result.
+// The same text with the same key always gives the same result.
 std::string seal(const Key& key, const std::string& plain);
 
-// Nothing if the text was changed in any character, or sealed under another key.
+// Returns nothing if any character of the text was changed, or if it was sealed with another key.
 std::optional<std::string> unseal(const Key& key, const std::string& sealed);
 
 }  // namespace zevocore

@@ -24,10 +24,10 @@ namespace {
 
 // Raises the effective ids to root for the lifetime of the object.
 //
-// Group first on the way in, user last on the way out: without the user id the group can no
-// longer be changed. A refusal is logged; the guarded call is made all the same, with the ids
-// that the process then has. Leaves errno 0, or 1 after a refusal. Process-wide: no other thread
-// may depend on the ids meanwhile.
+// The group changes before the user, in both directions: to change it back the process needs root's
+// user id. A refusal is logged; the guarded call is made all the same, with the ids that the
+// process then has. Leaves errno 0, or 1 after a refusal. Process-wide: no other thread may depend
+// on the ids meanwhile.
 class RaisedPrivilege {
  public:
   RaisedPrivilege() : user_(geteuid()), group_(getegid()) {
@@ -252,7 +252,7 @@ bool OAUTHDBBasic::DBInit() {
     OAUTH_FAIL("Create Table failed!![meta]");
     return ready_;
   }
-  // Two of these five traces are entry traces and three are results: log filters rely on it.
+  // Log filters rely on the classes: two of these five are entry traces and three are results.
   OAUTH_DIAG(kEntry, "==> %s[init client table]", __func__);
   if (!create(names::schema::kClientInfo, names::table::kClientInfo)) return ready_;
   OAUTH_DIAG(kResult, "==> %s[init token table]", __func__);
@@ -337,7 +337,7 @@ bool OAUTHDBBasic::DBCmdRun(const std::string& sql, RowCallback callback, Json::
   const int code = sqlite3_exec(db_, sql.c_str(), callback, result, &errorText);
   const SqliteText error(errorText);
   if (code == SQLITE_OK) return true;
-  // On a handle whose open failed there is a code without a text.
+  // After a failed open SQLite returns a code without a text.
   const char* const text = textOrEmpty(error.get());
   fail(*this, code, text);
   OAUTH_FAIL("Run Command failed!![%s][%d]", text, code);
@@ -442,7 +442,7 @@ std::string OAUTHDBBasic::GetConditionParam(const Json::Value& condition) {
 
 std::string OAUTHDBBasic::GetUpdateParam(const Json::Value& request) {
   OAUTH_ENTER();
-  // A statement each: operands of one sum are evaluated, and traced, in any order.
+  // Two statements: the operands of one sum would be evaluated, and traced, in any order.
   const std::string modified = ConcateParam(request[names::request::kModified], ", ");
   const std::string condition = GetConditionParam(request[names::request::kCondition]);
   return " SET " + modified + condition;
@@ -470,7 +470,7 @@ bool OAUTHDBBasic::DBDel(Json::Value& request) {
     OAUTH_FAIL("Delete failed[%s]", tabName_.c_str());
     return false;
   }
-  // "ClientInfo" is printed for every table here and below: log filters rely on it.
+  // Log filters rely on "ClientInfo" here and below, whatever the table is.
   OAUTH_DIAG(kResult, "ClientInfo Delete success, changed[%d]", sqlite3_changes(db_));
   return true;
 }

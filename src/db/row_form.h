@@ -18,12 +18,12 @@ namespace ZEVOOAUTHSERVER {
 // An SQL NULL reads as the empty text.
 inline const char* textOrEmpty(const char* text) { return text == nullptr ? "" : text; }
 
-// The rows of one table without their values. To copy one is much cheaper than to add member by
-// member, and the copies share the columns' names.
+// A row of one table without its values. Copying it is much cheaper than adding member by member,
+// and the copies share the columns' names.
 class RowForm {
  public:
-  // The names must live as long as any row. Constants of the library do, since it is linked to stay
-  // in memory even after dlclose().
+  // The names must live as long as any row. The library's constants do: the library stays in memory
+  // even after dlclose().
   RowForm(std::initializer_list<const char*> columns) : columns_(columns) {
     for (const char* const column : columns_) empty_[Json::StaticString(column)];
     for (const std::string& member : empty_.getMemberNames())
@@ -35,7 +35,7 @@ class RowForm {
                       [](const char* a, const char* b) { return std::strcmp(a, b) == 0; });
   }
 
-  Json::Value filled(char** values) const {
+  Json::Value withValues(char** values) const {
     Json::Value row = empty_;
     auto column = order_.begin();
     for (Json::Value& member : row) member = textOrEmpty(values[*column++]);
@@ -63,7 +63,7 @@ inline Json::Value makeRow(int columns, char** values, char** columnNames) {
       {column::kTimestamp, column::kMsg, column::kId},
   }};
   for (const RowForm& form : forms)
-    if (form.fits(columns, columnNames)) return form.filled(values);
+    if (form.fits(columns, columnNames)) return form.withValues(values);
   Json::Value row;
   for (int i = 0; i < columns; ++i) row[columnNames[i]] = textOrEmpty(values[i]);
   return row;
