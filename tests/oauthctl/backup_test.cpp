@@ -53,7 +53,7 @@ TEST_F(BackupTest, CopiesEveryRow) {
   EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
 }
 
-TEST_F(BackupTest, CarriesNoDeletedRowAlong) {
+TEST_F(BackupTest, CopiesNoDeletedRow) {
   addClient('c');
   addToken('7');
   execute("PRAGMA secure_delete = OFF; DELETE FROM oauth_token");
@@ -62,7 +62,7 @@ TEST_F(BackupTest, CarriesNoDeletedRowAlong) {
   EXPECT_THAT(bytesOf(copy_), Not(HasSubstr(times(8, '7'))));
 }
 
-TEST_F(BackupTest, LeavesTheSourceAlone) {
+TEST_F(BackupTest, DoesNotChangeTheSource) {
   addClient('c');
   const std::string before = databaseBytes();
   chmod(files_.database().c_str(), 0400);
@@ -82,17 +82,17 @@ TEST_F(BackupTest, NeverReplacesAFile) {
   EXPECT_THAT(fileNames(), ElementsAre("copy.db", "link.db", "oauth.db"));
 }
 
-TEST_F(BackupTest, SaysWhenItCannotWrite) {
+TEST_F(BackupTest, ReportsThatItCannotWrite) {
   addClient('c');
   EXPECT_EQ("1 cannot make a file beside /nonexistent/copy.db: No such file or directory",
             complaint(run({"backup", "/nonexistent/copy.db"})));
 }
 
-// Its memory, and the restore, would not take such a copy.
+// Such a copy would not fit into memory, and could not be restored.
 TEST_F(BackupTest, RefusesADatabaseThatIsTooLarge) {
   addClient('c');
   std::fstream file(files_.database(), std::ios::in | std::ios::out | std::ios::binary);
-  file.seekp(28);  // the number of pages: one more than 512 MiB hold
+  file.seekp(28);  // the number of pages: one more than fits into 512 MiB
   file.write("\x00\x02\x00\x01", 4);
   file.close();
   ASSERT_EQ(0, truncate(files_.database().c_str(), 131073LL * 4096));
@@ -103,7 +103,7 @@ TEST_F(BackupTest, RefusesADatabaseThatIsTooLarge) {
   EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
 }
 
-TEST_F(BackupTest, RefusesToCopyDamage) {
+TEST_F(BackupTest, RefusesADamagedDatabase) {
   addClient('c');
   execute("DROP TABLE oauth_log");
   EXPECT_EQ(
@@ -113,7 +113,7 @@ TEST_F(BackupTest, RefusesToCopyDamage) {
   EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
 }
 
-TEST_F(BackupTest, LeavesNoTokenBytesWhenToldSo) {
+TEST_F(BackupTest, LeavesNoTokenBytesOnRequest) {
   addClient('c');
   for (const char c : {'1', '2', '3', '4'}) {
     addToken(c);
@@ -131,7 +131,7 @@ TEST_F(BackupTest, LeavesNoTokenBytesWhenToldSo) {
   EXPECT_EQ("ok", queryIn(copy_, "PRAGMA integrity_check").front());
 }
 
-// Four processes that issue tokens, each noted once the library has said that it is there.
+// Four processes issue tokens. Each notes a token after the library has returned it.
 class IssuingTest : public BackupTest {
  protected:
   IssuingTest() {
@@ -189,7 +189,7 @@ class IssuingTest : public BackupTest {
   std::vector<pid_t> issuers_;
 };
 
-TEST_F(IssuingTest, BackupsAreOneMoment) {
+TEST_F(IssuingTest, BackupIsOneMoment) {
   for (const char* const name : {"1.db", "2.db", "3.db"}) {
     const Lines before = acknowledged();
     const Outcome outcome = run({"backup", path(name)});
@@ -203,8 +203,8 @@ TEST_F(IssuingTest, BackupsAreOneMoment) {
   EXPECT_EQ(copied, rowsIn(files_.database()));
 }
 
-// What is issued while a restore runs is in what was kept, or in the database that came.
-TEST_F(IssuingTest, RestoresLoseNothing) {
+// A token that is issued during a restore is in the kept file or in the new database.
+TEST_F(IssuingTest, RestoreLosesNothing) {
   Lines found;
   for (int n = 0; n < 10; ++n) EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
   stop();
@@ -216,8 +216,8 @@ TEST_F(IssuingTest, RestoresLoseNothing) {
   expectAll(acknowledged(), found);
 }
 
-// Ctrl-C when the file is written and has no name yet.
-// The parameter is what the machine lacks.
+// Ctrl-C after the file is written and before it is named. The parameter says what the machine
+// lacks.
 class InterruptedTest : public BackupTest, public testing::WithParamInterface<Lines> {
  protected:
   InterruptedTest() {
@@ -234,8 +234,8 @@ TEST_P(InterruptedTest, LeavesNothing) {
   EXPECT_THAT(fileNames(), ElementsAre("oauth.db"));
 }
 
-// What the tests above interrupt does come to its end otherwise.
-TEST_P(InterruptedTest, IsWholeWithoutThat) {
+// Shows that the command above fails only because of the interruption.
+TEST_P(InterruptedTest, SucceedsWithoutInterruption) {
   EXPECT_EQ(0, run({"backup", copy_}).code);
   EXPECT_EQ(rowsIn(files_.database()), rowsIn(copy_));
   EXPECT_EQ(0600U, modeOf(copy_));
@@ -250,7 +250,7 @@ INSTANTIATE_TEST_SUITE_P(Machines, InterruptedTest,
                                          Lines{"OAUTHCTL_NO_TMPFILE=1", "OAUTHCTL_NO_PROC=1"}));
 
 // Ctrl-C while it waits for the database.
-TEST_F(BackupTest, LeavesNothingWhenItIsInterruptedWhileItWaits) {
+TEST_F(BackupTest, LeavesNothingIfInterruptedWhileItWaits) {
   addClient('c');
   sqlite3* db = nullptr;
   sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
@@ -272,7 +272,7 @@ class RestoreTest : public BackupTest {
     addToken('b');
     addCode('k');
   }
-  // That the file is refused for this reason, and nothing is changed.
+  // Expects that the file is refused for this reason, and nothing is changed.
   void expectRefused(const std::string& reason) const {
     const std::string before = databaseBytes();
     const Outcome outcome = run({"restore", copy_, "--yes"});
@@ -301,7 +301,7 @@ TEST_F(RestoreTest, ReplacesEveryRow) {
   EXPECT_EQ("alice", json({"token", "list"})[0U]["username"].asString());
 }
 
-TEST_F(RestoreTest, CanBeTakenBack) {
+TEST_F(RestoreTest, CanBeUndone) {
   const Lines before = rowsIn(files_.database());
   run({"restore", copy_, "--yes"});
   EXPECT_EQ("restored 1 client, 1 code, 2 tokens, 1 log line\nwhat was there is kept in " + kept_ +
@@ -311,20 +311,20 @@ TEST_F(RestoreTest, CanBeTakenBack) {
   EXPECT_EQ(saved_, rowsIn(kept_ + "-2"));
 }
 
-TEST_F(RestoreTest, LeavesTokensOutWhenToldSo) {
+TEST_F(RestoreTest, LeavesOutTokensOnRequest) {
   EXPECT_EQ(0, run({"restore", copy_, "--without-tokens", "--yes"}).code);
   EXPECT_EQ(1, rowCount("oauth_clientInfo"));
   EXPECT_EQ(0, rowCount("oauth_token"));
   EXPECT_EQ(0, rowCount("oauth_grantCode"));
 }
 
-TEST_F(RestoreTest, ReplacesNothingUnasked) {
+TEST_F(RestoreTest, ReplacesNothingWithoutConfirmation) {
   const std::string before = databaseBytes();
   EXPECT_EQ(2, run({"restore", copy_}).code);
   EXPECT_EQ(before, databaseBytes());
 }
 
-// What somebody did to the backup must not change how the server's journal works.
+// The journal mode of the backup must not change that of the server's database.
 TEST_F(RestoreTest, KeepsTheJournalMode) {
   sqlite3* db = nullptr;
   sqlite3_open_v2(copy_.c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
@@ -360,7 +360,7 @@ TEST_F(RestoreTest, RefusesAnEmptyFile) {
   expectRefused("table oauth_clientInfo is missing (and 4 more)");
 }
 
-TEST_F(RestoreTest, RefusesADatabaseOfSomethingElse) {
+TEST_F(RestoreTest, RefusesADatabaseWithAnotherTable) {
   sqlite3* db = nullptr;
   sqlite3_open_v2(copy_.c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
   sqlite3_exec(db, "CREATE TABLE extra(a)", nullptr, nullptr, nullptr);
@@ -379,7 +379,7 @@ TEST_F(RestoreTest, RefusesABackupOfAnotherMachine) {
   expectRefused("it was encrypted on another machine, or this one has lost its key");
 }
 
-TEST_F(RestoreTest, RefusesWhatIsNoFile) {
+TEST_F(RestoreTest, RefusesAPathThatIsNoBackup) {
   EXPECT_EQ("1 cannot read /nonexistent: No such file or directory",
             complaint(run({"restore", "/nonexistent", "--yes"})));
   EXPECT_EQ("1 " + files_.directory() + " is refused, nothing changed: it is not a file",
@@ -388,7 +388,7 @@ TEST_F(RestoreTest, RefusesWhatIsNoFile) {
             complaint(run({"restore", files_.database(), "--yes"})));
 }
 
-TEST_F(RestoreTest, WaitsForNoPipe) {
+TEST_F(RestoreTest, RefusesAPipe) {
   std::filesystem::remove(copy_);
   ASSERT_EQ(0, mkfifo(copy_.c_str(), 0600));
   expectRefused("it is not a file");
@@ -401,13 +401,13 @@ TEST_F(RestoreTest, RefusesALink) {
             complaint(run({"restore", copy_, "--yes"})));
 }
 
-// No room is asked for it either.
+// Its size is checked before memory is allocated.
 TEST_F(RestoreTest, RefusesAFileThatIsTooLarge) {
   ASSERT_EQ(0, truncate(copy_.c_str(), 512L * 1024 * 1024 + 1));
   expectRefused("it is too large for a backup");
 }
 
-// Half a database: SQLite would take the other half from there.
+// A database and its journal belong together: SQLite would apply the journal.
 TEST_F(RestoreTest, RefusesAFileWithAJournal) {
   for (const std::string& journal : {copy_ + "-journal", copy_ + "-wal"}) {
     std::ofstream(journal, std::ios::binary) << "\xd9\xd5\x05\xf9";
@@ -423,7 +423,7 @@ TEST_F(RestoreTest, RefusesAFileWithAJournal) {
   EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
 }
 
-TEST_F(RestoreTest, MakesADatabaseWhereThereIsNone) {
+TEST_F(RestoreTest, MakesAMissingDatabase) {
   std::filesystem::remove(files_.database());
   EXPECT_EQ("restored 1 client, 0 codes, 1 token, 1 log line\n",
             run({"restore", copy_, "--yes"}).out);
@@ -438,8 +438,8 @@ TEST_F(RestoreTest, FillsAnEmptyFile) {
   EXPECT_EQ(saved_, rowsIn(files_.database()));
 }
 
-// What no program can open cannot be written into either: it goes aside, journal and all.
-TEST_F(RestoreTest, ReplacesAFileThatIsNoDatabaseAnyMore) {
+// SQLite cannot write into such a file, so it is moved away together with its journal.
+TEST_F(RestoreTest, ReplacesAFileThatIsNoDatabase) {
   std::ofstream(files_.database(), std::ios::binary) << times(9000, 'x');
   std::ofstream(files_.database() + "-journal", std::ios::binary) << "\xd9\xd5\x05\xf9 old";
   EXPECT_EQ(
@@ -462,13 +462,13 @@ TEST_F(RestoreTest, ReplacesADamagedDatabase) {
   EXPECT_EQ(damaged, bytesOf(kept_));
 }
 
-TEST_F(RestoreTest, KeepsOwnerAlongWithMode) {
+TEST_F(RestoreTest, KeepsTheMode) {
   chmod(files_.database().c_str(), 0640);
   EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
   EXPECT_EQ(0640U, modeOf(files_.database()));
 }
 
-// Whoever reads meanwhile sees all old rows or all new ones.
+// A program that reads meanwhile sees all old rows or all new ones.
 TEST_F(RestoreTest, IsOneStepForOtherProcesses) {
   ASSERT_EQ(0, run({"backup", path("more.db")}).code);
   files_.waitForLocks();
@@ -477,8 +477,8 @@ TEST_F(RestoreTest, IsOneStepForOtherProcesses) {
     sqlite3* db = nullptr;
     sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
     sqlite3_busy_timeout(db, 20000);
-    int torn = 0;
-    const auto look = [](void* context, int, char** values, char**) {
+    int mixed = 0;
+    const auto countMixed = [](void* context, int, char** values, char**) {
       const std::string seen = values[0];
       *static_cast<int*>(context) += seen != "1 token, 0 codes" && seen != "2 token, 1 codes";
       return 0;
@@ -487,9 +487,9 @@ TEST_F(RestoreTest, IsOneStepForOtherProcesses) {
       if (sqlite3_exec(db,
                        "SELECT (SELECT COUNT(*) FROM oauth_token) || ' token, ' || "
                        "(SELECT COUNT(*) FROM oauth_grantCode) || ' codes'",
-                       look, &torn, nullptr) != SQLITE_OK)
-        ++torn;
-    _exit(torn == 0 ? 0 : 1);
+                       countMixed, &mixed, nullptr) != SQLITE_OK)
+        ++mixed;
+    _exit(mixed == 0 ? 0 : 1);
   }
   for (const char* const name : {"copy.db", "more.db", "copy.db", "more.db"}) {
     const Outcome outcome = run({"restore", path(name), "--yes"});

@@ -1,4 +1,4 @@
-// Every kind of damage is planted by itself, and found by itself.
+// Each test makes one kind of damage, and expects exactly that finding.
 
 #include <sqlite3.h>
 #include <sys/stat.h>
@@ -17,7 +17,8 @@ using testing::StartsWith;
 
 namespace {
 
-// More than the cache holds: pages and journal reach the disk before the transaction ends.
+// Changes more than fits into the cache: pages and journal reach the disk before the transaction
+// ends.
 constexpr char kLargeChange[] =
     "PRAGMA cache_size = 1; BEGIN; UPDATE oauth_token SET scope = 'changed';"
     "WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < 500) "
@@ -33,7 +34,7 @@ class CheckTest : public OauthctlTest {
     chmod(files_.directory().c_str(), 0700);
   }
 
-  // The problems found, in both forms; and nothing was changed by looking.
+  // The problems found. Expects the same in both forms, and that the check changes nothing.
   Lines findings() const {
     const std::string before = databaseBytes();
     const Outcome outcome = run({"check"});
@@ -101,7 +102,7 @@ TEST_F(CheckTest, FindsAMissingTable) {
   EXPECT_THAT(findings(), ElementsAre("table oauth_log is missing"));
 }
 
-// One blank more in a definition: existing databases have it byte for byte.
+// Even one more blank in a definition is a finding.
 TEST_F(CheckTest, FindsEachDifferentDefinition) {
   for (const std::string table :
        {"oauth_meta", "oauth_clientInfo", "oauth_token", "oauth_grantCode", "oauth_log"}) {
@@ -113,7 +114,7 @@ TEST_F(CheckTest, FindsEachDifferentDefinition) {
   }
 }
 
-TEST_F(CheckTest, FindsWhatIsNotOurs) {
+TEST_F(CheckTest, FindsUnknownObjects) {
   execute("CREATE TRIGGER spy AFTER INSERT ON oauth_token BEGIN SELECT 1; END");
   execute("CREATE TABLE extra(a)");
   execute("CREATE INDEX fast ON oauth_token(username)");
@@ -141,7 +142,7 @@ TEST_F(CheckTest, FindsAnotherVersion) {
   EXPECT_THAT(findings(), ElementsAre("schema version of oauth_grantCode is 3, not 2"));
 }
 
-TEST_F(CheckTest, FindsAVersionOfNoTable) {
+TEST_F(CheckTest, FindsAVersionOfAnUnknownTable) {
   execute("INSERT INTO oauth_meta VALUES('oauth_x', 2)");
   EXPECT_THAT(findings(), ElementsAre("schema version of an unknown table oauth_x"));
 }
@@ -189,26 +190,26 @@ TEST_F(CheckTest, FindsAFileOpenToOthers) {
 }
 
 TEST_F(CheckTest, FindsAFolderOpenToOthers) {
-  giveToNobody();  // in a folder of its own root does not go on
+  giveToNobody();  // root refuses to work in such a folder of its own
   for (const mode_t mode : {0777, 0770, 0702}) {
     chmod(files_.directory().c_str(), mode);
     EXPECT_THAT(findings(), ElementsAre(HasSubstr("others can replace the database")));
   }
 }
 
-TEST_F(CheckTest, FindsAFileOfSomebodyElse) {
+TEST_F(CheckTest, FindsAFileOfAnotherUser) {
   if (getuid() != 0) GTEST_SKIP() << "only root can give files away";
   ASSERT_EQ(0, chown(files_.database().c_str(), 1234, 1234));
   EXPECT_THAT(findings(),
               ElementsAre(files_.database() + " belongs to user 1234 and its folder to user 0"));
 }
 
-TEST_F(CheckTest, FindsAnotherName) {
+TEST_F(CheckTest, FindsAHardLink) {
   ASSERT_EQ(0, link(files_.database().c_str(), path("other.db").c_str()));
   EXPECT_THAT(findings(), ElementsAre(files_.database() + " has other names too (1)"));
 }
 
-// A real one: the process dies between writing pages and the end of its transaction.
+// Makes a real one: the process dies after it has written pages and before its transaction ends.
 TEST_F(CheckTest, FindsAJournalLeftOverWithoutTouchingIt) {
   const std::string journal = files_.database() + "-journal", sound = databaseBytes();
   const pid_t child = fork();
@@ -224,14 +225,14 @@ TEST_F(CheckTest, FindsAJournalLeftOverWithoutTouchingIt) {
   ASSERT_NE("", left);
   EXPECT_THAT(findings(), ElementsAre(StartsWith(journal + " is left over, of user ")));
   EXPECT_EQ(left, bytesOf(journal));
-  // What the advice says helps.
+  // The advice helps.
   EXPECT_EQ(0, run({"status"}).code);
   EXPECT_THAT(findings(), ElementsAre());
   EXPECT_EQ(sound, databaseBytes());
 }
 
-// A server in the middle of a change holds a lock, and is no cause for alarm.
-TEST_F(CheckTest, TakesNoJournalInUseForOne) {
+// A server holds a lock while it changes the database, so its journal is not a finding.
+TEST_F(CheckTest, IgnoresAJournalInUse) {
   sqlite3* db = nullptr;
   sqlite3_open_v2(files_.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
   sqlite3_exec(db, kLargeChange, nullptr, nullptr, nullptr);
@@ -241,7 +242,7 @@ TEST_F(CheckTest, TakesNoJournalInUseForOne) {
   EXPECT_THAT(findings(), ElementsAre());
 }
 
-TEST_F(CheckTest, TakesNoHarmlessJournalForOne) {
+TEST_F(CheckTest, IgnoresAnEmptiedJournal) {
   std::ofstream(files_.database() + "-journal", std::ios::binary) << times(100, '\0');
   EXPECT_THAT(findings(), ElementsAre());
 }
@@ -262,8 +263,8 @@ TEST_F(CheckTest, FindsASettingsFileThatIsNoJson) {
   EXPECT_THAT(findings(), ElementsAre(files_.settings() + " is not JSON, every default applies"));
 }
 
-// The library refuses such a file whole, so its value must not be shown as the one in force.
-TEST_F(CheckTest, ReadsTheSettingsAsTheLibraryDoes) {
+// The library refuses the whole file, so its values must not be shown as those in force.
+TEST_F(CheckTest, RefusesSettingsThatTheLibraryRefuses) {
   writeSettings(R"({"token_max": 50,})");
   chmod(files_.settings().c_str(), 0600);
   EXPECT_THAT(findings(), ElementsAre(files_.settings() + " is not JSON, every default applies"));

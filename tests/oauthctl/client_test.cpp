@@ -34,7 +34,7 @@ TEST_F(ClientTest, ListsClientsAsJson) {
   EXPECT_EQ("Photo album", clients[0U]["display_name"].asString());
 }
 
-TEST_F(ClientTest, SaysThatThereAreNone) {
+TEST_F(ClientTest, SaysThatThereIsNoClient) {
   addClient('c');
   execute("DELETE FROM oauth_clientInfo");
   EXPECT_EQ("no clients\n", run({"client", "list"}).out);
@@ -75,7 +75,7 @@ TEST_F(ClientTest, ShowsOneClientWithWhatItHolds) {
   EXPECT_EQ(2, json({"client", "show", times(64, 'c')})["tokens"].asInt());
 }
 
-TEST_F(ClientTest, DoesNotFindWhatIsNotThere) {
+TEST_F(ClientTest, ReportsAnUnknownClient) {
   addClient('c');
   EXPECT_EQ("1 there is no client 7", complaint(run({"client", "show", "7"})));
   EXPECT_EQ("1 there is no client " + times(64, 'x'),
@@ -85,7 +85,7 @@ TEST_F(ClientTest, DoesNotFindWhatIsNotThere) {
   EXPECT_EQ("1 there is no client 7", complaint(run({"client", "disable", "7"})));
 }
 
-TEST_F(ClientTest, RegistersAClientWhoseSecretIsPrintedOnce) {
+TEST_F(ClientTest, RegistersAClient) {
   const Json::Value made = json({"client", "add", "--name", "Bob's {} \"App\"", "--redirect-uri",
                                  "https://bob.example/cb?a=b", "--scope", "{}"});
   EXPECT_EQ(1, made["id"].asInt());
@@ -102,7 +102,7 @@ TEST_F(ClientTest, RegistersAClientWhoseSecretIsPrintedOnce) {
               ElementsAre("Application registed[Bob''s {} \"App\"]"));
 }
 
-TEST_F(ClientTest, MakesTheDatabaseForItsOwnerAlone) {
+TEST_F(ClientTest, MakesADatabaseThatPassesTheCheck) {
   const Outcome outcome =
       run({"client", "add", "--name", "App", "--redirect-uri", "a.example", "--scope", "read"});
   EXPECT_EQ(0, outcome.code);
@@ -138,7 +138,7 @@ TEST_F(ClientTest, TakesASecretFromStandardInput) {
             json({"client", "show", "1", "--show-secrets"})["client_secret"].asString());
 }
 
-TEST_F(ClientTest, RefusesToOverfillTheRegistry) {
+TEST_F(ClientTest, RefusesAClientAboveTheCeiling) {
   writeSettings(R"({"client_info_max": 1})");
   addClient('c');
   EXPECT_EQ("1 the registry is full: it holds 1 clients, the setting client_info_max",
@@ -155,7 +155,7 @@ TEST_F(ClientTest, EditsTheNamedColumnsOnly) {
   EXPECT_EQ("it's", json({"client", "show", "1"})["scope"].asString());
 }
 
-// As registering does: the server compares with what is stored.
+// The same as when a client is registered: the server compares with the stored URI.
 TEST_F(ClientTest, EditsTheRedirectUriWithoutItsScheme) {
   addClient('c');
   run({"client", "edit", "1", "--redirect-uri", "https://new.example/cb"});
@@ -199,7 +199,7 @@ TEST_F(ClientTest, DeletesAClientWithItsTokens) {
   EXPECT_THAT(query("SELECT username FROM oauth_token"), ElementsAre("bob"));
 }
 
-TEST_F(ClientTest, DeletesNothingUnasked) {
+TEST_F(ClientTest, DeletesNothingWithoutConfirmation) {
   addClient('c');
   EXPECT_EQ(
       "2 nobody is there to ask \"Delete client 1, 'Photo album'; its 0 codes and 0 tokens stay "

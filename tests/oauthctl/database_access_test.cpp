@@ -1,4 +1,4 @@
-// Databases that are missing, busy, or not for everybody.
+// Databases that are missing, busy, or closed to the user.
 
 #include <fcntl.h>
 #include <sqlite3.h>
@@ -17,7 +17,7 @@ namespace {
 
 class DatabaseAccessTest : public OauthctlTest {};
 
-const std::vector<Words> kEveryUse = {
+const std::vector<Words> kEveryCommand = {
     {"status"},
     {"check"},
     {"client", "list"},
@@ -48,8 +48,8 @@ std::string listOf(const std::string& folder) {
   return names;
 }
 
-TEST_F(DatabaseAccessTest, IsNotMadeByLookingAtIt) {
-  for (const Words& words : kEveryUse) {
+TEST_F(DatabaseAccessTest, MissingDatabaseIsNotMade) {
+  for (const Words& words : kEveryCommand) {
     SCOPED_TRACE(words[0]);
     EXPECT_EQ("3 there is no database " + files_.database() +
                   ": 'oauthctl client add' or the server makes it",
@@ -58,7 +58,7 @@ TEST_F(DatabaseAccessTest, IsNotMadeByLookingAtIt) {
   }
 }
 
-TEST_F(DatabaseAccessTest, NeedsItsFolder) {
+TEST_F(DatabaseAccessTest, MissingFolderIsReported) {
   files_.removeDirectory();
   EXPECT_EQ(
       "3 there is no folder " + files_.directory() + " for the database: is the server installed?",
@@ -68,32 +68,32 @@ TEST_F(DatabaseAccessTest, NeedsItsFolder) {
               StartsWith("3 there is no folder "));
 }
 
-// As a first construction leaves it that could not write.
-TEST_F(DatabaseAccessTest, IsNotFilledByLookingAtIt) {
+// The library leaves an empty file if it cannot write to a new database.
+TEST_F(DatabaseAccessTest, EmptyDatabaseIsNotFilled) {
   close(creat(files_.database().c_str(), 0600));
   EXPECT_EQ("3 " + files_.database() + " is empty: 'oauthctl client add' or the server fills it",
             complaint(run({"status"})));
   EXPECT_EQ("", databaseBytes());
 }
 
-TEST_F(DatabaseAccessTest, IsNotADirectory) {
+TEST_F(DatabaseAccessTest, DirectoryIsRefused) {
   mkdir(files_.database().c_str(), 0700);
   EXPECT_EQ("3 " + files_.database() + " is not a regular file", complaint(run({"status"})));
 }
 
-TEST_F(DatabaseAccessTest, IsNotALink) {
+TEST_F(DatabaseAccessTest, LinkIsRefused) {
   addClient('c');
   rename(files_.database().c_str(), path("real.db").c_str());
   ASSERT_EQ(0, symlink("real.db", files_.database().c_str()));
   const std::string before = bytesOf(path("real.db"));
-  for (const Words& words : kEveryUse)
+  for (const Words& words : kEveryCommand)
     EXPECT_EQ("3 " + files_.database() + " is a link: put the database itself there",
               complaint(run(words)));
   EXPECT_EQ(before, bytesOf(path("real.db")));
   EXPECT_EQ("oauth.db real.db ", listOf(files_.directory()));
 }
 
-TEST_F(DatabaseAccessTest, IsOverwrittenNowhereWhenItIsNoDatabase) {
+TEST_F(DatabaseAccessTest, OtherFileIsNotOverwritten) {
   const std::string text = times(5000, 'x');
   std::FILE* const file = std::fopen(files_.database().c_str(), "w");
   std::fputs(text.c_str(), file);
@@ -104,7 +104,7 @@ TEST_F(DatabaseAccessTest, IsOverwrittenNowhereWhenItIsNoDatabase) {
   EXPECT_EQ(text, databaseBytes());
 }
 
-class Locked : public DatabaseAccessTest {
+class LockedDatabaseTest : public DatabaseAccessTest {
  protected:
   void SetUp() override {
     addClient('c');
@@ -113,7 +113,7 @@ class Locked : public DatabaseAccessTest {
               sqlite3_open_v2(files_.database().c_str(), &db_, SQLITE_OPEN_READWRITE, nullptr));
     before_ = databaseBytes();
   }
-  ~Locked() override { sqlite3_close_v2(db_); }
+  ~LockedDatabaseTest() override { sqlite3_close_v2(db_); }
   void lock(const char* statement) {
     ASSERT_EQ(SQLITE_OK, sqlite3_exec(db_, statement, nullptr, nullptr, nullptr));
   }
@@ -122,31 +122,31 @@ class Locked : public DatabaseAccessTest {
   std::string before_;
 };
 
-TEST_F(Locked, ForReadersEndsWithThree) {
+TEST_F(LockedDatabaseTest, StatusEndsWithThree) {
   lock("BEGIN EXCLUSIVE");
   EXPECT_THAT(complaint(run({"status"})), StartsWith("3 " + files_.database() + " is busy or "));
 }
 
-TEST_F(Locked, ForTheCheckEndsWithThree) {
+TEST_F(LockedDatabaseTest, CheckEndsWithThree) {
   lock("BEGIN EXCLUSIVE");
   EXPECT_EQ("3 the database is busy, try again", complaint(run({"check"})));
 }
 
-TEST_F(Locked, ForTheBackupEndsWithThree) {
+TEST_F(LockedDatabaseTest, BackupEndsWithThree) {
   lock("BEGIN EXCLUSIVE");
   EXPECT_EQ("3 the database is busy, no backup was made: try again",
             complaint(run({"backup", path("copy.db")})));
   EXPECT_EQ("oauth.db ", listOf(files_.directory()));
 }
 
-TEST_F(Locked, ForWritersEndsWithThree) {
+TEST_F(LockedDatabaseTest, PurgeEndsWithThree) {
   lock("BEGIN IMMEDIATE");
   EXPECT_EQ("3 the database is busy, nothing changed: cannot get the write lock, try again",
             complaint(run({"token", "purge", "--yes"})));
   EXPECT_EQ(before_, databaseBytes());
 }
 
-TEST_F(Locked, ForTheRestoreEndsWithThree) {
+TEST_F(LockedDatabaseTest, RestoreEndsWithThree) {
   ASSERT_EQ(0, run({"backup", path("copy.db")}).code);
   lock("BEGIN IMMEDIATE");
   EXPECT_EQ("3 the database is busy, nothing changed: try again",

@@ -1,6 +1,6 @@
-// Linked into the test twin of oauthctl instead of its fixed paths: everything lies in the folder
-// that OAUTHCTL_FOLDER names, the clock stands at OAUTHCTL_NOW, and only the process's own ids are
-// used; root's process becomes user OAUTHCTL_USER. The encryption is that of the host's seam.
+// Replaces the fixed paths in a test build of oauthctl. All files are in the folder
+// OAUTHCTL_FOLDER, the clock stands at OAUTHCTL_NOW, and a process of root becomes the user
+// OAUTHCTL_USER, if those variables are set.
 
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -19,7 +19,8 @@
 #include <ctime>
 #include <string>
 
-#include "fixed_paths.h"
+#include "database/fixed_paths.h"
+#include "oauth_names.h"
 
 namespace oauthctl::fixed_paths {
 
@@ -35,14 +36,14 @@ std::string debugMarker() { return folder() + "/zevooauth_debug"; }
 
 namespace {
 
-constexpr char kInstalled[] = "/var/packages/Keyloft/target/etc";
+namespace installed = ZEVOOAUTHSERVER::names::path;
 
-// The library's paths are fixed as well.
+// Redirects the fixed paths of the library.
 std::string redirected(const char* path) {
   using namespace oauthctl::fixed_paths;
-  if (std::strcmp(path, "/tmp/zevooauth_debug") == 0) return debugMarker();
-  if (std::strncmp(path, kInstalled, std::strlen(kInstalled)) == 0)
-    return folder() + (path + std::strlen(kInstalled));
+  if (std::strcmp(path, installed::kDebugMarker) == 0) return debugMarker();
+  if (std::strncmp(path, installed::kFolder, std::strlen(installed::kFolder)) == 0)
+    return folder() + (path + std::strlen(installed::kFolder));
   return path;
 }
 
@@ -53,8 +54,8 @@ std::time_t now() {
   return fixed == nullptr ? real.tv_sec : static_cast<std::time_t>(std::atoll(fixed));
 }
 
-// Before main(), but after root has loaded the program: the user may be kept out of its folder.
-// The process then belongs to him as if he had started it himself.
+// Runs before main(), but after root has loaded the program: the user may not have access to the
+// program's folder. The process then looks as if that user had started it.
 [[gnu::constructor]] void becomeUser() {
   const char* const user = std::getenv("OAUTHCTL_USER");
   if (user == nullptr) return;
@@ -71,7 +72,7 @@ Function* next(const char* name, Function*) {
 
 }  // namespace
 
-// With OAUTHCTL_SWAP, as if somebody renamed that file to the database's name at the last moment.
+// With OAUTHCTL_SWAP, renames that file to the database's name first, as an attacker could.
 extern "C" int sqlite3_open(const char* path, sqlite3** db) {
   if (const char* const swap = std::getenv("OAUTHCTL_SWAP"); swap != nullptr)
     static_cast<void>(std::rename(swap, redirected(path).c_str()));
@@ -82,13 +83,12 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
 extern "C" int open64(const char* path, int flags, ...) {
   va_list arguments;
   va_start(arguments, flags);
-  const auto mode = va_arg(arguments, unsigned);  // unused by a call that gives none
+  const auto mode = va_arg(arguments, unsigned);  // not used if the caller gave none
   va_end(arguments);
   return next("open64", open64)(redirected(path).c_str(), flags, mode);
 }
 
-// lstat() by the names that it has in binaries: with 64-bit offsets, and with 64-bit times on a
-// 32-bit machine.
+// The names of lstat() in binaries: with 64-bit offsets, and with 64-bit times on a 32-bit machine.
 #define REPLACE_LSTAT(function, symbol)                                 \
   extern "C" int function(const char* path, void* out) __asm__(symbol); \
   extern "C" int function(const char* path, void* out) {                \
@@ -97,7 +97,7 @@ extern "C" int open64(const char* path, int flags, ...) {
 REPLACE_LSTAT(lstat64Seam, "lstat64")
 REPLACE_LSTAT(lstat64Time64Seam, "__lstat64_time64")
 
-// With OAUTHCTL_NO_TMPFILE, as on a file system that has no files without a name.
+// With OAUTHCTL_NO_TMPFILE, behaves like a file system without unnamed files.
 extern "C" int openat64(int folder, const char* path, int flags, ...) {
   va_list arguments;
   va_start(arguments, flags);
@@ -110,7 +110,7 @@ extern "C" int openat64(int folder, const char* path, int flags, ...) {
   return next("openat64", openat64)(folder, path, flags, mode);
 }
 
-// With OAUTHCTL_NO_PROC, as where /proc is not mounted.
+// With OAUTHCTL_NO_PROC, behaves as if /proc were not mounted.
 extern "C" int linkat(int from, const char* path, int to, const char* name, int flags) noexcept {
   if (std::getenv("OAUTHCTL_NO_PROC") != nullptr && std::strncmp(path, "/proc/", 6) == 0) {
     errno = ENOENT;
@@ -119,8 +119,8 @@ extern "C" int linkat(int from, const char* path, int to, const char* name, int 
   return next("linkat", linkat)(from, path, to, name, flags);
 }
 
-// Between the writing of a file and its naming: waits for a file with the name OAUTHCTL_HOLD, and
-// interrupts the program if OAUTHCTL_INTERRUPT is set.
+// Runs after a file is written and before it is named: waits for the file OAUTHCTL_HOLD, if that is
+// set, and interrupts the program if OAUTHCTL_INTERRUPT is set.
 extern "C" int fsync(int descriptor) {
   const char* const hold = std::getenv("OAUTHCTL_HOLD");
   while (hold != nullptr && faccessat(AT_FDCWD, hold, F_OK, 0) != 0) usleep(1000);
@@ -138,7 +138,7 @@ extern "C" time_t time(time_t* out) noexcept {
   return moment;
 }
 
-// The database's own clock, which stamps the audit log.
+// SQLite's clock, which gives the time of a line in the audit log.
 extern "C" int gettimeofday(timeval* out, void*) noexcept {
   *out = {};
   out->tv_sec = now();

@@ -96,7 +96,7 @@ TEST_F(GrantsTest, ShowsOneToken) {
   EXPECT_EQ("1 there is no token 2", complaint(run({"token", "show", "2"})));
 }
 
-TEST_F(GrantsTest, FindsNothing) {
+TEST_F(GrantsTest, ReportsThatNothingMatches) {
   addToken('a');
   execute("DELETE FROM oauth_token");
   EXPECT_EQ("no tokens\n", run({"token", "list"}).out);
@@ -110,8 +110,8 @@ TEST_F(GrantsTest, FindsNothing) {
             complaint(run({"token", "revoke", "--id", "3", "--yes"})));
 }
 
-// The stores keep a quote doubled, or as it is after an edit without an expiry.
-TEST_F(GrantsTest, KnowsUsersByTheNameTheyGave) {
+// The stores double a quote, but some edits store it as it is.
+TEST_F(GrantsTest, FindsUsersWithQuotesInTheirNames) {
   addToken('a', "O'Brien");
   addToken('b', "plain");
   plant("oauth_token", "username", "O'Brien");
@@ -142,7 +142,7 @@ TEST_F(GrantsTest, VerifiesInJson) {
   EXPECT_EQ("{\n  \"token\": null,\n  \"valid\": false\n}\n", unknown.out);
 }
 
-TEST_F(GrantsTest, TellsExpiredFromUnknown) {
+TEST_F(GrantsTest, DistinguishesExpiredFromUnknown) {
   addToken('a', "alice", kNow - 1);
   EXPECT_EQ("1 not valid: it expired 1 s ago",
             complaint(run({"token", "verify"}, times(64, 'a') + "\n")));
@@ -178,15 +178,15 @@ TEST_F(GrantsTest, RevokesByNumber) {
   EXPECT_THAT(tokensLeft(), ElementsAre("a"));
 }
 
-// The library's own revocation would leave it valid for the rest of the second.
-TEST_F(GrantsTest, RevokedCodesAreGone) {
+// The library's own revocation would leave a code valid for the rest of the second.
+TEST_F(GrantsTest, DeletesRevokedCodes) {
   addCode('k');
   addCode('l', "bob");
   EXPECT_EQ("deleted 1 code\n", run({"code", "revoke", "--user", "alice", "--yes"}).out);
   EXPECT_THAT(codesLeft(), ElementsAre("l"));
 }
 
-TEST_F(GrantsTest, RevokesNothingUnasked) {
+TEST_F(GrantsTest, RevokesNothingWithoutConfirmation) {
   addToken('a');
   EXPECT_EQ("2 nobody is there to ask \"Delete 1 token with --user alice?\": add --yes",
             complaint(run({"token", "revoke", "--user", "alice"})));
@@ -206,7 +206,7 @@ TEST_F(GrantsTest, PurgesWhatExpiredLongAgo) {
             run({"token", "purge"}).out);
 }
 
-TEST_F(GrantsTest, PurgesWithAGraceOfTheOperatorsChoice) {
+TEST_F(GrantsTest, PurgesWithTheGraceGiven) {
   addToken('a', "alice", kNow - 3600);
   addToken('b', "alice", kNow - 3601);
   addToken('d', "alice", kNow);

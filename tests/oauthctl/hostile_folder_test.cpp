@@ -1,5 +1,5 @@
-// Root runs the program in a folder that belongs to somebody else, who has put there what could
-// turn root against the machine.
+// Root runs the program in a folder of another user, who has put files there that could make root
+// do damage.
 
 #include <fcntl.h>
 #include <linux/capability.h>
@@ -56,7 +56,7 @@ class HostileFolderTest : public OauthctlTest {
  protected:
   void SetUp() override {
     if (getuid() != 0) GTEST_SKIP() << "only root has rights to lose";
-    // On the same file system, for links.
+    // Hard links need the same file system.
     std::string name = fs::path(files_.directory()).parent_path() / "zevooauth-test-XXXXXX";
     ASSERT_NE(nullptr, mkdtemp(name.data()));
     rootsFolder_ = name;
@@ -66,7 +66,7 @@ class HostileFolderTest : public OauthctlTest {
     if (!rootsFolder_.empty()) fs::remove_all(rootsFolder_);
   }
 
-  // A database as its owner's server leaves it.
+  // Makes a database like the one that the owner's server leaves.
   void fillDatabase() const {
     addClient('c');
     addToken('a', "alice", kNow - 100 * kDay);
@@ -79,7 +79,7 @@ class HostileFolderTest : public OauthctlTest {
     ASSERT_EQ(0, chmod(victim().c_str(), 0600));
   }
 
-  // A file of root in a folder of root's.
+  // A file of root in a folder of root.
   std::string victim() const { return rootsFolder_ + "/victim"; }
   void expectVictimUntouched() const {
     struct stat status = {};
@@ -88,7 +88,7 @@ class HostileFolderTest : public OauthctlTest {
     EXPECT_EQ(0600U, status.st_mode & 07777U);
     EXPECT_EQ(kPrecious, bytesOf(victim()));
   }
-  // No file in the owner's folder holds what root's file holds.
+  // Expects that no file in the owner's folder has the contents of root's file.
   void expectNothingGivenAway() const {
     expectVictimUntouched();
     for (const auto& entry : fs::directory_iterator(files_.directory())) {
@@ -122,8 +122,8 @@ class HostileFolderTest : public OauthctlTest {
   std::string rootsFolder_;
 };
 
-// A journal of a transaction over several databases names the file that all of them share, which
-// is deleted after the roll-back. This one rolls nothing back.
+// The journal of a transaction over several databases names a file that SQLite deletes after it has
+// rolled back the transaction. This journal rolls back nothing.
 class HostileJournalTest : public HostileFolderTest {
  protected:
   void plantJournal() const {
@@ -165,8 +165,8 @@ TEST_F(HostileJournalTest, DeletesNoFileOfRootInARestore) {
   expectVictimUntouched();
 }
 
-// The journal above is one that SQLite takes for real: its owner's own file goes.
-TEST_F(HostileJournalTest, StillDoesWhatItsOwnerMay) {
+// Shows that SQLite accepts the journal above: it deletes a file of the owner.
+TEST_F(HostileJournalTest, DeletesAFileOfItsOwner) {
   fillDatabase();
   ASSERT_EQ(0, chown(rootsFolder_.c_str(), kNobody, kNobody));
   ASSERT_EQ(0, chown(victim().c_str(), kNobody, kNobody));
@@ -202,7 +202,7 @@ TEST_F(HostileFolderTest, LinkInPlaceOfTheDatabaseIsNeitherCopiedNorReplaced) {
   EXPECT_FALSE(fs::exists(rootsFolder_ + "/copy2.db"));
 }
 
-TEST_F(HostileFolderTest, LinkToNowhereMakesNoFile) {
+TEST_F(HostileFolderTest, LinkToAMissingFileMakesNoFile) {
   plantLink(rootsFolder_ + "/made", "oauth.db");
   giveToNobody();
   for (const Words& words : kEveryCommand) EXPECT_EQ(3, run(words).code);
@@ -216,7 +216,7 @@ TEST_F(HostileFolderTest, PipeInPlaceOfTheDatabaseDoesNotHang) {
     EXPECT_EQ("3 " + files_.database() + " is not a regular file", complaint(run(words)));
 }
 
-TEST_F(HostileFolderTest, KeepsWhatBelongsToItsOwner) {
+TEST_F(HostileFolderTest, RestoredFilesBelongToTheOwner) {
   fillDatabase();
   const std::string copy = rootsFolder_ + "/copy.db";
   ASSERT_EQ(0, run({"backup", copy}).code);
@@ -233,8 +233,8 @@ TEST_F(HostileFolderTest, KeepsWhatBelongsToItsOwner) {
     EXPECT_EQ("65534:65534 0600", ownerOf(path(name))) << name;
 }
 
-// A user without a name has the group of the folder.
-TEST_F(HostileFolderTest, KeepsWhatBelongsToAUserWithoutAName) {
+// A user without a name gets the group of the folder.
+TEST_F(HostileFolderTest, RestoredFilesBelongToAnOwnerWithoutAName) {
   fillDatabase();
   for (const std::string& file : {files_.directory(), files_.database()})
     if (chown(file.c_str(), 123456, 123457) != 0) GTEST_SKIP() << "there is no such user here";
@@ -245,8 +245,8 @@ TEST_F(HostileFolderTest, KeepsWhatBelongsToAUserWithoutAName) {
     EXPECT_EQ("123456:123457 0600", ownerOf(path(name))) << name;
 }
 
-// A backup is the operator's, wherever it lies.
-TEST_F(HostileFolderTest, HoldsABackupThatItsOwnerCannotRead) {
+// A backup belongs to the operator, in whatever folder it is.
+TEST_F(HostileFolderTest, BackupBelongsToTheOperator) {
   fillDatabase();
   for (const bool named : {false, true}) {
     if (named) environment_ = {"OAUTHCTL_NO_TMPFILE=1"};
@@ -279,14 +279,15 @@ TEST_F(HostileFolderTest, LinkInPlaceOfABackupIsNotRead) {
   expectNothingGivenAway();
 }
 
-// The owner waits for a temporary file, takes it away, and puts a link in its place.
+// The owner waits for a temporary file, moves it away, and puts a link in its place.
 class SwappedNameTest : public HostileFolderTest {
  protected:
   void SetUp() override {
     HostileFolderTest::SetUp();
     if (IsSkipped()) return;
     fillDatabase();
-    ASSERT_EQ(0, chmod(rootsFolder_.c_str(), 0711));  // for the owner to see what holds the program
+    ASSERT_EQ(0, chmod(rootsFolder_.c_str(),
+                       0711));  // the program, with the owner's ids, must see the file "go"
     environment_ = {"OAUTHCTL_NO_TMPFILE=1", "OAUTHCTL_HOLD=" + rootsFolder_ + "/go"};
   }
   // Runs the command while its temporary file, whose name begins like this, is swapped.
@@ -321,15 +322,15 @@ TEST_F(SwappedNameTest, PutsNothingIntoABackup) {
   expectNothingGivenAway();
 }
 
-// Where a file can be named by its temporary name only, what got the name is looked at.
-TEST_F(SwappedNameTest, IsFoundOutWithoutProc) {
+// If the program must rename the temporary file, it checks afterwards which file has the name.
+TEST_F(SwappedNameTest, IsDetectedWithoutProc) {
   environment_.emplace_back("OAUTHCTL_NO_PROC=1");
   EXPECT_EQ("1 somebody put another file in the place of " + path("copy.db"),
             complaint(runWhileSwapping({"backup", path("copy.db")}, "copy.db.")));
   expectNothingGivenAway();
 }
 
-TEST_F(SwappedNameTest, PutsNothingIntoWhatARestoreKeeps) {
+TEST_F(SwappedNameTest, PutsNothingIntoTheKeptFile) {
   const std::string copy = rootsFolder_ + "/copy.db";
   std::ofstream(rootsFolder_ + "/go") << "";
   ASSERT_EQ(0, run({"backup", copy}).code);
@@ -343,8 +344,8 @@ TEST_F(SwappedNameTest, PutsNothingIntoWhatARestoreKeeps) {
   expectNothingGivenAway();
 }
 
-// The owner puts a link to a database of root's in the place of the database and takes it away
-// again, all the time.
+// The owner puts a link to a database of root in the place of the database and removes it again,
+// all the time.
 class SwappedDatabaseTest : public HostileFolderTest {
  protected:
   void SetUp() override {
@@ -370,7 +371,7 @@ class SwappedDatabaseTest : public HostileFolderTest {
   sqlite3* db_ = nullptr;
 };
 
-TEST_F(SwappedDatabaseTest, NeverGivesADatabaseOfRootAway) {
+TEST_F(SwappedDatabaseTest, NeverGivesAwayADatabaseOfRoot) {
   const std::string before = bytesOf(secret()), copy = rootsFolder_ + "/copy.db";
   ASSERT_EQ(0, run({"backup", copy}).code);
   std::atomic<bool> done{false};
@@ -393,7 +394,7 @@ TEST_F(SwappedDatabaseTest, NeverGivesADatabaseOfRootAway) {
   expectNothingGivenAway();
 }
 
-// What the kernel tells about the program while it has a backup in hand.
+// The ids that the kernel shows for the program while it makes a backup.
 class IdsTest : public HostileFolderTest {
  protected:
   IdsTest() : copy_("/copy.db") {}
@@ -403,7 +404,7 @@ class IdsTest : public HostileFolderTest {
     fillDatabase();
     copy_ = rootsFolder_ + copy_;
   }
-  // The process with our backup among its arguments, "" if there is none yet.
+  // The number of the process that makes our backup, "" if there is none yet.
   std::string program() const {
     for (const auto& entry : fs::directory_iterator("/proc")) {
       const std::string arguments = bytesOf(entry.path() / "cmdline");
@@ -418,7 +419,7 @@ class IdsTest : public HostileFolderTest {
       if (line.rfind(name, 0) == 0) return line;
     return "";
   }
-  // Runs the backup, and the body as soon as the program is about to name the file.
+  // Runs the backup, and calls the body when the program is about to name the file.
   Outcome runBackup(const std::function<void(const std::string& process)>& body) {
     environment_ = {"OAUTHCTL_HOLD=" + rootsFolder_ + "/go"};
     std::thread observer([&] {
@@ -438,7 +439,7 @@ class IdsTest : public HostileFolderTest {
   std::string copy_;
 };
 
-TEST_F(IdsTest, AreThoseOfTheOwnerWhoCannotTouchTheProgram) {
+TEST_F(IdsTest, BelongToTheOwnerWhoCannotSignalTheProgram) {
   std::string users, groups, more;
   int signalled = -1;
   const Outcome outcome = runBackup([&](const std::string& process) {
@@ -462,8 +463,8 @@ TEST_F(IdsTest, AreThoseOfTheOwnerWhoCannotTouchTheProgram) {
   EXPECT_EQ("0:0 0600", ownerOf(copy_));
 }
 
-// Without the right to change its ids root does not go on.
-TEST_F(IdsTest, AreTakenOrNothingHappens) {
+// If root has no right to change its ids, the command ends.
+TEST_F(IdsTest, AreTakenBeforeAnythingHappens) {
   for (const int right : {CAP_SETUID, CAP_SETGID}) {
     beforeExec_ = [right] {
       if (prctl(PR_CAPBSET_DROP, right, 0, 0, 0) != 0) _exit(97);
@@ -477,8 +478,8 @@ TEST_F(IdsTest, AreTakenOrNothingHappens) {
   EXPECT_FALSE(fs::exists(copy_));
 }
 
-// An installation whose database root made.
-TEST_F(HostileFolderTest, DatabaseOfRootIsNotReadForItsOwner) {
+// As if root had made the database.
+TEST_F(HostileFolderTest, DatabaseOfRootIsRefused) {
   fillDatabase();
   ASSERT_EQ(0, chown(files_.database().c_str(), 0, 0));
   for (const Words& words : kEveryCommand)
@@ -492,8 +493,8 @@ TEST_F(HostileFolderTest, DatabaseOfRootIsNotReadForItsOwner) {
             complaint(run({"token", "purge", "--yes"})));
 }
 
-// To give it away would give away the file behind its other name.
-TEST_F(HostileFolderTest, OtherNameOfAFileOfRootIsNotToBeGivenAway) {
+// Whoever gives away the hard link gives away the file of root.
+TEST_F(HostileFolderTest, NoAdviceGivesAwayAFileOfRoot) {
   std::error_code refused;
   fs::create_hard_link(victim(), files_.database(), refused);
   ASSERT_FALSE(refused) << refused.message();
@@ -504,7 +505,7 @@ TEST_F(HostileFolderTest, OtherNameOfAFileOfRootIsNotToBeGivenAway) {
   expectVictimUntouched();
 }
 
-// Somebody who may write to a folder of root's can put the same files there.
+// Everybody who may write to a folder of root can put the same files there.
 TEST_F(HostileFolderTest, FolderOfRootThatOthersMayWriteIsRefused) {
   addClient('c');
   for (const mode_t mode : {0770, 0777, 0702}) {
@@ -532,7 +533,7 @@ TEST_F(HostileFolderTest, FolderOfRootThatOthersMayWriteIsTheOnlyFinding) {
   EXPECT_EQ(contents, databaseBytes());
 }
 
-// Between the library's look at the database and SQLite's opening of it.
+// The link appears after the library has checked the database and before SQLite opens it.
 TEST_F(HostileFolderTest, LinkAtTheLastMomentMakesNoFileOfRoot) {
   for (const Words& words : kEveryCommand) {
     fillDatabase();
@@ -549,8 +550,8 @@ TEST_F(HostileFolderTest, LinkAtTheLastMomentMakesNoFileOfRoot) {
   expectVictimUntouched();
 }
 
-// Its owner can put a link to any folder of root's in the place of the last one.
-TEST_F(HostileFolderTest, FolderAboveOfAnotherUserDecidesWhoRootBecomes) {
+// The owner of a folder above can replace the last folder by a link to any folder of root.
+TEST_F(HostileFolderTest, FolderAboveDecidesWhoseIdsRootTakes) {
   ASSERT_EQ(0, mkdir(path("target").c_str(), 0755));
   ASSERT_EQ(0, chmod(files_.directory().c_str(), 0755));
   ASSERT_EQ(0, symlink(rootsFolder_.c_str(), path("target/etc").c_str()));
@@ -579,7 +580,7 @@ TEST_F(HostileFolderTest, FolderAboveThatOthersMayWriteIsRefused) {
       run({"check"}).out);
 }
 
-// SQLite would wait for ever to open a pipe, and would follow a link.
+// SQLite would wait for ever when it opens a pipe, and would follow a link.
 TEST_F(HostileFolderTest, JournalThatIsNoFileIsRefused) {
   fillDatabase();
   for (const std::string name : {"oauth.db-journal", "oauth.db-wal", "oauth.db-shm"}) {
@@ -597,8 +598,8 @@ TEST_F(HostileFolderTest, JournalThatIsNoFileIsRefused) {
   expectNothingGivenAway();
 }
 
-// The files of a first registration, encryption key included.
-TEST_F(HostileFolderTest, FirstRegistrationMakesFilesOfItsOwner) {
+// The first registration also makes the encryption key.
+TEST_F(HostileFolderTest, FirstRegistrationMakesFilesOfTheOwner) {
   giveToNobody();
   useRealCipher();
   const Outcome outcome =

@@ -1,16 +1,16 @@
-// Values that would take over a terminal, or break a document.
+// Values that could control a terminal or break a JSON document.
 
 #include <clocale>
 
-#include "escaping.h"
 #include "oauthctl_test.h"
+#include "terminal/escaping.h"
 
 using testing::HasSubstr;
 using testing::Not;
 
 namespace {
 
-// Characters that turn the direction of text, spelt so that they cannot turn this file's.
+// Characters that change the direction of text, escaped so that they do not change this file's.
 const std::string kOverride = {'\xE2', '\x80', '\xAE'}, kIsolate = {'\xE2', '\x81', '\xA6'};
 
 const std::string kHostile =
@@ -41,7 +41,7 @@ const std::vector<Words> kReading = {
     {"status"},       {"check"},         {"client", "list"},     {"client", "show", "1"},
     {"code", "list"}, {"token", "list"}, {"token", "show", "1"}, {"log"}};
 
-TEST_F(HostileValuesTest, AreSpeltOutInTables) {
+TEST_F(HostileValuesTest, AreEscapedInTables) {
   for (const Words& words : kReading)
     for (const bool show : {false, true}) {
       if (show && (words[0] == "log" || words[0] == "status" || words[0] == "check")) continue;
@@ -67,25 +67,25 @@ TEST_F(HostileValuesTest, StayValidJson) {
   EXPECT_THAT(json({"log"})[0U]["msg"].asString(), HasSubstr("\x1b[31m"));
 }
 
-TEST_F(HostileValuesTest, AreSpeltOutInComplaints) {
+TEST_F(HostileValuesTest, AreEscapedInComplaints) {
   EXPECT_EQ("1 there is no token with --user \\x1b[2J\\n\\u202e",
             complaint(run({"token", "list", "--user", "\x1b[2J\n" + kOverride})));
 }
 
-TEST_F(HostileValuesTest, AreSpeltOutInQuestions) {
+TEST_F(HostileValuesTest, AreEscapedInQuestions) {
   const Outcome outcome = runOnTerminal({"client", "delete", "1"}, "n\n");
   EXPECT_THAT(outcome.out, HasSubstr("\\x1b[31m"));
   EXPECT_THAT(outcome.out, Not(HasSubstr("\x1b[31m")));
 }
 
-// What cannot be decrypted comes as it is stored, and is masked whatever its length.
+// A value that cannot be decrypted is shown as it is stored, and masked whatever its length.
 TEST_F(HostileValuesTest, AreMaskedAsSecrets) {
   EXPECT_EQ("...", json({"client", "list"})[0U]["client_secret"].asString().substr(
                        json({"client", "list"})[0U]["client_secret"].asString().size() - 3));
   EXPECT_GE(8U, json({"token", "list"})[0U]["access_token"].asString().size());
 }
 
-// Tables that somebody made anew, whose ids are texts. The library takes them as they are.
+// Tables that somebody replaced, so that ids can be texts. The library accepts them.
 class HostileIdsTest : public HostileValuesTest {
  protected:
   HostileIdsTest() {
@@ -104,14 +104,14 @@ class HostileIdsTest : public HostileValuesTest {
     plant("oauth_meta", "version", kHostile);
   }
 
-  // The same rows in a table without types and keys.
+  // Replaces the table by one with the same rows, but without types and keys.
   void forgetTypes(const std::string& table) const {
     std::string sql = "CREATE TABLE copy AS SELECT * FROM ";
     sql.append(table).append("; DROP TABLE ").append(table);
     execute(sql.append("; ALTER TABLE copy RENAME TO ").append(table));
   }
 
-  // Nothing in the text, line ends aside, but what a terminal prints.
+  // Expects only printable characters and line ends.
   static void expectPrintable(const std::string& text) {
     for (const char* const bytes : {"\x1b", "\x01", "\x7f", "\r", "\t", "\xC2\x9B", "\xFF",
                                     "\xED\xA0", "\xF4\x90", kOverride.c_str()})
@@ -156,7 +156,7 @@ std::vector<Words> everyCommand() {
   return all;
 }
 
-TEST_F(HostileIdsTest, AreSpeltOutByEveryCommand) {
+TEST_F(HostileIdsTest, AreEscapedByEveryCommand) {
   for (const Words& words : everyCommand()) {
     SCOPED_TRACE(words[0] + " " + (words.size() > 1 ? words[1] : ""));
     const Outcome outcome = run(words, times(64, 'a') + "\n");
@@ -167,7 +167,7 @@ TEST_F(HostileIdsTest, AreSpeltOutByEveryCommand) {
   }
 }
 
-TEST_F(HostileIdsTest, AreSpeltOutInQuestions) {
+TEST_F(HostileIdsTest, AreEscapedInQuestions) {
   for (const Words& words :
        {Words{"client", "delete", times(64, 'c')}, Words{"token", "revoke", "--user", kHostile},
         Words{"token", "purge", "--grace", "0"}}) {
@@ -177,7 +177,7 @@ TEST_F(HostileIdsTest, AreSpeltOutInQuestions) {
   }
 }
 
-// The number that stands for such an id belongs to another row.
+// Such an id would be read as 0, which is the id of another row.
 TEST_F(HostileIdsTest, ChangeNoOtherRow) {
   execute(
       "INSERT INTO oauth_clientInfo SELECT 'x', 'other', client_secret, redirect_uri, scope, "
@@ -203,7 +203,7 @@ class EscapingTest : public testing::TestWithParam<Text> {
   ~EscapingTest() override { std::setlocale(LC_CTYPE, "C"); }
 };
 
-TEST_P(EscapingTest, SpellsOutWhatIsNoPrintableText) {
+TEST_P(EscapingTest, EscapesUnprintableText) {
   std::setlocale(LC_CTYPE, "C");
   EXPECT_EQ(GetParam().ascii, oauthctl::escaped(GetParam().given));
   if (std::setlocale(LC_CTYPE, "C.UTF-8") == nullptr) return;

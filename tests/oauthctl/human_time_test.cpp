@@ -1,4 +1,4 @@
-#include "human_time.h"
+#include "terminal/human_time.h"
 
 #include <gtest/gtest.h>
 
@@ -19,7 +19,7 @@ void PrintTo(const Moment& moment, std::ostream* out) { *out << moment.text; }
 
 class RelativeTimeTest : public testing::TestWithParam<Moment> {};
 
-TEST_P(RelativeTimeTest, SpeaksAsPeopleDo) {
+TEST_P(RelativeTimeTest, ChoosesTheUnit) {
   EXPECT_EQ(GetParam().text, relativeTime(GetParam().moment, kNow));
 }
 
@@ -36,13 +36,13 @@ INSTANTIATE_TEST_SUITE_P(
 
 struct Length {
   const char* text;
-  std::int64_t seconds;  // -1: none
+  std::int64_t seconds;  // -1: not a duration
 };
 void PrintTo(const Length& length, std::ostream* out) { *out << '"' << length.text << '"'; }
 
 class DurationTest : public testing::TestWithParam<Length> {};
 
-TEST_P(DurationTest, NeedsItsUnit) {
+TEST_P(DurationTest, TakesANumberWithItsUnit) {
   EXPECT_EQ(GetParam().seconds, duration(GetParam().text).value_or(-1));
 }
 

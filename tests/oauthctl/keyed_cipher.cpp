@@ -1,10 +1,10 @@
-// Linked into a test twin of oauthctl instead of the host's libraries: encrypts as the stand-in for
-// the host does, with the key in the folder of the tests' choice.
+// Replaces the host's libraries in a test build of oauthctl. It encrypts like their stand-in, with
+// the key in the folder of the test.
 
 #include <cstring>
 #include <string>
 
-#include "fixed_paths.h"
+#include "database/fixed_paths.h"
 #include "host_libraries.h"
 #include "zevocore_key.h"
 #include "zevocore_siv.h"

@@ -5,7 +5,7 @@ namespace {
 
 class LogTest : public OauthctlTest {
  protected:
-  // The database's own clock stamped them; the tests need moments they know.
+  // Adds the lines, and replaces the times that SQLite's clock gave them by known ones.
   void addLines(const Lines& messages) const {
     for (const std::string& message : messages)
       EXPECT_TRUE(ZEVOOAUTHSERVER::OAUTHDBLog("oauth_log").Add(message));

@@ -28,7 +28,7 @@ constexpr unsigned kNobody = 65534;
 std::string readAll(int descriptor) {
   std::string text;
   char block[4096];
-  // A terminal whose other side was closed answers an error, not the end of the file.
+  // If the other side of a terminal is closed, read() fails instead of returning 0.
   for (ssize_t count = 0; (count = read(descriptor, block, sizeof block)) > 0;)
     text.append(block, static_cast<std::size_t>(count));
   close(descriptor);
@@ -57,7 +57,7 @@ struct Pipe {
   int ends[2];
 };
 
-// The leak checker traces its program, and cannot where the program takes the ids of another user.
+// The leak checker cannot trace a program that takes the ids of another user.
 void skipLeakCheck(const std::string& folder) {
   struct stat status = {};
   if (getuid() != 0 || stat(folder.c_str(), &status) != 0 || status.st_uid == 0) return;
@@ -84,7 +84,7 @@ pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asN
   arguments.push_back(nullptr);
   const pid_t child = fork();
   if (child != 0) return child;
-  // Keys such as Ctrl-C reach the program whose terminal it is.
+  // Keys such as Ctrl-C only reach a program that controls the terminal.
   if (setsid() > 0 && isatty(in) != 0) ioctl(in, TIOCSCTTY, 0);
   dup2(in, STDIN_FILENO);
   dup2(out, STDOUT_FILENO);
@@ -96,11 +96,11 @@ pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asN
   unsetenv("NO_COLOR");
   skipLeakCheck(files_.directory());
   for (const std::string& variable : environment_)
-    putenv(strdup(variable.c_str()));  // the program that follows takes it along
+    putenv(strdup(variable.c_str()));  // the new program inherits it
   if (asNobody) setenv("OAUTHCTL_USER", std::to_string(kNobody).c_str(), 1);
-  // Whoever started the tests may ignore them, as a shell does for a program in the background.
+  // The tests may run with these signals ignored, for example in the background of a shell.
   for (const int ending : {SIGINT, SIGTERM, SIGHUP}) std::signal(ending, SIG_DFL);
-  alarm(120);  // rather than wait for an answer that never comes
+  alarm(120);  // ends a program that waits for ever
   if (beforeExec_) beforeExec_();
   execvp(arguments.front(), arguments.data());
   _exit(98);
@@ -111,7 +111,7 @@ Outcome OauthctlTest::run(const Words& words, const std::string& input) const {
   const pid_t child = start(words, in.ends[0], out.ends[1], err.ends[1], false);
   close(out.ends[1]);
   close(err.ends[1]);
-  writeAll(in.ends[1], input);  // while an end to read from is open here, too: no SIGPIPE
+  writeAll(in.ends[1], input);  // no SIGPIPE: this process also has the reading end open
   close(in.ends[0]);
   close(in.ends[1]);
   Outcome outcome;

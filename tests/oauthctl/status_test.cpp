@@ -6,7 +6,7 @@ namespace {
 
 class StatusTest : public OauthctlTest {};
 
-TEST_F(StatusTest, ShowsTablesSettingsTheFile) {
+TEST_F(StatusTest, ShowsEverything) {
   addClient('c');
   addCode('k', "alice", kNow - 120);
   addToken('a');
@@ -84,7 +84,7 @@ TEST_F(StatusTest, NamesEveryFullTableInOneLine) {
       run({"status"}).err);
 }
 
-// At its ceiling it trims itself, which is its normal state.
+// The log trims itself at its ceiling, so a full log is normal.
 TEST_F(StatusTest, NeverWarnsAboutTheLog) {
   addClient('c');
   writeSettings(R"({"log_max": 1})");
@@ -93,7 +93,7 @@ TEST_F(StatusTest, NeverWarnsAboutTheLog) {
   EXPECT_THAT(outcome.out, HasSubstr("log        1       1 100 %"));
 }
 
-TEST_F(StatusTest, SaysWhatIsWrongWithTheSettingsFile) {
+TEST_F(StatusTest, ReportsAWrongSettingsFile) {
   addClient('c');
   for (const char* const text : {"{", "[1]", "", "{\"a\": \x01}"}) {
     writeSettings(text);

@@ -1,4 +1,4 @@
-// Questions, colour and progress, on a terminal and off it.
+// Questions, colour and progress, with and without a terminal.
 
 #include "oauthctl_test.h"
 
@@ -11,7 +11,7 @@ constexpr char kEscape[] = "\x1b[";
 
 class TerminalTest : public OauthctlTest {
  protected:
-  // As many expired tokens, in one statement.
+  // Adds this many expired tokens, most of them in one statement.
   void addExpiredTokens(int count) const {
     addToken('a', "alice", kNow - 1);
     execute(
@@ -36,14 +36,14 @@ TEST_F(TerminalTest, AsksBeforeItDeletes) {
   EXPECT_EQ(0, rowCount("oauth_token"));
 }
 
-TEST_F(TerminalTest, TakesSilenceForNo) {
+TEST_F(TerminalTest, TakesAnEmptyAnswerForNo) {
   addToken('a');
   EXPECT_EQ(1, runOnTerminal({"token", "revoke", "--user", "alice"}, "\n").code);
   EXPECT_EQ(1, runOnTerminal({"token", "revoke", "--user", "alice"}, "\x04").code);
   EXPECT_EQ(1, rowCount("oauth_token"));
 }
 
-TEST_F(TerminalTest, DoesNotAskWhenToldNotTo) {
+TEST_F(TerminalTest, DoesNotAskWithYes) {
   addToken('a');
   const Outcome outcome = runOnTerminal({"token", "revoke", "--id", "1", "--yes"});
   EXPECT_EQ(0, outcome.code);
@@ -63,7 +63,7 @@ TEST_F(TerminalTest, AsksBeforeItRestores) {
   EXPECT_EQ(1, rowCount("oauth_token"));
 }
 
-TEST_F(TerminalTest, TakesATokenUnseen) {
+TEST_F(TerminalTest, ReadsATokenWithoutEcho) {
   addToken('a');
   const Outcome outcome =
       runOnTerminal({"token", "verify"}, times(64, 'a') + "\n", "access token: ");
@@ -77,7 +77,7 @@ TEST_F(TerminalTest, ColoursTables) {
   EXPECT_THAT(run({"client", "list"}).out, Not(HasSubstr(kEscape)));
 }
 
-TEST_F(TerminalTest, NeverColoursAgainstTheUsersWish) {
+TEST_F(TerminalTest, ObeysNoColor) {
   addClient('c');
   environment_ = {"NO_COLOR=1"};
   EXPECT_THAT(runOnTerminal({"client", "list"}).out, Not(HasSubstr(kEscape)));
@@ -93,14 +93,14 @@ TEST_F(TerminalTest, ShowsProgressOfLongWork) {
   EXPECT_THAT(outcome.out, HasSubstr("\r\x1b[Kdeleted 700 tokens, 0 left"));
 }
 
-TEST_F(TerminalTest, KeepsProgressOutOfFiles) {
+TEST_F(TerminalTest, ShowsNoProgressWithoutATerminal) {
   addExpiredTokens(700);
   const Outcome outcome = run({"token", "purge", "--grace", "0", "--yes"});
   EXPECT_EQ("deleted 700 tokens, 0 left\n", outcome.out);
   EXPECT_EQ("", outcome.err);
 }
 
-TEST_F(TerminalTest, DoesNotBotherWithShortWork) {
+TEST_F(TerminalTest, ShowsNoProgressOfShortWork) {
   addExpiredTokens(100);
   EXPECT_THAT(runOnTerminal({"token", "purge", "--grace", "0", "--yes"}).out,
               Not(HasSubstr("deleting")));

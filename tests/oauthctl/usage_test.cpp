@@ -2,13 +2,14 @@
 
 #include <sys/stat.h>
 
-#include <fstream>
+#include <sstream>
 
-#include "command_table.h"
-#include "documents.h"
+#include "command_line/command_table.h"
+#include "command_line/documents.h"
 #include "oauthctl_test.h"
 
 using testing::HasSubstr;
+using testing::Not;
 using testing::StartsWith;
 
 namespace {
@@ -37,7 +38,7 @@ TEST_F(UsageTest, ExplainsEveryCommandWithAnExample) {
     for (const oauthctl::Example& example : command.examples)
       EXPECT_THAT(outcome.out, HasSubstr(example.line));
     for (const oauthctl::Option& option : command.options)
-      EXPECT_THAT(outcome.out, HasSubstr(option.help == nullptr ? "no help" : option.name));
+      EXPECT_THAT(outcome.out, HasSubstr(option.help.empty() ? "no help" : option.name));
   }
 }
 
@@ -60,7 +61,7 @@ TEST_F(UsageTest, TellsItsVersion) {
   EXPECT_EQ("oauthctl " OAUTHCTL_VERSION "\n", run({"--version"}).out);
 }
 
-// Every line of help fits a terminal of 80 columns; examples are to be copied and stay whole.
+// Every line of help fits a terminal of 80 columns, but for the examples: they can be copied whole.
 TEST_F(UsageTest, KeepsHelpWithinEightyColumns) {
   for (const oauthctl::Command& command : oauthctl::commandTable()) {
     Words words = wordsOf(command.path);
@@ -81,7 +82,7 @@ void PrintTo(const Mistake& mistake, std::ostream* out) {
 
 class MistakeTest : public UsageTest, public testing::WithParamInterface<Mistake> {};
 
-// Before anything is looked at: there is no database in these tests, and none is made.
+// A mistake is reported first: these tests have no database, and none is made.
 TEST_P(MistakeTest, IsOneLine) {
   EXPECT_EQ(GetParam().complaint, complaint(run(GetParam().words)));
   struct stat status;
@@ -129,22 +130,18 @@ INSTANTIATE_TEST_SUITE_P(
         Mistake{{"backup", ""}, "2 FILE is empty"}));
 
 TEST_F(UsageTest, KeepsTheCompletionCurrent) {
-  std::ifstream file(OAUTHCTL_SOURCE "/oauthctl.bash");
-  std::ostringstream text;
-  text << file.rdbuf();
-  EXPECT_EQ(oauthctl::bashCompletion(), text.str())
-      << "run: oauthctl_documents completion > tools/oauthctl/oauthctl.bash";
+  EXPECT_EQ(oauthctl::bashCompletion(), bytesOf(OAUTHCTL_SOURCE "/oauthctl.bash"))
+      << "in tools/oauthctl, run: oauthctl_documents completion > oauthctl.bash";
 }
 
 TEST_F(UsageTest, KeepsTheManualCurrent) {
-  std::ifstream file(OAUTHCTL_SOURCE "/oauthctl.1");
-  std::ostringstream text;
-  text << file.rdbuf();
-  EXPECT_EQ(oauthctl::manualPage(), text.str())
-      << "run: oauthctl_documents manual > tools/oauthctl/oauthctl.1";
+  const std::string page = oauthctl::manualPage(bytesOf(OAUTHCTL_SOURCE "/oauthctl.1.in"));
+  EXPECT_EQ(page, bytesOf(OAUTHCTL_SOURCE "/oauthctl.1"))
+      << "in tools/oauthctl, run: oauthctl_documents manual < oauthctl.1.in > oauthctl.1";
+  EXPECT_THAT(page, Not(HasSubstr("@"))) << "unknown placeholder";
 }
 
-// What bash would offer after the words given, the last of which is still being typed.
+// The words that bash offers to complete the last of these words.
 std::string completed(const std::string& words) {
   const std::string script = "source \"" OAUTHCTL_SOURCE "/oauthctl.bash\"; COMP_WORDS=(" + words +
                              "); COMP_CWORD=$((${#COMP_WORDS[@]} - 1)); _oauthctl; "

@@ -4,9 +4,9 @@
 #include <exception>
 #include <string>
 
-#include "command_line.h"
-#include "escaping.h"
-#include "exit_code.h"
+#include "command_line/command_line.h"
+#include "terminal/escaping.h"
+#include "terminal/exit_code.h"
 
 namespace {
 
