@@ -1,5 +1,5 @@
 # Cross-compiles for 32-bit big-endian PowerPC Linux and runs what was built under emulation.
-# The target's libraries are those of scripts/powerpc-libraries.sh.
+# The target's libraries are those of scripts/lib/powerpc-libraries.sh.
 
 set(CMAKE_SYSTEM_NAME Linux)
 set(CMAKE_SYSTEM_PROCESSOR ppc)

@@ -7,7 +7,7 @@
 #   scripts/abi.sh --record   makes the baselines from what is built now
 #
 # Installs what is missing (scripts/packages.sh, groups build, powerpc and abi) and keeps what it
-# builds for the target (scripts/powerpc-libraries.sh).
+# builds for the target (scripts/lib/powerpc-libraries.sh).
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -20,20 +20,18 @@ case ${1-} in
 esac
 
 scripts/packages.sh build powerpc abi
-libraries=$(scripts/build-folder.sh powerpc-libraries)
-scripts/powerpc-libraries.sh "$libraries"
+libraries=$(scripts/lib/build-folder.sh powerpc-libraries)
+scripts/lib/powerpc-libraries.sh "$libraries"
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 
-# FILE ARCHITECTURE PRESET [OPTION...]: the interface of a release, as its debug information tells.
-# Types that include/ does not define are known by their names only, so that an update of theirs
-# changes nothing here; abidw would keep those of /usr/include, hence the other name.
+# FILE PRESET [OPTION...]: the interface of a release, as its debug information tells. Types that
+# include/ does not define are known by their names only, so that an update of theirs changes
+# nothing here; abidw would keep those of /usr/include, so the preset gives that another name.
 describe() {
   local folder
-  folder=$(scripts/build.sh "$3" "abi-$2" "${@:4}" -DZEVOOAUTH_BUILD_TESTS=OFF \
-    -DZEVOOAUTH_BUILD_TOOLS=OFF \
-    "-DCMAKE_CXX_FLAGS_RELWITHDEBINFO=-O2 -g -DNDEBUG -fdebug-prefix-map=/usr/include=foreign" \
-    -- zevooauth | tail -n 1)
+  folder=$(scripts/build.sh "$2" "$2" "${@:3}" -DZEVOOAUTH_BUILD_TESTS=OFF -- zevooauth |
+    tail -n 1)
   abidw --headers-dir include --drop-private-types --exported-interfaces-only --no-corpus-path \
     --no-comp-dir-path --no-show-locs --no-parameter-names --no-elf-needed --type-id-style hash \
     --out-file "$1" "$folder/libzevooauth.so"
@@ -78,7 +76,7 @@ for architecture in "$(uname -m)" powerpc; do
   baseline=abi/libzevooauth.$architecture.abi
   options=(release)
   [ "$architecture" != powerpc ] || options=(powerpc-release -DPOWERPC_LIBRARIES="$libraries")
-  describe "$work/now" "$architecture" "${options[@]}"
+  describe "$work/now" "${options[@]}"
   if [ -n "$mode" ]; then
     mkdir -p abi
     cp "$work/now" "$baseline"

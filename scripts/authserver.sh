@@ -4,7 +4,7 @@
 #   scripts/authserver.sh [--port N]     8080 unless another port is given
 #
 # Installs what is missing (scripts/packages.sh, groups build and authserver). All it makes lies in
-# a private /var (scripts/authserver-namespace.sh): Ctrl-C ends it and removes everything.
+# a private /var (scripts/lib/private-var.sh): Ctrl-C ends it and removes everything.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -90,10 +90,10 @@ if [ "$port" -gt 65535 ] || [ "$port" -lt "$([ "$(id -u)" -eq 0 ] && echo 1 || e
   exit 1
 fi
 need_free_port
-scripts/authserver-namespace.sh true
+scripts/lib/private-var.sh true
 scripts/packages.sh build authserver
-build=$(scripts/build.sh release authserver -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
-  -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=OFF | tail -n 1)
+build=$(scripts/build.sh release release -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
+  -DZEVOOAUTH_BUILD_TESTS=OFF -- authserver | tail -n 1)
 PATH=$PATH:/usr/sbin \
   AUTHSERVER_PORT=$port \
   AUTHSERVER_ISSUER=http://127.0.0.1:$port \
@@ -101,4 +101,4 @@ PATH=$PATH:/usr/sbin \
   AUTHSERVER_PROGRAMS=$build/examples/authserver/cgi \
   AUTHSERVER_SETUP=$build/examples/authserver/authserver_setup \
   AUTHSERVER_FOLDER=/var/authserver \
-  exec scripts/authserver-namespace.sh scripts/authserver.sh
+  exec scripts/lib/private-var.sh scripts/authserver.sh

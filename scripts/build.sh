@@ -3,13 +3,13 @@
 #
 #   scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]
 #
-# FOLDER is a name below build/ (but see scripts/build-folder.sh). The last line tells where it is.
+# FOLDER is a name below build/ (but see scripts/lib/build-folder.sh). The last line tells where it is.
 # A release that is not hardened is an error.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
 preset=$1
-folder=$(scripts/build-folder.sh "$2")
+folder=$(scripts/lib/build-folder.sh "$2")
 shift 2
 options=()
 while [ $# -gt 0 ] && [ "$1" != -- ]; do

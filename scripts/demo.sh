@@ -16,7 +16,6 @@ if [ ! -O "$data" ]; then # what root makes there would be closed to the folder'
   exit 1
 fi
 scripts/packages.sh build
-folder=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=OFF |
-  tail -n 1)
+folder=$(scripts/build.sh release release -DZEVOOAUTH_BUILD_TESTS=OFF -- lifecycle | tail -n 1)
 umask 077 # the database holds tokens in plain text
 "$folder/examples/lifecycle"

@@ -6,7 +6,7 @@ set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
 scripts/packages.sh docs
-folder=$(scripts/build-folder.sh reference)
+folder=$(scripts/lib/build-folder.sh reference)
 rm -rf "${folder:?}"/*
 # Elsewhere, since doxygen cannot follow a link in a path with a blank.
 work=$(mktemp -d)

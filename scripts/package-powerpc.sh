@@ -4,7 +4,7 @@
 # what its programs need with platform/powerpc/NEEDS.txt, and uses it under emulation in a root
 # folder of its own, where there is nothing but those libraries.
 # Installs what is missing (scripts/packages.sh, groups build and powerpc) and keeps what it builds
-# for the target (scripts/powerpc-libraries.sh). The same commit gives the same archive anywhere.
+# for the target (scripts/lib/powerpc-libraries.sh). The same commit gives the same archive anywhere.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -23,8 +23,8 @@ user=()
 unshare "${user[@]}" --mount true || fail 'this machine does not let you make a namespace: run it as root'
 
 scripts/packages.sh build powerpc
-libraries=$(scripts/build-folder.sh powerpc-libraries)
-scripts/powerpc-libraries.sh "$libraries"
+libraries=$(scripts/lib/build-folder.sh powerpc-libraries)
+scripts/lib/powerpc-libraries.sh "$libraries"
 build=$(scripts/build.sh powerpc-release powerpc-release -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
 
 work=$(mktemp -d)

@@ -6,7 +6,7 @@ set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
 scripts/packages.sh build package
-folder=$(scripts/build-folder.sh packages)
+folder=$(scripts/lib/build-folder.sh packages)
 rm -rf "$folder"
 mkdir -p "$folder"
 

@@ -7,17 +7,17 @@
 # --screenshots renews those in docs/, --sanitizers builds the server with the address and
 # undefined-behaviour sanitizers, NAME runs tests/authserver/NAME.test.mjs only. Installs what is
 # missing (scripts/packages.sh, groups build, authserver and e2e, and what package-lock.json names,
-# below the build folder). Everything runs in a private /var (scripts/authserver-namespace.sh) and
+# below the build folder). Everything runs in a private /var (scripts/lib/private-var.sh) and
 # among processes of its own, which end with it.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
-preset=release
+preset=release folder=release
 screenshots=
 while [[ ${1-} == --* ]]; do
   case $1 in
     --screenshots) screenshots=$PWD/docs ;;
-    --sanitizers) preset=asan ;;
+    --sanitizers) preset=asan folder=authserver-asan ;;
     *)
       echo "test-authserver: usage: scripts/test-authserver.sh [--screenshots] [--sanitizers] [NAME...]" >&2
       exit 2
@@ -27,11 +27,11 @@ while [[ ${1-} == --* ]]; do
 done
 
 # Asked first, as the modules come first: building takes minutes.
-scripts/authserver-namespace.sh unshare --pid --fork --mount-proc true
+scripts/lib/private-var.sh unshare --pid --fork --mount-proc true
 scripts/packages.sh build authserver e2e
 
 # Modules are looked for beside the tests: these run where they lie, not in the source tree.
-tests=$(scripts/build-folder.sh authserver-tests)
+tests=$(scripts/lib/build-folder.sh "authserver-tests-$preset")
 if ! cmp --silent tests/authserver/package-lock.json "$tests/installed.json"; then
   rm -f "$tests/installed.json"
   cp tests/authserver/package.json tests/authserver/package-lock.json "$tests"
@@ -47,8 +47,8 @@ if ! cmp --silent tests/authserver/package-lock.json "$tests/installed.json"; th
   cp tests/authserver/package-lock.json "$tests/installed.json"
   echo "test-authserver: installed the modules of tests/authserver/package-lock.json"
 fi
-build=$(scripts/build.sh "$preset" "authserver-$preset" -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
-  -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=ON | tail -n 1)
+build=$(scripts/build.sh "$preset" "$folder" -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
+  -DZEVOOAUTH_BUILD_TESTS=OFF -- authserver oauthctl | tail -n 1)
 rm -f "$tests"/*.mjs
 cp tests/authserver/*.mjs "$tests"
 
@@ -61,7 +61,7 @@ export AUTHSERVER_SCREENSHOTS=${screenshots:-$tests/screenshots}
 mkdir -p "$AUTHSERVER_SCREENSHOTS"
 # One file at a time: the path of the database is the same for all of them.
 # shellcheck disable=SC2016 # expanded inside
-scripts/authserver-namespace.sh unshare --pid --fork --kill-child --mount-proc bash -c '
+scripts/lib/private-var.sh unshare --pid --fork --kill-child --mount-proc bash -c '
   export HOME=/var/tmp TMPDIR=/var/tmp
   cd "$1" && shift && exec node --test --test-concurrency=1 --test-reporter=tap \
     --test-reporter-destination=stdout --test-reporter=tap --test-reporter-destination=tests.tap \

@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
-# scripts/test.sh, and what runs in a private /var, in the hardest place: in a copy of
-# the checkout below /var, in a home that is closed to others, at a path with a blank, entered
-# through a symbolic link. The copy, and what is built from it, is removed in the end.
+# The quick tests, and the demo in a private /var, in the hardest place: in a copy of the checkout
+# below /var, in a home that is closed to others, at a path with a blank, entered through a symbolic
+# link. The slow tests and the sanitizers do not depend on the place. The copy, and what is built
+# from it, is removed in the end.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -14,8 +15,6 @@ export HOME=$home
 unset XDG_CACHE_HOME
 
 cd "$home/link"
-scripts/test.sh
-demo=$(scripts/build.sh release demo -DZEVOOAUTH_BUILD_TESTS=OFF -DZEVOOAUTH_BUILD_TOOLS=OFF |
-  tail -n 1)
-scripts/authserver-namespace.sh "$demo/examples/lifecycle" | tail -n 1
+scripts/test.sh --quick
+scripts/lib/private-var.sh "$(scripts/lib/build-folder.sh dev)/examples/lifecycle" | tail -n 1
 echo "test-odd-place: passed in $home"

@@ -16,7 +16,7 @@ if ! unshare --mount --pid --fork --mount-proc true; then
 fi
 trap '[ $? -eq 0 ] || echo "test-package: failed" >&2' EXIT
 scripts/packages.sh bare
-folder=$(scripts/build-folder.sh test-package)
+folder=$(scripts/lib/build-folder.sh test-package)
 
 within() { # ROOT COMMAND...: nothing of this machine's environment or processes
   local root=$folder/$1

@@ -2,14 +2,14 @@
 # The tests on the machine that the library ships to: cross-compiled for 32-bit big-endian PowerPC
 # and run under emulation, then databases exchanged with this machine's own build.
 # Installs what is missing (scripts/packages.sh, groups build, test and powerpc) and keeps what it
-# builds for the target (scripts/powerpc-libraries.sh) for the next time.
+# builds for the target (scripts/lib/powerpc-libraries.sh) for the next time.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
 trap '[ $? -eq 0 ] || echo "test-powerpc: failed" >&2' EXIT
 scripts/packages.sh build test powerpc
-libraries=$(scripts/build-folder.sh powerpc-libraries)
-scripts/powerpc-libraries.sh "$libraries"
+libraries=$(scripts/lib/build-folder.sh powerpc-libraries)
+scripts/lib/powerpc-libraries.sh "$libraries"
 native=$(scripts/build.sh dev dev | tail -n 1)
 folder=$(scripts/build.sh powerpc powerpc -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
 

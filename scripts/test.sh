@@ -1,20 +1,44 @@
 #!/usr/bin/env bash
-# Builds and runs every test, plainly and under the address and undefined-behaviour sanitizers, and
-# the tests of threads under the thread sanitizer.
+# Builds and runs the tests.
+#
+#   scripts/test.sh           all tests, plainly and under the address and undefined-behaviour
+#                             sanitizers, and the tests of threads under the thread sanitizer
+#   scripts/test.sh --quick   between two edits: the plain build, without the slow tests
+#
 # Installs what is missing (scripts/packages.sh, groups build and test).
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
+case $#:${1-} in
+  0: | 1:--quick) mode=${1-} ;;
+  *)
+    echo "usage: scripts/test.sh [--quick]" >&2
+    exit 2
+    ;;
+esac
 trap '[ $? -eq 0 ] || echo "test: failed" >&2' EXIT
 if [ ! -e /dev/pts/ptmx ]; then
   echo "test: /dev/pts is not mounted, which the tests of prompts need" >&2
   exit 1
 fi
 scripts/packages.sh build test
+
+run_tests() { # FOLDER OPTION...
+  ctest --test-dir "$1" --output-on-failure --parallel "$(nproc)" "${@:2}"
+}
+
+if [ "$mode" = --quick ]; then
+  folder=$(scripts/build.sh dev dev | tail -n 1)
+  run_tests "$folder" --label-exclude slow --progress >"$folder/quick.log" ||
+    { sed -n '/test cases failed\|tests failed\|\*\*\*/,$p' "$folder/quick.log" && exit 1; }
+  echo "test: passed in $SECONDS s, $(sed -n 's/^100% tests passed, .* out of //p' "$folder/quick.log")" \
+    "quick tests; scripts/test.sh runs the slow ones too"
+  exit
+fi
 folder=$(scripts/build.sh tsan tsan -- threads_test | tail -n 1)
-ctest --test-dir "$folder" --output-on-failure --tests-regex '^ThreadsTest'
+run_tests "$folder" --tests-regex '^ThreadsTest'
 for preset in dev asan; do
   folder=$(scripts/build.sh "$preset" "$preset" | tail -n 1)
-  ctest --test-dir "$folder" --output-on-failure --parallel "$(nproc)"
+  run_tests "$folder"
 done
 echo "test: passed, plain and under sanitizers"

@@ -3,9 +3,9 @@
 # somebody else, or its path has a blank, which some tools split at, it lies in the user's own cache
 # folder instead, or in /tmp if there is none.
 #
-#   scripts/build-folder.sh NAME
+#   scripts/lib/build-folder.sh NAME
 set -euo pipefail
-cd "$(dirname "$(readlink -f "$0")")/.."
+cd "$(dirname "$(readlink -f "$0")")/../.."
 
 usable() { # ROOT NAME
   [[ $1 != *[[:space:]]* ]] && mkdir -p "$1" 2>/dev/null && [ -w "$1" ] &&

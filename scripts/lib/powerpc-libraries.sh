@@ -2,12 +2,12 @@
 # Builds what the PowerPC target needs from Debian's source packages: SQLite, JsonCpp, GoogleTest,
 # nettle and util-linux's libsmartcols; Boost and CLI11 are headers only and taken from this machine.
 #
-#   scripts/powerpc-libraries.sh FOLDER
+#   scripts/lib/powerpc-libraries.sh FOLDER
 #
 # What FOLDER holds already is not built again. The system's package configuration is left alone:
 # sources are fetched through one of their own, made from the places the system has.
 set -euo pipefail
-cd "$(dirname "$(readlink -f "$0")")/.."
+cd "$(dirname "$(readlink -f "$0")")/../.."
 
 host=powerpc-linux-gnu
 mkdir -p "$1"

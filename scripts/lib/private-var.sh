@@ -1,21 +1,21 @@
 #!/usr/bin/env bash
 # Runs a command where the library's fixed database path is private and empty.
 #
-#   scripts/authserver-namespace.sh COMMAND...
+#   scripts/lib/private-var.sh COMMAND...
 #
 # Only the command and its children see the empty /var in memory, with the database's folder in it
 # and, if they lie there, this checkout and its build folder. It is gone when the last of them ends.
 # Needs root, or a kernel that lets users make namespaces.
 set -euo pipefail
-cd "$(dirname "$(readlink -f "$0")")/.."
+cd "$(dirname "$(readlink -f "$0")")/../.."
 
 user=()
 [ "$(id -u)" -eq 0 ] || user=(--user --map-root-user)
 if ! unshare "${user[@]}" --mount true; then
-  echo "authserver-namespace: this machine does not let you make a namespace: run it as root" >&2
+  echo "private-var: this machine does not let you make a namespace: run it as root" >&2
   exit 1
 fi
-build=$(scripts/build-folder.sh authserver)
+build=$(scripts/lib/build-folder.sh release)
 kept=()
 for folder in "$PWD" "${build%/*}"; do
   [[ $folder/ != /var/* ]] || kept+=("$folder")
@@ -44,4 +44,4 @@ exec unshare "${user[@]}" --mount bash -c '
   rmdir "$new"
   trap - EXIT
   cd "$PWD"
-  exec "$@"' authserver-namespace "${kept[@]}" -- "$@"
+  exec "$@"' private-var "${kept[@]}" -- "$@"
