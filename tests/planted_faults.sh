@@ -5,7 +5,7 @@
 #   tests/planted_faults.sh [ID...]
 #
 # Without an ID all faults are planted. Builds in a copy that it removes; the checkout stays as it
-# is. Takes about half an hour. Exit code 1 if a fault is missed, 2 if one cannot be planted.
+# is. Takes about a quarter of an hour. Exit code 1 if a fault is missed, 2 if one cannot be planted.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
