@@ -1349,6 +1349,23 @@ TEST_F(PrivilegeTest, StopsLeavingAfterClosingWhenTheUserCannotBecomeRootAgain) 
   expectIds(0, 0);
 }
 
+// syslog() may change errno.
+TEST_F(PrivilegeTest, HasErrnoOneAfterARefusalWhateverTheLogLeaves) {
+  ids_.become(1000, 500);
+  log_.leaveErrno(EBADF);
+  ids_.refuse("setresgid(-1, 0, -1)", EPERM);
+  open();
+  EXPECT_THAT(connections_.seen, ElementsAre("open as 1000:500, errno 1"));
+}
+
+TEST_F(PrivilegeTest, LeavesErrnoOneAfterAFailedRestoringWhateverTheLogLeaves) {
+  ids_.become(1000, 500);
+  open();
+  log_.leaveErrno(EBADF);
+  ids_.refuse("setresuid(-1, 1000, -1)", EAGAIN);
+  EXPECT_EQ(1, errnoAfterClosing());
+}
+
 TEST_F(PrivilegeTest, LeavesErrnoZeroForRoot) { EXPECT_EQ(0, errnoAfterOpening()); }
 
 TEST_F(PrivilegeTest, LeavesErrnoZeroAfterRestoring) {

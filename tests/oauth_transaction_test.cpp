@@ -393,6 +393,23 @@ TYPED_TEST(SweepTest, KeepsTheCallersTransactionOpenAfterAFailedDelete) {
   this->expectError(store, 19, "kept");
 }
 
+// SQLite then undoes the last statement alone, and what the caller did before stays.
+TYPED_TEST(SweepTest, KeepsTheCallersTransactionOpenOnAFullDisk) {
+  const FaultyDisk disk;
+  this->insertMoreThanTheJournalHolds();
+  this->onDeleteOf(0, "ABORT, 'never'");
+  TypeParam store(this->table_);
+  EXPECT_TRUE(store.DBCmd("BEGIN; INSERT INTO oauth_log VALUES(1, 'kept', 1);", nullptr, nullptr));
+  FaultyDisk::limitJournal(this->kJournalRoom);
+  EXPECT_EQ(0, store.Purge());
+  EXPECT_TRUE(FaultyDisk::mend());
+  EXPECT_TRUE(store.DBCmd("COMMIT;", nullptr, nullptr));
+  EXPECT_EQ(1, this->rowCount("oauth_log"));
+  EXPECT_GT(this->rowCount(this->table_), 0);
+  EXPECT_LT(this->rowCount(this->table_), 200);
+  this->expectError(store, 13, "database or disk is full");
+}
+
 TYPED_TEST(SweepTest, LeavesTheStoreUsableAfterAFailedCommit) {
   this->insertExpired(2);
   TypeParam store(this->table_);

@@ -3,6 +3,7 @@
 #include <syslog.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdarg>
 #include <cstdio>
 #include <mutex>
@@ -19,6 +20,7 @@ struct Entry {
 std::mutex guard;
 std::vector<Entry> entries;
 CapturedSyslog* current = nullptr;
+int leftErrno = 0;
 
 [[gnu::format(printf, 2, 0)]] void record(int priority, const char* format, va_list arguments) {
   const OwnWork seam;
@@ -30,6 +32,7 @@ CapturedSyslog* current = nullptr;
   va_end(again);
   const std::lock_guard<std::mutex> lock(guard);
   if (current != nullptr) entries.push_back({priority, format, text});
+  if (leftErrno != 0) errno = leftErrno;
 }
 
 // "oauth_token.cpp:12 Bad parameters" -> "oauth_token.cpp Bad parameters"
@@ -57,6 +60,7 @@ CapturedSyslog::CapturedSyslog() {
   const std::lock_guard<std::mutex> lock(guard);
   entries.clear();
   current = this;
+  leftErrno = 0;
 }
 
 CapturedSyslog::~CapturedSyslog() {
@@ -72,6 +76,11 @@ std::vector<std::string> CapturedSyslog::lines() const {
 
 std::vector<std::string> CapturedSyslog::formats() const {
   return printed([](const Entry& entry) { return entry.format; });
+}
+
+void CapturedSyslog::leaveErrno(int error) {
+  const std::lock_guard<std::mutex> lock(guard);
+  leftErrno = error;
 }
 
 void CapturedSyslog::clear() {

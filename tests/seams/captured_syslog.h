@@ -20,4 +20,6 @@ class CapturedSyslog {
   // The formats as they were handed over: "%s:%d Bad parameters".
   std::vector<std::string> formats() const;
   void clear();
+  // syslog() leaves this errno from now on, as it may after a lost connection.
+  void leaveErrno(int error);
 };

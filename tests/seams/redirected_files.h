@@ -35,9 +35,9 @@ class RedirectedFiles {
   void waitForLocks();
   // sqlite3_close() closes, and answers this code.
   void failClose(int code);
-  // getrandom() fails with this errno: ENOSYS is a kernel without the call.
-  void failRandomCall(int error);
-  // getrandom() is interrupted every other time, and delivers 5 bytes at most.
+  // getrandom() fails with this errno after so many calls: ENOSYS is a kernel without the call.
+  void failRandomCall(int error, int calls = 0);
+  // getrandom() is interrupted every other time, and delivers 5 bytes at most: 1, 2, 3 and so on.
   void trickleRandomBytes();
   // The device of random bytes cannot be opened.
   void removeRandomDevice();
