@@ -59,8 +59,5 @@ class AuditLogFuzz {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  FuzzedDataProvider input(data, size);
-  AuditLogFuzz fuzz(input);
-  for (int i = 0; i < 8 && input.remaining_bytes() > 0; ++i) fuzz.step();
-  return 0;
+  return run<AuditLogFuzz>(data, size);
 }

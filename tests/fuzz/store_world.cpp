@@ -70,6 +70,19 @@ std::map<std::string, Rows> firstRows() {
           {"oauth_log", two(line, "msg")}};
 }
 
+std::string sealedIf(const std::string& column, const std::string& value) {
+  const bool sensitive = column == "client_id" || column == "client_secret";
+  return sensitive ? FakeHost::sealed(value) : value;
+}
+
+// As the file holds them.
+Row stored(const Values& values) {
+  Row row;
+  for (const auto& [column, value] : values.asGiven) row[column] = sealedIf(column, value);
+  for (const auto& [column, value] : values.quoted) row[column] = sealedIf(column, doubled(value));
+  return row;
+}
+
 std::string_view columnText(sqlite3_stmt* row, int column) {
   const unsigned char* const text = sqlite3_column_text(row, column);
   const auto size = static_cast<std::size_t>(sqlite3_column_bytes(row, column));
@@ -178,6 +191,58 @@ StoreWorld::StoreWorld(FuzzedDataProvider& input)
     : input_(input), files_(Database::get().directory()), tables_(Database::get().first()) {
   databaseClock = 1'700'000'000;
   Database::get().reset();
+}
+
+// Notes the error if a value as given holds a NUL byte.
+bool StoreWorld::refused(const Row& asGiven) {
+  std::vector<std::string> values;
+  for (const auto& [column, value] : asGiven) {
+    if (column == "client_id" && hasNul(value)) return fail(-4, "Data Encrypt failed") == 0;
+    if (column != "client_id") values.push_back(value);
+  }
+  const std::string refusal = refusalOf(values);
+  return !refusal.empty() && fail(1, refusal) == 0;
+}
+
+int StoreWorld::insert(const std::string& table, const std::string& unique, const Values& values) {
+  if (refused(values.asGiven)) return 0;
+  Row row = stored(values);
+  for (const auto& [id, other] : rows(table))
+    if (other.at(unique) == row.at(unique))
+      return fail(19, "UNIQUE constraint failed: " + table + "." + unique);
+  add(table, std::move(row));
+  return 1;
+}
+
+int StoreWorld::update(const std::string& table, std::int64_t id, const Values& values) {
+  if (refused(values.asGiven)) return 0;
+  const auto row = rows(table).find(id);
+  if (row == rows(table).end()) return 0;
+  for (const auto& [column, value] : stored(values)) row->second[column] = value;
+  return 1;
+}
+
+std::int64_t StoreWorld::expectFound(const OAUTHDBBasic& store, const std::string& table,
+                                     const Json::Value& delivered, int success,
+                                     const std::string& column, const std::string& text,
+                                     bool asGiven) {
+  if (!fits(text, 64, 64)) {
+    expect(store, success, fail(-2, "Bad parameters"));
+    return 0;
+  }
+  if (asGiven && hasNul(text)) {
+    expect(store, success, fail(1, refusalOf({text})));
+    return 0;
+  }
+  expect(store, success, 1);
+  const std::string kept = sealedIf(column, asGiven ? text : doubled(text));
+  std::int64_t found = 0;
+  expectRows(table, delivered, [&](const Row& row) {
+    if (row.at(column) != kept) return false;
+    found = number(row.at("id"));
+    return true;
+  });
+  return found;
 }
 
 void StoreWorld::add(const std::string& table, Row row) {

@@ -5,6 +5,7 @@
 
 #include <json/value.h>
 
+#include <cstddef>
 #include <cstdint>
 #include <map>
 #include <string>
@@ -19,6 +20,12 @@
 using Row = std::map<std::string, std::string>;  // stored text by column, "id" among them
 using Rows = std::map<std::int64_t, Row>;        // by id
 
+// What a change writes, by column. Single quotes are doubled or not; client identifiers and secrets
+// are encrypted in any case.
+struct Values {
+  Row quoted, asGiven;
+};
+
 class StoreWorld {
  public:
   // What the settings file says, so that small inputs fill a table.
@@ -32,7 +39,10 @@ class StoreWorld {
 
   // The model. Change it, then let expect() compare.
   Rows& rows(const std::string& table) { return tables_[table]; }
-  void add(const std::string& table, Row row);  // the id is the next one
+  // Inserts a row with the next id, or updates the row of the id, and returns what the store must
+  // answer.
+  int insert(const std::string& table, const std::string& unique, const Values& values);
+  int update(const std::string& table, std::int64_t id, const Values& values);
   void addToLog(const std::string& msg);
   void dropExpired(const std::string& table);
 
@@ -49,6 +59,25 @@ class StoreWorld {
     requireEqual(delivered, expected);
   }
   static void requireEqual(const Json::Value& actual, const Json::Value& expected);
+  // Requires a look-up by a text of 64 bytes to have found the rows that hold it. Returns the id of
+  // the last one, 0 if there is none.
+  std::int64_t expectFound(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, const std::string& table,
+                           const Json::Value& delivered, int success, const std::string& column,
+                           const std::string& text, bool asGiven = false);
+  // Reads any row by its id, or every row.
+  template <class Store>
+  void getById(Store& store, const std::string& table) {
+    const std::int64_t id = anyId(table);
+    Json::Value delivered;
+    expect(store, store.Get(id, &delivered), 1);
+    expectRows(table, delivered, [&](const Row& row) { return number(row.at("id")) == id; });
+  }
+  template <class Store>
+  void getAll(Store& store, const std::string& table) {
+    Json::Value delivered;
+    expect(store, store.Get(&delivered), 1);
+    expectRows(table, delivered, [](const Row&) { return true; });
+  }
 
   // The id of a row of the table, or any number.
   std::int64_t anyId(const std::string& table);
@@ -59,6 +88,8 @@ class StoreWorld {
   static Json::Value linesLike(const std::string& pattern, const std::string& option);
 
  private:
+  void add(const std::string& table, Row row);  // the id is the next one
+  bool refused(const Row& asGiven);
   static Json::Value plain(const Row& row);
   static void expectTable(const std::string& table, const Rows& rows);
 
@@ -70,3 +101,12 @@ class StoreWorld {
   int code_ = ZEVOOAUTHSERVER::kErrNone;
   std::string msg_;
 };
+
+// A fuzz target: makes the class of the input and lets it take some steps.
+template <class Fuzz>
+int run(const std::uint8_t* data, std::size_t size) {
+  FuzzedDataProvider input(data, size);
+  Fuzz fuzz(input);
+  for (int i = 0; i < 8 && input.remaining_bytes() > 0; ++i) fuzz.step();
+  return 0;
+}
