@@ -30,9 +30,9 @@ const StoreDescription& described(const std::string& table) {
 }
 
 // The parameter is the name of the table.
-class EveryStoreTest : public RowStoreTest, public testing::WithParamInterface<std::string> {
+class DescribedStoreTest : public RowStoreTest, public testing::WithParamInterface<std::string> {
  protected:
-  EveryStoreTest() : RowStoreTest(described(GetParam())) {}
+  DescribedStoreTest() : RowStoreTest(described(GetParam())) {}
 
   std::vector<Change> adds() const { return chosen(false); }
   std::vector<Change> edits() const { return chosen(true); }
@@ -85,7 +85,7 @@ const auto kExpiringStores = Values("oauth_grantCode", "oauth_token");
 
 // --- Add and Edit ---
 
-class StoreChangeTest : public EveryStoreTest {};
+class StoreChangeTest : public DescribedStoreTest {};
 INSTANTIATE_TEST_SUITE_P(, StoreChangeTest, kKeyedStores, tableName);
 
 TEST_P(StoreChangeTest, KeepsAnEarlierErrorOnSuccess) {
@@ -128,7 +128,7 @@ TEST_P(StoreChangeTest, AcceptsExactlyTheLengthsOfItsRules) {
       }
 }
 
-// With one value after the other too long, the trace names what was checked up to there.
+// Make each value too long in turn. The trace shows which values were checked.
 TEST_P(StoreChangeTest, StopsAtTheFirstBadLength) {
   for (const Change& change : its_.changes) {
     if (!change.edits && &change != &its_.changes.front()) continue;  // checks random texts too
@@ -202,7 +202,7 @@ TEST_P(StoreChangeTest, ReportsAFailedStatement) {
     log_.clear();
     Json::Value result;
     EXPECT_EQ(0, change.run(*store, 1, its_.row, result));
-    // Add() gives back what it would have stored.
+    // Add() returns its secrets all the same.
     EXPECT_THAT(result.getMemberNames(), ElementsAreArray(change.edits ? Lines() : its_.secrets));
     expectError(*store, 8, "attempt to write a readonly database");
     EXPECT_THAT(log_.lines(),
@@ -222,7 +222,7 @@ TEST_P(StoreChangeTest, RewritesWhatItTakesAlone) {
     Json::Value result;
     EXPECT_EQ(1, change.run(*store, 4294967297LL, its_.other, result));
     EXPECT_THAT(rows(), ElementsAre(printed(its_.row), printed(expected, "4294967297")));
-    // The same once more, which is no failure either.
+    // An edit that changes nothing succeeds too.
     EXPECT_EQ(1, change.run(*store, 4294967297LL, its_.other, result));
     EXPECT_THAT(rows(), ElementsAre(printed(its_.row), printed(expected, "4294967297")));
     EXPECT_THAT(log_.lines(), IsEmpty());
@@ -276,7 +276,7 @@ TEST_P(StoreChangeTest, TracesEveryStepOfAnEdit) {
 
 // --- Quotes and NUL bytes ---
 
-class StoreTextTest : public EveryStoreTest {
+class StoreTextTest : public DescribedStoreTest {
  protected:
   // Each value that a change takes: what is given, and what is then stored.
   void expectStored(
@@ -338,10 +338,10 @@ TEST_P(StoreTextTest, EndsEveryQuotedValueAtItsFirstNul) {
         [](const Field&, const std::string& given) { return given.substr(0, given.find('\0')); });
 }
 
-class StoreTextAsGivenTest : public EveryStoreTest {};
+class StoreTextAsGivenTest : public DescribedStoreTest {};
 INSTANTIATE_TEST_SUITE_P(, StoreTextAsGivenTest, kExpiringStores, tableName);
 
-// SQLite reads the statement up to that byte, and finds a text without an end.
+// SQLite reads the statement up to the NUL byte, and finds a text without a closing quote.
 TEST_P(StoreTextAsGivenTest, RefusesANul) {
   const auto store = its_.open();
   for (const Change& change : its_.changes)
@@ -372,7 +372,7 @@ TEST_P(StoreTextAsGivenTest, RefusesANul) {
 
 // --- Add ---
 
-class StoreAddTest : public EveryStoreTest {
+class StoreAddTest : public DescribedStoreTest {
  protected:
   const Change add_ = its_.changes.front();
   std::shared_ptr<Store> store_ = its_.open();
@@ -469,7 +469,7 @@ TEST_P(StoreAddTest, LeavesItsSecretsInTheResultOfAFailedInsert) {
 
 // --- Add with secrets of its own ---
 
-class StoreIssueTest : public EveryStoreTest {
+class StoreIssueTest : public DescribedStoreTest {
  protected:
   StoreIssueTest() {
     for (const Change& change : adds())
@@ -519,7 +519,7 @@ TEST_P(StoreIssueTest, StoresWhatItReturns) {
   }
 }
 
-// A secret that could be guessed would be worse than none.
+// A secret that can be guessed is worse than no secret.
 TEST_P(StoreIssueTest, IssuesNothingWithoutRandomBytes) {
   files_.failRandomCall(ENOSYS);
   files_.removeRandomDevice();
@@ -537,7 +537,7 @@ TEST_P(StoreIssueTest, IssuesNothingWithoutRandomBytes) {
 
 // --- Addresses ---
 
-class StoreAddressTest : public EveryStoreTest {
+class StoreAddressTest : public DescribedStoreTest {
  protected:
   // Refused in the log alone, with the error as it was.
   void expectBadAddress(const Change& change, const Row& row) {
@@ -619,7 +619,7 @@ TEST_P(StoreAddressTest, IsCheckedAfterTheCeiling) {
 
 // --- Del ---
 
-class StoreDelTest : public EveryStoreTest {};
+class StoreDelTest : public DescribedStoreTest {};
 INSTANTIATE_TEST_SUITE_P(, StoreDelTest, kKeyedStores, tableName);
 
 TEST_P(StoreDelTest, TellsIdsApartBeyond32Bits) {
@@ -670,7 +670,7 @@ TEST_P(StoreDelTest, TracesEveryStep) {
   }
 }
 
-class StoreFailureTest : public EveryStoreTest {};
+class StoreFailureTest : public DescribedStoreTest {};
 INSTANTIATE_TEST_SUITE_P(, StoreFailureTest, kEveryStore, tableName);
 
 TEST_P(StoreFailureTest, ReportsAFailedDelete) {
@@ -690,7 +690,7 @@ TEST_P(StoreFailureTest, ReportsAFailedDelete) {
 
 // --- Look-ups ---
 
-class StoreGetTest : public EveryStoreTest {
+class StoreGetTest : public DescribedStoreTest {
  protected:
   std::shared_ptr<Store> store_ = its_.open();
   Json::Value rows_ = "before";
@@ -752,7 +752,7 @@ TEST_P(StoreGetTest, SucceedsWithoutARow) {
   EXPECT_THAT(log_.lines(), IsEmpty());
 }
 
-// An error here also for codes, whose other refusals are in the log alone.
+// Codes report this as an error too, unlike the bad lengths of their changes.
 TEST_P(StoreGetTest, AcceptsTextsOf64BytesOnly) {
   for (const Lookup& lookup : its_.lookups)
     for (const int length : {0, 63, 65, 100000}) {
@@ -882,7 +882,7 @@ TEST_P(StoreFailureTest, ReportsAFailedRead) {
 
 // --- GetIndex ---
 
-class StoreIndexTest : public EveryStoreTest {
+class StoreIndexTest : public DescribedStoreTest {
  protected:
   std::shared_ptr<Store> store_ = its_.open();
 };
@@ -937,7 +937,7 @@ TEST_P(StoreIndexTest, TracesTheLookupToo) {
 
 // --- Expiry ---
 
-class StoreExpiryTest : public EveryStoreTest {
+class StoreExpiryTest : public DescribedStoreTest {
  protected:
   std::shared_ptr<Store> store_ = its_.open();
 };
@@ -989,7 +989,7 @@ TEST_P(StoreExpiryTest, HidesNoRowFromLookups) {
 
 // --- Purge ---
 
-class StorePurgeTest : public EveryStoreTest {
+class StorePurgeTest : public DescribedStoreTest {
  protected:
   std::shared_ptr<Store> store_ = its_.open();
 };
@@ -1096,7 +1096,7 @@ TEST_P(StorePurgeTest, TracesEveryDelete) {
 
 // --- A store that could not be opened ---
 
-class UnopenedStoreTest : public EveryStoreTest {
+class UnopenedStoreTest : public DescribedStoreTest {
  protected:
   UnopenedStoreTest() { files_.removeDirectory(); }
 

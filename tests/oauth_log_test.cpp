@@ -20,11 +20,11 @@ class LogTest : public StoreTest {
  protected:
   static void createDatabase() { const OAUTHDBLog log("oauth_log"); }
 
-  // Moves every row into the past, so that the next write falls into a second of its own.
+  // Moves every row into the past, so that the next row has another timestamp.
   void ageRowsBy(int seconds) const {
     execute("UPDATE oauth_log SET timestamp = timestamp - " + std::to_string(seconds));
   }
-  // Puts every later write into this second.
+  // Gives every row that is added from now on this timestamp.
   void stampInserts(int second) const {
     execute("DROP TRIGGER IF EXISTS stamp");
     execute(
@@ -145,7 +145,7 @@ TEST_F(LogRotationTest, DropsEveryRowOfTheSecondThatStraddlesTheCeiling) {
   EXPECT_THAT(messages(), ElementsAre("newest"));
 }
 
-TEST_F(LogRotationTest, GoesByTimeInsteadOfRow) {
+TEST_F(LogRotationTest, TrimsByTimeInsteadOfId) {
   writeSettings(R"({"log_max": 2})");
   OAUTHDBLog log("oauth_log");
   insertRow(300, "from the future");
@@ -226,7 +226,7 @@ TEST_F(LogRotationTest, DoesNotSpoilTheInsertsResult) {
   EXPECT_THAT(log_.lines(), ElementsAre("3 oauth_db_basic.cpp Run Command failed!![refused][19]"));
 }
 
-TEST_F(LogRotationTest, NamesItsFailureWithTheDebugSwitchAlone) {
+TEST_F(LogRotationTest, LogsItsFailureOnlyWithDiagnosticsOn) {
   OAUTHDBLog("oauth_log").Add("old");
   ageRowsBy(10);
   writeSettings(R"({"log_max": 1, "log_level": 0})");
@@ -265,7 +265,7 @@ class LogGetTest : public LogTest {
     insertRow(10, "beta");
     insertRow(20, "ABC gamma");
   }
-  // The messages found, in order.
+  // The messages of the rows, in their order.
   static Lines found(const Json::Value& rows) {
     Lines result;
     for (const Json::Value& row : rows) result.push_back(row["msg"].asString());
@@ -471,7 +471,7 @@ TEST_F(UnopenedLogTest, RefusesToAdd) {
   expectError(log, kErrCreateTable, "Create table failed");
 }
 
-TEST_F(UnopenedLogTest, NamesTheFailedRotationWithTheDebugSwitchAlone) {
+TEST_F(UnopenedLogTest, LogsTheFailedRotationOnlyWithDiagnosticsOn) {
   files_.openWithoutHandle(14);
   const Lines lines = traced(0, [](OAUTHDBLog& log) {
     EXPECT_EQ(0, log.Add("lost"));

@@ -1,5 +1,5 @@
-// Hostile messages and keywords for the audit log. Its options are ready-made SQL and therefore
-// not the input's.
+// Hostile messages and keywords for the audit log. Options are SQL, so they do not come from the
+// input.
 
 #include <cstddef>
 #include <cstdint>

@@ -61,7 +61,7 @@ class ClientRegistryFuzz {
   std::string scope() { return textOf(input_, 1, 2048); }
   std::string name() { return textOf(input_, 1, 64); }
 
-  // What Add() must answer, with the model changed as Add() must change the table.
+  // Does to the model what Add() does to the table. Returns what Add() must return.
   int added(const std::string& id, const std::string& secret, const std::string& uri,
             const std::string& scope, const std::string& name, const std::string& enable,
             Json::Value& result) {
@@ -120,7 +120,7 @@ class ClientRegistryFuzz {
       return world_.expect(clients_, success, world_.fail(-2, "Bad parameters"));
     expectGenerated(success, where, what, who, result);
   }
-  // The generated values are not known before; those in the result stand for them.
+  // The generated values are random, so take them from the result.
   void expectGenerated(int success, const std::string& where, const std::string& what,
                        const std::string& who, const Json::Value& result) {
     const std::string id = success != 0 ? result["client_id"].asString() : std::string(64, 'x');

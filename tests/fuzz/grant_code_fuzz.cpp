@@ -64,7 +64,7 @@ class GrantCodeFuzz {
 
   std::string code() { return textOrKnown(input_, 64, 64, known_); }
 
-  // What Add() must answer, with the model changed as Add() must change the table.
+  // Does to the model what Add() does to the table. Returns what Add() must return.
   int added(const Grant& grant, const std::string& code, const std::string& expiry,
             const std::string& ip, Json::Value& result) {
     if (world_.rows(kTable).size() >= StoreWorld::kRowMax)
@@ -95,7 +95,7 @@ class GrantCodeFuzz {
     const std::string ip = addressOf(input_);
     Json::Value result;
     const int success = codes_.Add(grant.user, grant.client, grant.scope, grant.state, ip, result);
-    // The code is not known before; the one in the result stands for it.
+    // The secrets are random, so take them from the result.
     const std::string code = success != 0 ? result["code"].asString() : std::string(64, 'x');
     const std::string expiry = std::to_string(world_.now() + StoreWorld::kPeriod);
     Json::Value expected;

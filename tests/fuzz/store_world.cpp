@@ -29,8 +29,8 @@ int currentTime(sqlite3_vfs*, sqlite3_int64* milliseconds) {
   return SQLITE_OK;
 }
 
-// The row with an id beyond 32 bits, after which the next one's low 32 bits are the smallest int.
-// What is unique in its table ends in another character.
+// A second row. The low 32 bits of the id after it are the smallest int. The unique value ends in
+// another character.
 Row second(Row row, const std::string& unique) {
   row["id"] = "6442450943";
   row[unique].back() = '2';
@@ -41,7 +41,7 @@ Rows two(const Row& row, const std::string& unique) {
   return {{3, row}, {6442450943, second(row, unique)}};
 }
 
-// What every table holds at first.
+// The rows of every table at the start.
 std::map<std::string, Rows> firstRows() {
   const std::string sealed = FakeHost::sealed(std::string(64, 'c'));
   const Row client = {{"enable", "1"},
@@ -89,7 +89,7 @@ std::string_view columnText(sqlite3_stmt* row, int column) {
   return {reinterpret_cast<const char*>(text), size};
 }
 
-// The database, seen by a connection of its own: in memory it lives as long as one is open.
+// The database in memory. It exists as long as a connection is open, which this object keeps.
 class Database {
  public:
   static Database& get() {
@@ -126,7 +126,7 @@ class Database {
 
  private:
   Database() {
-    // Every database is in memory, shared by its path, and tells the time of databaseClock.
+    // Every connection to the same path shares one database in memory, whose time is databaseClock.
     static sqlite3_vfs vfs = *sqlite3_vfs_find("memdb");
     vfs.zName = "fuzz";
     vfs.xCurrentTimeInt64 = currentTime;
@@ -252,7 +252,7 @@ void StoreWorld::add(const std::string& table, Row row) {
   all[id] = std::move(row);
 }
 
-// Beyond the ceiling a line goes with all those of its second.
+// A line beyond the ceiling is deleted, and with it all lines of the same second.
 void StoreWorld::addToLog(const std::string& msg) {
   add("oauth_log", {{"timestamp", std::to_string(databaseClock)}, {"msg", doubled(msg)}});
   Rows& lines = rows("oauth_log");

@@ -1,5 +1,5 @@
-// The world of one store under fuzzing: the database in memory, its clock, and a model of what the
-// rules say it must hold.
+// The surroundings of one store: the database in memory, its clock, and a model of the rows that it
+// must hold.
 
 #pragma once
 
@@ -28,7 +28,7 @@ struct Values {
 
 class StoreWorld {
  public:
-  // What the settings file says, so that small inputs fill a table.
+  // The values of the settings file. They are small, so that short inputs can fill a table.
   static constexpr std::size_t kRowMax = 5, kLogMax = 4;
   static constexpr int kPeriod = 60;  // seconds
 
@@ -46,11 +46,11 @@ class StoreWorld {
   void addToLog(const std::string& msg);
   void dropExpired(const std::string& table);
 
-  // Notes the error that the store must report from now on; returns 0, the result of failures.
+  // Sets the error that the store must report from now on. Returns 0, the result of a failure.
   int fail(int code, const std::string& msg);
-  // Requires the result, the store's error state and every table to be as the model has them.
+  // Compares the result, the store's error state and every table with the model.
   void expect(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, int result, int expected) const;
-  // Requires the rows that a store delivered to be those of the model for which wanted(row) holds.
+  // Compares the delivered rows with those of the model for which wanted(row) is true.
   template <class Wanted>
   void expectRows(const std::string& table, const Json::Value& delivered, Wanted wanted) {
     Json::Value expected(Json::arrayValue);
@@ -84,7 +84,7 @@ class StoreWorld {
   // Moves the library's clock, or the database's.
   void moveClock();
   std::int64_t now() const { return clock_.now(); }
-  // The lines of the audit log that SQLite finds LIKE the pattern when it is not part of the SQL.
+  // The lines of the audit log that are LIKE the pattern, which is given as a parameter.
   static Json::Value linesLike(const std::string& pattern, const std::string& option);
 
  private:
@@ -102,7 +102,7 @@ class StoreWorld {
   std::string msg_;
 };
 
-// A fuzz target: makes the class of the input and lets it take some steps.
+// The body of a fuzz target: runs some steps of the class with the input.
 template <class Fuzz>
 int run(const std::uint8_t* data, std::size_t size) {
   FuzzedDataProvider input(data, size);

@@ -71,7 +71,7 @@ class TokenFuzz {
 
   std::string token() { return textOrKnown(input_, 64, 64, known_); }
 
-  // What Add() must answer, with the model changed as Add() must change the table.
+  // Does to the model what Add() does to the table. Returns what Add() must return.
   int added(const Grant& grant, const std::string& refresh, const std::string& access,
             const std::string& expiry, const std::string& ip, Json::Value& result) {
     if (world_.rows(kTable).size() >= StoreWorld::kRowMax)
@@ -110,7 +110,7 @@ class TokenFuzz {
     Json::Value result;
     const int success =
         tokens_.Add(grant.user, grant.client, grant.scope, grant.flow, grant.state, ip, result);
-    // The tokens are not known before; those in the result stand for them.
+    // The secrets are random, so take them from the result.
     const std::string unknown(64, 'x');
     const std::string refresh = success != 0 ? result["refresh_token"].asString() : unknown;
     const std::string access = success != 0 ? result["access_token"].asString() : unknown;

@@ -95,7 +95,7 @@ extern "C" void syslog(int priority, const char* format, ...) {
   va_end(arguments);
 }
 
-// What the compiler calls instead where _FORTIFY_SOURCE is set.
+// With _FORTIFY_SOURCE the compiler calls this function instead.
 // NOLINTNEXTLINE(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): its name is given
 extern "C" [[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int, const char* format,
                                                            ...) {

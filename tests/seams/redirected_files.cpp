@@ -36,8 +36,8 @@ struct State {
 };
 State state;
 
-// In memory where the machine offers that: no test needs a file to outlive the machine, and the
-// processes that queue for a busy disk would wait longer than a store does.
+// In memory if possible: on a busy disk, processes that wait for each other would wait longer than
+// a store does.
 std::filesystem::path temporaryFiles() {
   constexpr char kMemory[] = "/dev/shm";
   if (std::getenv("TMPDIR") == nullptr && access(kMemory, W_OK) == 0) return kMemory;
@@ -122,7 +122,7 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
   return sqlite3_open_v2(redirected(path).c_str(), db, flags, nullptr);
 }
 
-// Recorded, and set only on demand: what is locked in a test of one process stays locked.
+// Recorded, and set only on demand: nobody releases a lock in a test of one process.
 extern "C" int sqlite3_busy_timeout(sqlite3* db, int milliseconds) {
   const OwnWork seam;
   state.calls.push_back("busy_timeout " + std::to_string(milliseconds));
