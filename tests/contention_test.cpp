@@ -1,4 +1,4 @@
-// Many processes on one file: nothing is lost, nothing happens twice.
+// Many processes use one file. No change may be lost, and none may happen twice.
 //
 // ZEVOOAUTH_ROUNDS multiplies the work, for longer runs by hand.
 
@@ -29,7 +29,7 @@ class ContentionTest : public StoreTest {
     writeSettings(R"({"token_max": 10000, "grantcode_max": 10000})");
   }
 
-  // Starts a process that runs the body and notes what it returns.
+  // Starts a process that runs the body and records what it returns.
   void start(const std::function<Lines()>& body) {
     const std::string file = files_.directory() + "/answer-" + std::to_string(processes_.size());
     const pid_t child = fork();
@@ -46,7 +46,7 @@ class ContentionTest : public StoreTest {
     processes_.push_back({child, file});
   }
 
-  // Lets all processes run at once, and gathers what they noted.
+  // Lets all processes run at once, and collects what they recorded.
   std::vector<Lines> finish() {
     close(gate_[0]);
     close(gate_[1]);
@@ -146,7 +146,7 @@ TEST_F(ContentionTest, CreatesTheSchemaOnce) {
   }
 }
 
-// What a server does with a code: whoever deletes it may issue tokens for it.
+// A server may issue tokens for a code only in the process that deleted it.
 template <class Store>
 Lines claim(const char* table, const std::vector<long long>& ids, int (Store::*take)(long long)) {
   Lines won;
@@ -162,7 +162,7 @@ Lines claim(const char* table, const std::vector<long long>& ids, int (Store::*t
 
 class ExactlyOnceTest : public ContentionTest {
  protected:
-  // Eight processes race for every id; how often each was won.
+  // Eight processes try every id. Returns how many of them succeeded with each.
   template <class Store>
   std::map<std::string, int> race(const char* table, int (Store::*take)(long long)) {
     std::vector<long long> ids;
@@ -201,7 +201,7 @@ TEST_F(ExactlyOnceTest, RotatesARefreshTokenByRevokingIt) {
 }
 
 // Revoking a code only moves its expiry: every process succeeds, so it claims nothing.
-TEST_F(ExactlyOnceTest, IsNotHadByRevokingACode) {
+TEST_F(ExactlyOnceTest, IsNotGuaranteedByRevokingACode) {
   issueCodes(5);
   std::map<std::string, int> everyone;
   for (int id = 1; id <= 5; ++id) everyone[std::to_string(id)] = 8;

@@ -1,5 +1,5 @@
-// A process dies in the middle of its work: what was acknowledged stays, what was not is there
-// whole or not at all, and whoever comes next can work.
+// A process is killed in the middle of its work. Acknowledged changes stay, each other change is
+// complete or absent, and the next process can use the file.
 //
 // ZEVOOAUTH_ROUNDS multiplies the random kills, for longer runs by hand.
 
@@ -107,7 +107,7 @@ TEST_F(CrashTest, LosesNoAcknowledgedTokenToKillsAtRandom) {
           acknowledge(pipe, result["access_token"].asString());
       }
     });
-    // Every other one is under way for certain, however slow the machine.
+    // On a slow machine, too, every second process has begun to write.
     pollfd acknowledged{writer.acknowledgements, POLLIN, 0};
     if (kill % 2 == 0) {
       EXPECT_EQ(1, poll(&acknowledged, 1, 60'000));
@@ -128,8 +128,8 @@ TEST_F(CrashTest, LosesNoAcknowledgedTokenToKillsAtRandom) {
   EXPECT_GE(operations, static_cast<std::size_t>(kills / 2));
 }
 
-// Everything that writes, in an order in which each finds what it needs. One transaction each, but
-// for the registration, whose line in the audit log is a second one.
+// All operations that write, in an order in which each finds the rows that it needs. Each is one
+// transaction, except the registration: its line in the audit log is a second one.
 const std::string kRegistered = "oauth_log|Application registed[First]|1";
 const std::vector<std::function<int()>> kSteps = {
     [] {

@@ -3,7 +3,7 @@
 //   database_exchange write  FOLDER    makes a database of every kind of row
 //   database_exchange check  FOLDER    reads and verifies what the other side wrote
 //   database_exchange change FOLDER    edits, revokes and purges it
-//   database_exchange changed FOLDER   checks what is then left
+//   database_exchange changed FOLDER   checks the rows that are left after that
 //
 // FOLDER holds the database and the key. Values are encrypted as by the stand-in for the host's
 // core library; the clock stands still, so that both sides agree on what has expired.
@@ -48,7 +48,7 @@ Json::Value only(const Json::Value& rows, const std::string& what) {
   return rows[0U];
 }
 
-// A row with a given id, which no operation of a store takes.
+// Inserts a row with a given id, which no store can do.
 void addToken(const std::string& id, char token, long long expiry) {
   OAUTHDBToken tokens("oauth_token");
   Json::Value record;

@@ -1,4 +1,5 @@
-// The disk fails at every single call, or fills up: nothing half done, nothing unsaid.
+// The disk fails at each call in turn, or fills up. No change may be half done, and every failure
+// must be reported.
 
 #include <sqlite3.h>
 

@@ -24,7 +24,7 @@ using namespace ZEVOOAUTHSERVER;
 
 namespace {
 
-// No hexadecimal digits, which mark what is random.
+// Letters that are no hexadecimal digits, because masked() replaces 64 digits as a random secret.
 const std::string kClient = times(64, 'w'), kSecret = times(64, 's'), kCode = times(64, 'k'),
                   kAccess = times(64, 't'), kRefresh = times(64, 'r'), kNew = times(64, 'n');
 const std::string kPast = "1600000000", kFuture = "1800000000";
@@ -137,7 +137,7 @@ std::vector<Operation> onLog() {
   };
 }
 
-// All of the schema on an empty file.
+// Creates the schema in an empty file.
 Operation firstConstruction() {
   Operation first = inSteps(operation<OAUTHDBLog>(
       "FirstConstruction", "oauth_log", [](OAUTHDBLog& s, Result&) { return s.DBInit(); }));
@@ -150,8 +150,7 @@ bool contains(const Lines& logged, const std::string& text) {
                      [&](const std::string& line) { return line.find(text) != std::string::npos; });
 }
 
-// A value that SQLite had no memory to quote is stored and looked up as the empty text, as the
-// header of the utilities says.
+// If SQLite has no memory to quote a value, the store uses the empty text, as oauth_utils.h says.
 bool valueLost(const Lines& logged) { return contains(logged, "Can't transfer to SQL format"); }
 
 }  // namespace
@@ -232,10 +231,10 @@ void EveryOperationTest::expectReported(const std::optional<Outcome>& outcome,
     return;
   }
   EXPECT_NE(kErrNone, outcome->code);
-  // A handle whose open failed has no text to give.
+  // After a failed open SQLite has no error text.
   EXPECT_TRUE(!outcome->msg.empty() || contains(logged, "Open DB failed!!"));
   EXPECT_THAT(logged, Not(IsEmpty()));
-  // A live token never reads as expired because it could not be looked up.
+  // A failed look-up must not make a valid token look expired.
   EXPECT_THAT(outcome->result, Not(HasSubstr("Access Token Expired")));
 }
 

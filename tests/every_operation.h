@@ -23,7 +23,7 @@ struct Operation {
   std::string name;
   // Constructs the store, performs, calls mend, looks whether the store answers, destroys.
   std::function<Outcome(const std::function<void()>& mend)> perform;
-  // Several transactions: a failure may leave some rows done and others not, or be passed over.
+  // Several transactions: a failure may leave some rows changed and others not, or be ignored.
   bool inSteps = false;
   bool onEmptyFile = false;
 };
@@ -35,13 +35,14 @@ class EveryOperationTest : public StoreTest, public testing::WithParamInterface<
  protected:
   EveryOperationTest();
 
-  // Performs the operation again and again, each time on a fresh copy of the database, with the
-  // first, second, ... fault, until one does not come; returns how many did. arm makes the n-th
-  // fault ready, mend ends it and tells whether it came. After every fault:
+  // Performs the operation again and again, each time on a fresh copy of the database. The first
+  // time the first call fails, then the second, and so on until no call is left that can fail.
+  // Returns how many failed. arm() prepares the n-th fault; mend() ends it and tells whether it
+  // happened. After every fault:
   // - the operation succeeded as without it, or failed with a code, a message and a log line, or
   //   threw for lack of memory,
   // - the file is sound, holds all of the change or nothing, and the next construction works,
-  // - the store still answers, the ids are back, nothing of SQLite's is left behind.
+  // - the store still answers, the ids are restored, and SQLite has no memory or file left open.
   int failEverywhere(const std::function<void(int nth)>& arm, const std::function<bool()>& mend);
 
  private:

@@ -1,4 +1,4 @@
-// Documents written as text, so that tests show what goes in and what comes out.
+// JSON documents from text and as text.
 
 #pragma once
 

@@ -43,7 +43,7 @@ class LifecycleTest : public StoreTest {
   std::string output_, errors_;
 };
 
-TEST_F(LifecycleTest, TellsTheWholeLife) {
+TEST_F(LifecycleTest, ShowsTheWholeLifecycle) {
   run();
   EXPECT_EQ(0, exitCode_);
   EXPECT_EQ("", errors_);
@@ -199,7 +199,7 @@ TEST_F(LifecycleTest, RemovesItsRowsWhenAStepFails) {
 
 }  // namespace
 
-// The demo waits for a token to expire: on the fake clock that takes no time.
+// The demo waits until a token expires. With the fake clock that takes no time.
 extern "C" unsigned sleep(unsigned seconds) {
   clockOfSleep->advance(seconds);
   return 0;

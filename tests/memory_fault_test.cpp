@@ -1,4 +1,5 @@
-// Memory runs out at every single request: nothing half done, nothing unsaid, nothing leaked.
+// Each request for memory fails in turn. No change may be half done, every failure must be
+// reported, and nothing may leak.
 
 #include <iostream>
 

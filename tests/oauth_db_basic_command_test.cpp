@@ -23,7 +23,7 @@ struct Column {
   const char* value;  // null for an SQL NULL
 };
 
-// Hands one row to a callback in SQLite's way.
+// Calls a row callback as SQLite does.
 int deliver(const std::vector<Column>& row, OAUTHDBBasic::RowCallback callback,
             Json::Value* document) {
   std::vector<char*> names, values;
@@ -45,7 +45,7 @@ class CommandTest : public StoreTest {
             std::to_string(count) +
             ") INSERT INTO oauth_log(timestamp, msg) SELECT 1700000000, 'row' FROM n");
   }
-  // The document that the general row reader makes of a statement.
+  // The rows of a statement, read by TabGetCallback().
   static std::string read(OAUTHDBBasic& store, const std::string& sql) {
     Json::Value rows = array();
     EXPECT_TRUE(store.DBCmd(sql, OAUTHDBBasic::TabGetCallback, &rows)) << sql;
@@ -526,8 +526,8 @@ TEST_F(CallbackTest, DumpsARowThatNobodyReceives) {
   EXPECT_THAT(log_.lines(), ElementsAre("3 oauth_db_basic.cpp ##### [0][a = 1]"));
 }
 
-// A document of the wrong kind makes the JSON library throw. That must end in an ordinary failure
-// of the statement: SQLite is C, and an exception must not pass through it.
+// A document of the wrong kind makes the JSON library throw. SQLite is C, so the exception must not
+// pass through it: the statement fails instead.
 struct Misfit {
   const char* name;
   OAUTHDBBasic::RowCallback callback;

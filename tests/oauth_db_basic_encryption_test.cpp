@@ -23,7 +23,7 @@ class EncryptionTest : public StoreTest {
  protected:
   bool encrypt(const std::string& document) { return store_.ParamEncrypt(doc_ = parse(document)); }
   bool decrypt(const std::string& document) { return store_.ParamDecrypt(doc_ = parse(document)); }
-  // The calls of the host's cipher since the last time.
+  // The calls of the host's cipher since newCalls() was last called.
   std::vector<std::string> newCalls() {
     const auto& all = host_.calls();
     std::vector<std::string> found(all.begin() + static_cast<std::ptrdiff_t>(seen_), all.end());
@@ -42,13 +42,13 @@ constexpr const char* kUntouched[] = {
     "{}",
     R"({"id":5,"scope":"read"})",
     R"({"access_token":"sealed:a","code":"sealed:b","refresh_token":"sealed:c"})",
-    // Only these very names count.
+    // Other names are not sensitive.
     R"({"CLIENT_ID":"sealed:a","Client_Secret":"sealed:b"})",
     R"({"client":"sealed:a","client_id ":"sealed:b","client_id2":"sealed:c"})",
-    // Only the top level is looked at.
+    // Members below the top level are not converted.
     R"({"condition":{"client_id":"sealed:a","client_secret":"sealed:b"}})",
     R"({"modified":[{"client_id":"sealed:a"}]})",
-    // What is no object has no members.
+    // A document that is not an object has no members.
     "null",
     "true",
     "5",
@@ -76,7 +76,7 @@ struct Conversion {
   std::vector<std::string> calls;
 };
 
-// Values are taken as text, whatever their type.
+// A value of another type is converted to text first.
 TEST_F(EncryptionTest, ReplacesPlainMembers) {
   const Conversion conversions[] = {
       {R"({"client_id":"abc"})", R"({"client_id":"sealed:cba"})", {"encrypt abc 1024"}},
@@ -100,7 +100,7 @@ TEST_F(EncryptionTest, ReplacesPlainMembers) {
   EXPECT_THAT(log_.lines(), IsEmpty());
 }
 
-// The host would take the text to end there.
+// The host reads a text only up to a NUL byte.
 TEST_F(EncryptionTest, RefusesAValueWithANulByte) {
   for (const char* const document :
        {R"({"client_id":"a\u0000b"})", R"({"client_secret":"\u0000"})"}) {

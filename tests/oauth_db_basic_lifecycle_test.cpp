@@ -34,8 +34,8 @@ using ZEVOOAUTHSERVER::OAUTHDBToken;
 
 namespace {
 
-// What the process looked like whenever a connection was opened or closed, and a place to
-// interfere at that moment: between the raising of the ids and their restoring.
+// Records the ids and errno whenever a connection is opened or closed. duringOpen and duringClose
+// run at that moment, after the ids were raised and before they are restored.
 class ConnectionWatch {
  public:
   ConnectionWatch() { current = this; }
@@ -66,7 +66,7 @@ void ConnectionWatch::opening(int error) {
   current->duringOpen();
 }
 
-// A connection gives up its functions while it closes.
+// SQLite calls the destructors of a connection's functions while it closes the connection.
 void ConnectionWatch::watchClosing(sqlite3* db) {
   if (current == nullptr) return;
   sqlite3_create_function_v2(db, "watch", 0, SQLITE_UTF8, nullptr, unused, nullptr, nullptr,
@@ -100,7 +100,7 @@ namespace {
 constexpr char kTables[] = "SELECT name FROM sqlite_master WHERE type='table' ORDER BY rowid";
 constexpr char kMetaRows[] = "SELECT tab_name, version, typeof(version) FROM oauth_meta";
 
-// Keeps every other connection from reading and writing.
+// Locks the file: no other connection can read or write.
 class ExclusiveLock {
  public:
   explicit ExclusiveLock(const std::string& path) {
@@ -122,21 +122,17 @@ class LifecycleTest : public StoreTest {
   void createDatabaseFile(const std::string& content) const {
     std::ofstream(files_.database(), std::ios::binary) << content;
   }
-  // Makes CREATE TABLE fail for this name, and nothing else.
+  // Makes CREATE TABLE fail for this name only.
   void occupyName(const std::string& name) const {
     execute("CREATE TABLE occupied(a); CREATE INDEX " + name + " ON occupied(a)");
   }
 
-  static void expectError(const OAUTHDBBasic& store, int code, const std::string& msg) {
-    EXPECT_EQ(code, store.GetErrCode());
-    EXPECT_EQ(msg, store.GetErrMsg());
-  }
   void expectReady(OAUTHDBBasic& store) {
     log_.clear();
     EXPECT_TRUE(store.DBCmd("SELECT 1;", nullptr, nullptr));
     EXPECT_THAT(log_.lines(), IsEmpty());
   }
-  // Refuses statements, and keeps the error that tells why.
+  // The store refuses statements and keeps the error that was the reason.
   void expectUnready(OAUTHDBBasic& store, int code, const std::string& msg) {
     log_.clear();
     EXPECT_FALSE(store.DBCmd("SELECT 1;", nullptr, nullptr));
@@ -649,7 +645,7 @@ TEST_F(InitTest, CreatesNothingWithoutVersionRows) {
   EXPECT_EQ(before, databaseBytes());
 }
 
-// A table that cannot be created, and the tables that are there nevertheless.
+// A table that cannot be created, and the tables that exist after the attempt.
 struct Obstacle {
   std::string table;
   std::vector<std::string> created;
@@ -861,7 +857,7 @@ TEST_F(TableExistsTest, KnowsEveryTableOfTheSchema) {
     EXPECT_TRUE(store.IsDBTabExist(name)) << name;
 }
 
-TEST_F(TableExistsTest, FindsAMissingTableMissingWithoutAnError) {
+TEST_F(TableExistsTest, ReportsAMissingTableWithoutAnError) {
   OAUTHDBBasic store;
   for (const char* const name : {"oauth_other", "", "OAUTH_LOG", "oauth_lo_", "oauth_lo%"})
     EXPECT_FALSE(store.IsDBTabExist(name)) << name;
@@ -938,7 +934,7 @@ TEST_F(AddMetaDataTest, AddsTheThreeRowsEveryTime) {
   EXPECT_THAT(log_.lines(), IsEmpty());
 }
 
-TEST_F(AddMetaDataTest, PassesOverARowThatCannotBeWritten) {
+TEST_F(AddMetaDataTest, ContinuesAfterARowThatCannotBeWritten) {
   OAUTHDBBasic store;
   execute(
       "DELETE FROM oauth_meta; CREATE TRIGGER no_codes BEFORE INSERT ON oauth_meta "
@@ -1089,7 +1085,7 @@ class PrivilegeTest : public LifecycleTest {
  protected:
   void open() { store_.emplace(); }
   void close() { store_.reset(); }
-  // What errno is after an open that nothing follows.
+  // errno after an open that fails without a handle, so that no other call follows.
   int errnoAfterOpening() {
     files_.openWithoutHandle(7);
     errno = EDOM;
@@ -1101,7 +1097,7 @@ class PrivilegeTest : public LifecycleTest {
     close();
     return errno;
   }
-  // Keeps only the calls and lines that come from now on.
+  // Drops the calls and lines so far.
   void forgetOpening() {
     log_.clear();
     forgotten_ = ids_.calls().size();
@@ -1177,7 +1173,7 @@ TEST_F(PrivilegeTest, IsRaisedForClosingInTheSameWay) {
   expectIds(1000, 500);
 }
 
-TEST_F(PrivilegeTest, SavesTheIdsAnewForClosing) {
+TEST_F(PrivilegeTest, SavesTheIdsAgainForClosing) {
   ids_.become(1000, 500);
   open();
   ids_.become(0, 700);
@@ -1326,7 +1322,7 @@ TEST_F(PrivilegeTest, KeepsTheFormatsOfTheErrors) {
                   "%s:%d ERROR: LEAVECriticalSection"));
 }
 
-// The ids that count on leaving are those of that moment, and a return to root is worth a line.
+// On leaving, the current ids are compared with the saved ones. A change to root is logged.
 TEST_F(PrivilegeTest, ReturnsToRootWhenTheIdsWereDroppedMeanwhile) {
   connections_.duringOpen = [this] { ids_.become(7, 8); };
   open();
@@ -1347,6 +1343,23 @@ TEST_F(PrivilegeTest, StopsLeavingAfterClosingWhenTheUserCannotBecomeRootAgain) 
                                         "[Operation not permitted]",
                                         kLeaveFailed));
   expectIds(0, 0);
+}
+
+// syslog() may change errno.
+TEST_F(PrivilegeTest, HasErrnoOneAfterARefusalWhateverTheLogLeaves) {
+  ids_.become(1000, 500);
+  log_.leaveErrno(EBADF);
+  ids_.refuse("setresgid(-1, 0, -1)", EPERM);
+  open();
+  EXPECT_THAT(connections_.seen, ElementsAre("open as 1000:500, errno 1"));
+}
+
+TEST_F(PrivilegeTest, LeavesErrnoOneAfterAFailedRestoringWhateverTheLogLeaves) {
+  ids_.become(1000, 500);
+  open();
+  log_.leaveErrno(EBADF);
+  ids_.refuse("setresuid(-1, 1000, -1)", EAGAIN);
+  EXPECT_EQ(1, errnoAfterClosing());
 }
 
 TEST_F(PrivilegeTest, LeavesErrnoZeroForRoot) { EXPECT_EQ(0, errnoAfterOpening()); }
@@ -1464,7 +1477,7 @@ TEST_F(PrivilegeTest, IsGivenUpAgainWhereOnlyRootSeesALink) {
 
 // --- A transaction left open ---
 
-// A roll-back deletes the files that the journal names.
+// A roll-back deletes the files that the journal names, so it must not happen as root.
 TEST_F(PrivilegeTest, IsNotRaisedForTheRollBackOfAnOpenTransaction) {
   open();
   EXPECT_TRUE(

@@ -19,8 +19,8 @@ namespace {
 constexpr const char* kTables[] = {"oauth_clientInfo", "oauth_grantCode", "oauth_token",
                                    "oauth_log"};
 
-// A store of a table t(id, name, scope, timestamp). Documents are written as JSON; sent_ is what
-// the operation made of the last one, rows_ what the last read brought.
+// A store of a table t(id, name, scope, timestamp). Documents are written as JSON. sent_ is the
+// last document after the operation, rows_ the result of the last read.
 class RecordsTest : public StoreTest {
  protected:
   RecordsTest() {
@@ -61,7 +61,7 @@ class RecordsTest : public StoreTest {
   void addNames(const std::vector<std::string>& all) const {
     for (const std::string& name : all) execute("INSERT INTO t(name) VALUES('" + name + "')");
   }
-  // Makes a table of ids alone of one of the store's own.
+  // Replaces one of the library's tables by one that has ids only.
   void simplify(const std::string& table) {
     execute("DROP TABLE " + table + "; CREATE TABLE " + table + "(id integer PRIMARY KEY)");
     store_->SetTabName(table);
@@ -76,14 +76,14 @@ class RecordsTest : public StoreTest {
     EXPECT_EQ(code, store_->GetErrCode());
     EXPECT_EQ(msg, store_->GetErrMsg());
   }
-  // The whole log.
+  // These lines and no others.
   void expectLog(const std::vector<std::string>& texts) const {
     std::vector<std::string> lines;
     lines.reserve(texts.size());
     for (const std::string& text : texts) lines.push_back("3 oauth_db_basic.cpp " + text);
     EXPECT_EQ(lines, log_.lines());
   }
-  // A statement failed in the database's words, and then the operation said so.
+  // The error is the database's, and the operation logs its own line after it.
   void expectFailure(int code, const std::string& msg, const std::string& text) const {
     expectError(code, msg);
     expectLog({"Run Command failed!![" + msg + "][" + std::to_string(code) + "]", text});
@@ -335,7 +335,7 @@ TEST_F(AddTest, RefusesAValueWithANulByte) {
   EXPECT_EQ(0, rowCount("t"));
 }
 
-// The statement ends inside its literal, so it cannot match more than was meant.
+// The statement ends inside a literal and fails, so it cannot match other rows.
 TEST_F(AddTest, KeepsRowsFromAConditionWithANulByte) {
   execute("INSERT INTO t(name) VALUES('a')");
   EXPECT_FALSE(get(R"({"condition": {"name": "a\u0000"}})"));
@@ -399,7 +399,7 @@ TEST_F(DeleteTest, RemovesEveryRowWithoutACondition) {
   expectNoFailure();
 }
 
-// A condition that is no object must not pass for none, which would take every row.
+// A condition that is not an object must not count as no condition, which matches every row.
 TEST_F(DeleteTest, RemovesNothingForAConditionOfAnotherKind) {
   for (const std::string condition : {R"([])", R"(["b"])", R"("b")", R"("")", "7", "true"}) {
     SCOPED_TRACE(condition);
@@ -424,7 +424,7 @@ TEST_F(DeleteTest, DoesNotTakeTextForAPattern) {
   EXPECT_THAT(names(), ElementsAre("a", "b", "b"));
 }
 
-// The count of the delete before is still there.
+// SQLite still reports the row count of the earlier delete.
 TEST_F(DeleteTest, FailsWithAFailedStatementAfterASuccess) {
   EXPECT_TRUE(del(R"({"condition": {"name": "b"}})"));
   EXPECT_FALSE(del(R"({"condition": {"missing": "b"}})"));
@@ -493,7 +493,7 @@ TEST_F(GetTest, LeavesNoEarlierRowsOnAFailedStatement) {
 }
 
 TEST_F(GetTest, LeavesTheRowsReadBeforeAFailure) {
-  // In the third row the smallest integer arises, which has no absolute value.
+  // abs() fails in the third row: the smallest integer has no absolute value.
   EXPECT_FALSE(get(R"({"condition_like": "abs(id - 9223372036854775807 - 4) > 0"})"));
   EXPECT_EQ(R"([{"id":"1","name":"anna","scope":"","timestamp":"0"},)"
             R"({"id":"2","name":"bob","scope":"","timestamp":"0"}])",
@@ -543,7 +543,7 @@ TEST_F(EditTest, FailsWithNothingToWrite) {
   expectFailure(1, "near \"WHERE\": syntax error", "Edit failed[t]");
 }
 
-// The count of the edit before is still there.
+// SQLite still reports the row count of the earlier edit.
 TEST_F(EditTest, FailsWithAFailedStatementAfterASuccess) {
   EXPECT_TRUE(edit(R"({"modified": {"name": "x"}, "condition": {"id": 2}})"));
   EXPECT_FALSE(edit(R"({"modified": {"id": "1"}, "condition": {"id": 2}})"));

@@ -24,20 +24,20 @@ struct Row {
   std::string_view sql;
 };
 
-// Every row's document must become exactly the row's text.
+// Translates the document of each row and compares with the row's text.
 template <class Rows, class Translate>
 void expectEach(const Rows& rows, Translate translate) {
   for (const Row& row : rows) EXPECT_EQ(row.sql, translate(parse(row.json))) << row.json;
 }
 
-// What a value looks like in any fragment. A null is the one that they do not share.
+// A value is written the same way in every fragment, except null.
 constexpr Row kValues[] = {
     {R"("abc")", "'abc'"},
     {R"("")", "''"},
     {R"(" a  b ")", "' a  b '"},
     {R"("5")", "'5'"},
     {R"("NULL")", "'NULL'"},
-    // Single quotes, all of them and nothing else.
+    // Single quotes are doubled, and nothing else is changed.
     {R"("O'Hara")", "'O''Hara'"},
     {R"("'")", "''''"},
     {R"("''")", "''''''"},
@@ -47,7 +47,7 @@ constexpr Row kValues[] = {
     {R"("\\ % _ \" ` ; -- /* ? $1")", R"('\ % _ " ` ; -- /* ? $1')"},
     {R"("\t\n\r\u0001\u007f")", "'\t\n\r\x01\x7f'"},
     {R"("Grüße, 東京 🔑")", "'Grüße, 東京 🔑'"},
-    // Integers as decimal text.
+    // Integers become decimal text.
     {"5", "'5'"},
     {"0", "'0'"},
     {"-1", "'-1'"},
@@ -63,11 +63,11 @@ constexpr Row kValues[] = {
     {R"("it's\u0000'")", "'it''s\0'''"sv},
 };
 
-// Values that no text can be made of.
+// Values that cannot be converted to text.
 constexpr const char* kRefused[] = {R"({"a": {}})", R"({"a": []})", R"({"a": {"b": "1"}})",
                                     R"({"a": ["1"]})", R"({"a": "1", "b": {}})"};
 
-// 200000 bytes, every other a single quote, and what it reads like in a fragment.
+// 200000 bytes, every second one a single quote; and the same text in a fragment.
 std::string manyQuotes() {
   std::string text;
   for (int i = 0; i < 100'000; ++i) text += "a'";
@@ -81,7 +81,7 @@ std::string manyQuotesQuoted() {
 
 class TranslationTest : public StoreTest {
  protected:
-  // The lines that the translation sends with every class of diagnostics on.
+  // The lines that the translation logs with every class of diagnostics on.
   template <class Body>
   std::vector<std::string> traceOf(Body body) const {
     withDiagnostics(15, body);
@@ -110,12 +110,12 @@ constexpr Row kPairs[] = {
     {R"({"timestamp": null})", "timestamp=''"},
     {R"({"id": 5, "name": "O'Hara"})", "id='5', name='O''Hara'"},
     {R"({"a": "x, y", "b": "z"})", "a='x, y', b='z'"},
-    // Byte order: capitals, then the underscore, then small letters, a prefix before the longer
-    // name, and what is not ASCII last.
+    // Names are in the order of their bytes: capitals, the underscore, small letters, other
+    // characters. A shorter name comes before a longer one that begins with it.
     {R"({"ü": "6", "aa": "5", "a": "4", "_": "3", "Z": "2", "B": "1"})",
      "B='1', Z='2', _='3', a='4', aa='5', ü='6'"},
     {R"({"client_id": "x", "client": "y"})", "client='y', client_id='x'"},
-    // Names are the system's own.
+    // Names are not quoted or escaped: they never come from a user.
     {R"({"it's": "1"})", "it's='1'"},
     {R"({"a b": "1", "c\\d": "2"})", "a b='1', c\\d='2'"},
 };
@@ -208,7 +208,7 @@ constexpr Row kUpdates[] = {
     {R"({"modified": {"a": "1"}})", " SET a='1'"},
     {R"({"modified": {"a": "1"}, "condition": {}})", " SET a='1'"},
     {R"({"modified": {"a": "1"}, "condition": null})", " SET a='1'"},
-    // Nothing to set is left to the database to refuse.
+    // With nothing to set, the database refuses the statement.
     {R"({"modified": {}, "condition": {"id": 5}})", " SET  WHERE id='5'"},
     {R"({"modified": null, "condition": {"id": 5}})", " SET  WHERE id='5'"},
     {R"({"condition": {"id": 5}})", " SET  WHERE id='5'"},
@@ -217,7 +217,7 @@ constexpr Row kUpdates[] = {
     {R"({"modified": {"a": null, "timestamp": null}})", " SET a='', timestamp=''"},
     {R"({"modified": {"name": "it's"}, "condition": {"name": "O'Hara"}})",
      " SET name='it''s' WHERE name='O''Hara'"},
-    // Only reading knows the other keys.
+    // An edit ignores the keys that only a read uses.
     {R"({"modified": {"a": "1"}, "condition_like": "b like '%c%'", "option": "LIMIT 1"})",
      " SET a='1'"},
 };
@@ -270,10 +270,10 @@ constexpr Row kInserts[] = {
      " (B, _, a, aa, ü) VALUES('1', '2', '3', '4', '5')"},
     {R"({"it's": "1"})", " (it's) VALUES('1')"},
     {R"({"a": "x, y) VALUES("})", " (a) VALUES('x, y) VALUES(')"},
-    // An empty record is left to the database to refuse.
+    // For an empty record, the database refuses the statement.
     {"{}", " () VALUES()"},
     {"null", " () VALUES()"},
-    // Only a null under this very name asks for the database's clock.
+    // Only a null timestamp is replaced by the database's clock.
     {R"({"timestamp": null})", " (timestamp) VALUES(strftime('%s','now'))"},
     {R"({"timestamp": "1700000000"})", " (timestamp) VALUES('1700000000')"},
     {R"({"timestamp": 1700000000})", " (timestamp) VALUES('1700000000')"},
@@ -282,7 +282,7 @@ constexpr Row kInserts[] = {
      " (timestamp) VALUES('strftime(''%s'',''now'')')"},
     {R"({"Timestamp": null, "expired_time": null, "time": null, "timestamps": null})",
      " (Timestamp, expired_time, time, timestamps) VALUES(NULL, NULL, NULL, NULL)"},
-    // The keys of a request are columns like any other here.
+    // In a record, the keys of a request are ordinary columns.
     {R"({"condition": "a", "modified": null})", " (condition, modified) VALUES('a', NULL)"},
 };
 

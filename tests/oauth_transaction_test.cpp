@@ -1,5 +1,5 @@
-// What is done in one transaction: the first creation of the database, and the sweep of expired
-// rows by either store.
+// Transactions of the library: the first creation of the database, and the deletion of expired
+// codes and tokens.
 
 #include "oauth_transaction.h"
 
@@ -90,7 +90,7 @@ TEST_F(FirstCreationTest, SaysWhyWhenVersionRowsVanishWithoutAnError) {
                                         "3 oauth_db_basic.cpp DB is not ready!!"));
 }
 
-TEST_F(FirstCreationTest, EndsWithItsLineWhereverTheDiskIsFull) {
+TEST_F(FirstCreationTest, LogsTheFailedTableWhereverTheDiskIsFull) {
   const FaultyDisk disk;
   int failures = 0;
   for (;; ++failures) {
@@ -208,7 +208,7 @@ TYPED_TEST(SweepTest, IsOneCommit) {
   EXPECT_THAT(this->log_.lines(), IsEmpty());
 }
 
-TYPED_TEST(SweepTest, WritesNothingWithNothingExpired) {
+TYPED_TEST(SweepTest, WritesNothingIfNothingHasExpired) {
   this->insert(1, "1700000000");
   const std::string before = this->databaseBytes();
   EXPECT_EQ(1, TypeParam(this->table_).Purge());
@@ -225,7 +225,7 @@ TYPED_TEST(SweepTest, CommitsTheOtherRowsAfterAFailedDelete) {
                           "3 oauth_db_basic.cpp Delete failed[" + this->table_ + "]"));
 }
 
-// What was deleted before the error comes back with it, so the sweep starts again, row by row.
+// The error rolls back the deletes before it. The sweep starts again and commits row by row.
 TYPED_TEST(SweepTest, StartsAgainRowByRowWhenSqliteEndsTheTransaction) {
   this->insertExpired(4);
   this->onDeleteOf(2, "ROLLBACK, 'all back'");
@@ -291,7 +291,7 @@ TYPED_TEST(SweepTest, FailsWhenTheRowsCannotBeReadAgain) {
   EXPECT_GT(secondReads, 0);
 }
 
-// Wherever the one fault is: in a delete or in the commit.
+// One write finds the disk full: each in turn, in a delete or in the commit.
 TYPED_TEST(SweepTest, SurvivesAMomentWithoutRoom) {
   const FaultyDisk disk;
   int faults = 0;
@@ -333,7 +333,7 @@ TYPED_TEST(SweepTest, TriesRowByRowWhereNoTransactionCanBegin) {
 TYPED_TEST(SweepTest, DeletesNothingWhenItCannotCommit) {
   this->insertExpired(2);
   TypeParam store(this->table_);
-  // A reader keeps the file from being written, not from being prepared for it.
+  // A reader blocks the commit, but not the statements before it.
   const OtherConnection other(this->files_.database(), "BEGIN; SELECT * FROM " + this->table_);
   EXPECT_EQ(0, store.Purge());
   EXPECT_THAT(this->ids(), ElementsAre("1", "2"));
@@ -367,7 +367,7 @@ TYPED_TEST(SweepTest, IsRolledBackWithTheCallersTransaction) {
   this->expectError(store, 255, "");
 }
 
-// Nothing is committed behind the caller's back.
+// The library does not commit a part of the caller's transaction.
 TYPED_TEST(SweepTest, FailsWhereSqliteEndsTheCallersTransaction) {
   const FaultyDisk disk;
   this->insertMoreThanTheJournalHolds();
@@ -391,6 +391,23 @@ TYPED_TEST(SweepTest, KeepsTheCallersTransactionOpenAfterAFailedDelete) {
   EXPECT_TRUE(store.DBCmd("COMMIT;", nullptr, nullptr));
   EXPECT_THAT(this->ids(), ElementsAre("2"));
   this->expectError(store, 19, "kept");
+}
+
+// SQLite then undoes the last statement alone, and what the caller did before stays.
+TYPED_TEST(SweepTest, KeepsTheCallersTransactionOpenOnAFullDisk) {
+  const FaultyDisk disk;
+  this->insertMoreThanTheJournalHolds();
+  this->onDeleteOf(0, "ABORT, 'never'");
+  TypeParam store(this->table_);
+  EXPECT_TRUE(store.DBCmd("BEGIN; INSERT INTO oauth_log VALUES(1, 'kept', 1);", nullptr, nullptr));
+  FaultyDisk::limitJournal(this->kJournalRoom);
+  EXPECT_EQ(0, store.Purge());
+  EXPECT_TRUE(FaultyDisk::mend());
+  EXPECT_TRUE(store.DBCmd("COMMIT;", nullptr, nullptr));
+  EXPECT_EQ(1, this->rowCount("oauth_log"));
+  EXPECT_GT(this->rowCount(this->table_), 0);
+  EXPECT_LT(this->rowCount(this->table_), 200);
+  this->expectError(store, 13, "database or disk is full");
 }
 
 TYPED_TEST(SweepTest, LeavesTheStoreUsableAfterAFailedCommit) {

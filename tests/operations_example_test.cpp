@@ -1,4 +1,4 @@
-// The claims that docs/operations.md shows, compiled as they stand there.
+// The functions that docs/operations.md shows, compiled from that page.
 
 #include "operations_example.h"
 
@@ -28,7 +28,7 @@ class OperationsExampleTest : public StoreTest {
     EXPECT_EQ(claim, spendCode(code_, row_));
     EXPECT_EQ(claim, rotateRefreshToken(refreshToken_, row_));
   }
-  // What another process's lock makes of a claim.
+  // Runs the body while another process holds the lock.
   template <class Body>
   void whileLocked(const char* lock, Body body) const {
     sqlite3* other = nullptr;
@@ -53,14 +53,14 @@ TEST_F(OperationsExampleTest, ClaimsOnce) {
   EXPECT_EQ(Json::Value(), row_);
 }
 
-TEST_F(OperationsExampleTest, TakesWhatCannotBeForTaken) {
+TEST_F(OperationsExampleTest, ReportsATextOfABadLengthAsTaken) {
   EXPECT_EQ(Claim::kTaken, spendCode("short", row_));
   EXPECT_EQ(Claim::kTaken, rotateRefreshToken("short", row_));
   expectBoth(Claim::kMine);
 }
 
-// Two look it up at once; before the slower one deletes it, its id has gone to a new code.
-TEST_F(OperationsExampleTest, ClaimsNobodyElsesByAnIdGivenAgain) {
+// Two processes look up a code. Before the second one deletes it, a new code has got its id.
+TEST_F(OperationsExampleTest, ClaimsNoOtherRowThatGotTheSameId) {
   ASSERT_EQ(Claim::kMine, spendCode(code_, row_));
   const std::string next = issueCode("bob");
   Json::Value rows;

@@ -1,5 +1,5 @@
-// Stores are at work until the very end of a process: in exit handlers, and in destructors of
-// objects that were made before anything else.
+// Stores can be used until the end of a process: in exit handlers, and in destructors of global
+// objects.
 
 #include <cstdio>
 #include <cstdlib>
@@ -14,7 +14,7 @@ using namespace ZEVOOAUTHSERVER;
 
 namespace {
 
-// One row of every table, written, read and deleted.
+// Writes, reads and deletes one row of every table.
 int useEveryStore() {
   int done = 0;
   Json::Value result, rows;

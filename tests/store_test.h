@@ -51,13 +51,13 @@ class StoreTest : public testing::Test {
   // The whole file's bytes; "" if there is none.
   std::string databaseBytes() const;
 
-  // For failures that must leave the error state as they found it.
+  // For failures that must not change the error state.
   static void recordEarlierError(ZEVOOAUTHSERVER::OAUTHDBBasic& store);
   static void expectEarlierError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
   static void expectError(const ZEVOOAUTHSERVER::OAUTHDBBasic& store, int code,
                           const std::string& msg);
 
-  // How much more work than usual, from ZEVOOAUTH_ROUNDS: for longer runs by hand.
+  // The factor in ZEVOOAUTH_ROUNDS, 1 by default, for longer runs by hand.
   static int rounds();
 
   RedirectedFiles files_;
@@ -70,7 +70,7 @@ class StoreTest : public testing::Test {
   static void runOnThread(const std::function<void()>& body);
 };
 
-// n times the character: values at the edges of the length rules.
+// The character n times.
 inline std::string times(int n, char c = 'a') {
   return std::string(static_cast<std::size_t>(n), c);
 }

@@ -1,5 +1,5 @@
 // Stores on different threads of one process. They are opened and closed one after another, since
-// that changes the ids of the whole process; in between each thread has its store to itself.
+// that changes the ids of the whole process. In between, each thread uses its own store.
 
 #include <memory>
 #include <mutex>

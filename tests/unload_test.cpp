@@ -1,4 +1,4 @@
-// Programs may load the library with a plug-in, and unload that again.
+// A program may load the library with a plug-in and unload the plug-in later.
 
 #include <dlfcn.h>
 #include <gmock/gmock.h>

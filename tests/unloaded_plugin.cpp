@@ -1,4 +1,4 @@
-// A plug-in that hands out a row of the library's making.
+// A plug-in that returns a row that the library has made.
 
 #include <json/value.h>
 

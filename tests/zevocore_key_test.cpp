@@ -43,7 +43,7 @@ class ZevocoreKeyTest : public testing::Test {
     bytes << file.rdbuf();
     return bytes.str();
   }
-  // Whether a user without root's rights, to whom the directory belongs, gets a key.
+  // Whether the owner of the directory, who is not root, gets a key.
   bool anOrdinaryUserLoads() const {
     if (geteuid() != 0) return load().has_value();
     constexpr unsigned kNobody = 65534;

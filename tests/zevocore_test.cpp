@@ -1,4 +1,4 @@
-// The exported functions of the encryption stand-in, with a key that the test hands out.
+// The exported functions of the encryption stand-in, with a key that the test chooses.
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

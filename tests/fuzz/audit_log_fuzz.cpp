@@ -1,5 +1,5 @@
-// Hostile messages and keywords for the audit log. Its options are ready-made SQL and therefore
-// not the input's.
+// Hostile messages and keywords for the audit log. Options are SQL, so they do not come from the
+// input.
 
 #include <cstddef>
 #include <cstdint>
@@ -59,8 +59,5 @@ class AuditLogFuzz {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  FuzzedDataProvider input(data, size);
-  AuditLogFuzz fuzz(input);
-  for (int i = 0; i < 8 && input.remaining_bytes() > 0; ++i) fuzz.step();
-  return 0;
+  return run<AuditLogFuzz>(data, size);
 }

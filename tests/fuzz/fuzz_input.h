@@ -1,5 +1,5 @@
-// Arguments made of the fuzzer's bytes. Texts come from the front of the input, each ended by a
-// backslash and one more byte; choices and numbers from its end, backwards.
+// Arguments from the fuzzer's bytes. Texts come from the front of the input, each ended by a
+// backslash and one more byte. Choices and numbers come from its end, backwards.
 
 #pragma once
 
@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-// Mostly of min to max bytes; sometimes one byte too short or too long, or as it comes.
+// A text of min to max bytes in most cases; else one byte too short or too long, or of any length.
 inline std::string textOf(FuzzedDataProvider& input, int min, int max) {
   std::string text = input.ConsumeRandomLengthString(static_cast<std::size_t>(max) + 1);
   const auto fill = input.ConsumeIntegral<char>();

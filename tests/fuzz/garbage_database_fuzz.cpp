@@ -1,5 +1,5 @@
-// The input is the database file, with something beside it that may pass for a journal. No store
-// may fall over it, what fails must say why, and what SQLite can read a store delivers.
+// The input is the database file, and a file beside it that SQLite may read as a journal. No store
+// may crash, every failure must set an error, and a store delivers all rows that SQLite can read.
 
 #include <sqlite3.h>
 
@@ -42,7 +42,7 @@ int collect(void* context, int columns, char** values, char** names) {
   return 0;
 }
 
-// Runs operations on one store and looks at what they leave behind.
+// Runs operations on one store and checks what they leave behind.
 class Observer {
  public:
   explicit Observer(OAUTHDBBasic& store) : store_(store) {
@@ -64,15 +64,15 @@ class Observer {
     run(operation);
   }
 
-  // Requires what was read last to be every row of the table that a connection of the fuzzer's own
-  // reads, with all its values; encrypted ones may be delivered as anything.
+  // Compares the rows read last with those that the fuzzer's own connection reads. Encrypted values
+  // may differ.
   void requireRows(const RedirectedFiles& files, const std::string& table, Json::Value delivered) {
     Json::Value rows(Json::arrayValue);
     sqlite3* db = nullptr;
     sqlite3_open_v2(files.database().c_str(), &db, SQLITE_OPEN_READWRITE, nullptr);
     const int code = sqlite3_exec(db, ("SELECT * FROM " + table).c_str(), collect, &rows, nullptr);
     sqlite3_close_v2(db);
-    // Of two connections, one may come upon damage that the other does not look at.
+    // One connection may find damage that the other one does not read.
     if (code != SQLITE_OK || !ready_ || store_.GetErrCode() == SQLITE_CORRUPT) return;
     require(store_.GetErrCode() == kErrNone, "what can be read is delivered");
     for (Json::Value* const document : {&rows, &delivered})
@@ -168,7 +168,7 @@ void useTokens(const RedirectedFiles& files) {
   see.mayOnlyLog([&] { return tokens.Purge(); });
 }
 
-// The table of the store and its schema are anybody's guess, the empty name included.
+// The name of the store's table is part of the input, and may be empty.
 void useBase(const std::string& table) {
   OAUTHDBBasic store;
   store.SetTabName(table);

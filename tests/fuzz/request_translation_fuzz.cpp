@@ -1,5 +1,5 @@
-// Hostile documents for the translation of requests into SQL: the fragments must be what the rules
-// say to the byte, and SQLite must read the values back out of them.
+// Hostile documents for the translation of requests into SQL. The fragments must be exactly what
+// the rules say, and SQLite must read the same values from them.
 
 #include <json/value.h>
 #include <sqlite3.h>
@@ -52,7 +52,7 @@ Json::Value anyValue(FuzzedDataProvider& input) {
   }
 }
 
-// Names of columns, or of anything: those are not for SQLite, since names are never escaped.
+// Names of columns, or any text. Such a text is not given to SQLite, since names are not escaped.
 Json::Value anyDocument(FuzzedDataProvider& input, bool& ofColumns) {
   const int kind = input.ConsumeIntegralInRange(0, 31);
   if (kind == 1) return anyValue(input);
@@ -73,7 +73,7 @@ Json::Value anyDocument(FuzzedDataProvider& input, bool& ofColumns) {
 
 // --- The rules ---
 
-// The value between single quotes, those inside doubled and every other byte as it is.
+// The value between single quotes, with each single quote in it doubled.
 std::string literal(const Json::Value& value) {
   std::string result = "'";
   for (const char c : value.asString()) result.append(c == '\'' ? 2 : 1, c);
@@ -156,7 +156,7 @@ class Scratch {
     step(sql, [](sqlite3_stmt*) {});
     return sqlite3_changes(db_);
   }
-  // Whether SQLite takes the text for no statement at all.
+  // Whether SQLite finds no statement in the text.
   bool refuses(const std::string& sql) {
     sqlite3_stmt* statement = nullptr;
     const int code = sqlite3_prepare_v2(db_, sql.c_str(), -1, &statement, nullptr);

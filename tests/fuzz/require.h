@@ -1,4 +1,4 @@
-// What must hold whatever the input.
+// Checks that must hold for every input.
 
 #pragma once
 

@@ -1,4 +1,4 @@
-// What the stores make of their arguments, written down a second time to compare with.
+// The rules for arguments, written a second time to compare with the stores.
 
 #pragma once
 

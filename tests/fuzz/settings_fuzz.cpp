@@ -1,5 +1,5 @@
-// The input is the settings file. Whatever it holds, settings stay within their ranges, and where
-// SQLite's JSON functions can read the file they find the same numbers in it.
+// The input is the settings file. Settings must always be within their ranges. If SQLite's JSON
+// functions can read the file, they must find the same numbers.
 
 #include <sqlite3.h>
 
@@ -50,9 +50,9 @@ class OtherReader {
   OtherReader(const OtherReader&) = delete;
   OtherReader& operator=(const OtherReader&) = delete;
 
-  // Whether both readers take the text for a document, and the same one.
+  // Whether both readers read the text as a document, and as the same one.
   bool agreesOn(const std::string& text) {
-    // Nested too deeply for one; escapes that only one refuses, or ends a name at.
+    // One reader refuses deep nesting, or handles some escapes differently.
     if (std::count_if(text.begin(), text.end(), [](char c) { return c == '[' || c == '{'; }) > 900)
       return false;
     for (const char* const escape : {"\\ud", "\\uD", "\\u0000"})
@@ -60,8 +60,8 @@ class OtherReader {
     return first(valid_, text) && sqlite3_column_int(valid_, 0) == 1 && !first(tooLarge_, text);
   }
 
-  // The integer of 32 bits under the key, 0 for anything else. Nothing for a real, of which the
-  // JSON library decides whether it is an integer.
+  // The integer of 32 bits under the key, 0 for anything else. No value for a real number: the JSON
+  // library decides whether that is an integer.
   std::optional<int> integer(const std::string& text, const char* key) {
     sqlite3_reset(member_);
     sqlite3_bind_text(member_, 2, key, -1, SQLITE_STATIC);
@@ -116,7 +116,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     if (const std::optional<int> set = other.integer(text, "token_max"))
       require(rowMax == (*set < 1 ? 1000 : std::min(*set, 10000)), "the ceiling is the one set");
   }
-  // A thread costs a hundred times the rest, so only for some files that name the setting.
+  // A thread takes a hundred times as long as the rest, so only some files are read on one.
   if (size % 256 != 0 || text.find("log_level") == std::string::npos) return 0;
   const int level = levelOfAFreshThread();
   if (comparable)

@@ -29,8 +29,8 @@ int currentTime(sqlite3_vfs*, sqlite3_int64* milliseconds) {
   return SQLITE_OK;
 }
 
-// The row with an id beyond 32 bits, after which the next one's low 32 bits are the smallest int.
-// What is unique in its table ends in another character.
+// A second row. The low 32 bits of the id after it are the smallest int. The unique value ends in
+// another character.
 Row second(Row row, const std::string& unique) {
   row["id"] = "6442450943";
   row[unique].back() = '2';
@@ -41,7 +41,7 @@ Rows two(const Row& row, const std::string& unique) {
   return {{3, row}, {6442450943, second(row, unique)}};
 }
 
-// What every table holds at first.
+// The rows of every table at the start.
 std::map<std::string, Rows> firstRows() {
   const std::string sealed = FakeHost::sealed(std::string(64, 'c'));
   const Row client = {{"enable", "1"},
@@ -70,13 +70,26 @@ std::map<std::string, Rows> firstRows() {
           {"oauth_log", two(line, "msg")}};
 }
 
+std::string sealedIf(const std::string& column, const std::string& value) {
+  const bool sensitive = column == "client_id" || column == "client_secret";
+  return sensitive ? FakeHost::sealed(value) : value;
+}
+
+// As the file holds them.
+Row stored(const Values& values) {
+  Row row;
+  for (const auto& [column, value] : values.asGiven) row[column] = sealedIf(column, value);
+  for (const auto& [column, value] : values.quoted) row[column] = sealedIf(column, doubled(value));
+  return row;
+}
+
 std::string_view columnText(sqlite3_stmt* row, int column) {
   const unsigned char* const text = sqlite3_column_text(row, column);
   const auto size = static_cast<std::size_t>(sqlite3_column_bytes(row, column));
   return {reinterpret_cast<const char*>(text), size};
 }
 
-// The database, seen by a connection of its own: in memory it lives as long as one is open.
+// The database in memory. It exists as long as a connection is open, which this object keeps.
 class Database {
  public:
   static Database& get() {
@@ -113,7 +126,7 @@ class Database {
 
  private:
   Database() {
-    // Every database is in memory, shared by its path, and tells the time of databaseClock.
+    // Every connection to the same path shares one database in memory, whose time is databaseClock.
     static sqlite3_vfs vfs = *sqlite3_vfs_find("memdb");
     vfs.zName = "fuzz";
     vfs.xCurrentTimeInt64 = currentTime;
@@ -180,6 +193,58 @@ StoreWorld::StoreWorld(FuzzedDataProvider& input)
   Database::get().reset();
 }
 
+// Notes the error if a value as given holds a NUL byte.
+bool StoreWorld::refused(const Row& asGiven) {
+  std::vector<std::string> values;
+  for (const auto& [column, value] : asGiven) {
+    if (column == "client_id" && hasNul(value)) return fail(-4, "Data Encrypt failed") == 0;
+    if (column != "client_id") values.push_back(value);
+  }
+  const std::string refusal = refusalOf(values);
+  return !refusal.empty() && fail(1, refusal) == 0;
+}
+
+int StoreWorld::insert(const std::string& table, const std::string& unique, const Values& values) {
+  if (refused(values.asGiven)) return 0;
+  Row row = stored(values);
+  for (const auto& [id, other] : rows(table))
+    if (other.at(unique) == row.at(unique))
+      return fail(19, "UNIQUE constraint failed: " + table + "." + unique);
+  add(table, std::move(row));
+  return 1;
+}
+
+int StoreWorld::update(const std::string& table, std::int64_t id, const Values& values) {
+  if (refused(values.asGiven)) return 0;
+  const auto row = rows(table).find(id);
+  if (row == rows(table).end()) return 0;
+  for (const auto& [column, value] : stored(values)) row->second[column] = value;
+  return 1;
+}
+
+std::int64_t StoreWorld::expectFound(const OAUTHDBBasic& store, const std::string& table,
+                                     const Json::Value& delivered, int success,
+                                     const std::string& column, const std::string& text,
+                                     bool asGiven) {
+  if (!fits(text, 64, 64)) {
+    expect(store, success, fail(-2, "Bad parameters"));
+    return 0;
+  }
+  if (asGiven && hasNul(text)) {
+    expect(store, success, fail(1, refusalOf({text})));
+    return 0;
+  }
+  expect(store, success, 1);
+  const std::string kept = sealedIf(column, asGiven ? text : doubled(text));
+  std::int64_t found = 0;
+  expectRows(table, delivered, [&](const Row& row) {
+    if (row.at(column) != kept) return false;
+    found = number(row.at("id"));
+    return true;
+  });
+  return found;
+}
+
 void StoreWorld::add(const std::string& table, Row row) {
   Rows& all = rows(table);
   const std::int64_t id = all.empty() ? 1 : all.rbegin()->first + 1;
@@ -187,7 +252,7 @@ void StoreWorld::add(const std::string& table, Row row) {
   all[id] = std::move(row);
 }
 
-// Beyond the ceiling a line goes with all those of its second.
+// A line beyond the ceiling is deleted, and with it all lines of the same second.
 void StoreWorld::addToLog(const std::string& msg) {
   add("oauth_log", {{"timestamp", std::to_string(databaseClock)}, {"msg", doubled(msg)}});
   Rows& lines = rows("oauth_log");

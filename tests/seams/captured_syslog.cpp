@@ -3,6 +3,7 @@
 #include <syslog.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdarg>
 #include <cstdio>
 #include <mutex>
@@ -19,6 +20,7 @@ struct Entry {
 std::mutex guard;
 std::vector<Entry> entries;
 CapturedSyslog* current = nullptr;
+int leftErrno = 0;
 
 [[gnu::format(printf, 2, 0)]] void record(int priority, const char* format, va_list arguments) {
   const OwnWork seam;
@@ -30,6 +32,7 @@ CapturedSyslog* current = nullptr;
   va_end(again);
   const std::lock_guard<std::mutex> lock(guard);
   if (current != nullptr) entries.push_back({priority, format, text});
+  if (leftErrno != 0) errno = leftErrno;
 }
 
 // "oauth_token.cpp:12 Bad parameters" -> "oauth_token.cpp Bad parameters"
@@ -57,6 +60,7 @@ CapturedSyslog::CapturedSyslog() {
   const std::lock_guard<std::mutex> lock(guard);
   entries.clear();
   current = this;
+  leftErrno = 0;
 }
 
 CapturedSyslog::~CapturedSyslog() {
@@ -74,6 +78,11 @@ std::vector<std::string> CapturedSyslog::formats() const {
   return printed([](const Entry& entry) { return entry.format; });
 }
 
+void CapturedSyslog::leaveErrno(int error) {
+  const std::lock_guard<std::mutex> lock(guard);
+  leftErrno = error;
+}
+
 void CapturedSyslog::clear() {
   const std::lock_guard<std::mutex> lock(guard);
   entries.clear();
@@ -86,7 +95,7 @@ extern "C" void syslog(int priority, const char* format, ...) {
   va_end(arguments);
 }
 
-// What the compiler calls instead where _FORTIFY_SOURCE is set.
+// With _FORTIFY_SOURCE the compiler calls this function instead.
 // NOLINTNEXTLINE(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): its name is given
 extern "C" [[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int, const char* format,
                                                            ...) {

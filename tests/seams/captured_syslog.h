@@ -13,11 +13,12 @@ class CapturedSyslog {
   CapturedSyslog(const CapturedSyslog&) = delete;
   CapturedSyslog& operator=(const CapturedSyslog&) = delete;
 
-  // Each line as "<priority> <file> <text>", in order, the line number left out:
-  // "3 oauth_token.cpp Bad parameters". What does not have the library's form stands as
-  // "<priority> <whole line>".
+  // Each line as "<priority> <file> <text>", in order, without the line number:
+  // "3 oauth_token.cpp Bad parameters". A line of another form is "<priority> <whole line>".
   std::vector<std::string> lines() const;
-  // The formats as they were handed over: "%s:%d Bad parameters".
+  // The formats, as syslog() got them: "%s:%d Bad parameters".
   std::vector<std::string> formats() const;
   void clear();
+  // syslog() leaves this errno from now on, as it may after a lost connection.
+  void leaveErrno(int error);
 };

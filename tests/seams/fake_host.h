@@ -23,9 +23,9 @@ class FakeHost {
   // Every call: "encrypt abc 1024", "decrypt sealed:cba 1024", "ip 1024".
   const std::vector<std::string>& calls() const;
 
-  // Inside a web request of this client; outside of any at first.
+  // Begins a web request of this client. At first there is no request.
   void setRemoteIp(const std::string& address);
-  // Writes the address and answers this code, which is no success unless it is 0.
+  // The same, but the function returns this code; only 0 is a success.
   void setRemoteIp(const std::string& address, int code);
 
   static std::string sealed(const std::string& plain);

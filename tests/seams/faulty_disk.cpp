@@ -19,7 +19,7 @@ struct Plan {
 };
 Plan plan;
 
-// Counts down to 0 and stays there, or at -1 for never.
+// Counts down to 0 and stays there. -1 means never.
 bool reached(int& countdown) { return countdown > 0 && --countdown == 0; }
 
 int answer(Call call) {
@@ -106,7 +106,7 @@ int sectorSize(sqlite3_file* file) { return methods(file).xSectorSize(real(file)
 
 int characteristics(sqlite3_file* file) { return methods(file).xDeviceCharacteristics(real(file)); }
 
-// Version 1: neither shared memory nor memory maps, which a rollback journal needs not.
+// Version 1 has neither shared memory nor memory maps; a rollback journal does not need them.
 const sqlite3_io_methods ioMethods = {
     1,        closeFile,  readFile,      writeFile,   truncateFile, syncFile,        fileSize,
     lockFile, unlockFile, checkReserved, controlFile, sectorSize,   characteristics, nullptr,

@@ -1,6 +1,6 @@
 // The file system below SQLite, which fails or kills the process on demand. An object of this class
-// is SQLite's default file system while it lives. It passes no sync on: nothing here needs a file
-// to survive the machine, and thousands of faults would wait for the disk.
+// is SQLite's default file system while it lives. It does not pass syncs on: thousands of faults
+// would wait for the disk, and no test needs its files after a power failure.
 
 #pragma once
 
@@ -13,16 +13,16 @@ class FaultyDisk {
   FaultyDisk(const FaultyDisk&) = delete;
   FaultyDisk& operator=(const FaultyDisk&) = delete;
 
-  // The n-th such call from now on answers this SQLite code, 1 being the next. Replaces whatever
-  // was asked for before.
+  // The n-th such call from now on returns this SQLite code, 1 being the next. Replaces an earlier
+  // fault.
   static void fail(Call call, int nth, int code);
-  // Only so many more writes succeed; then the disk is full.
+  // The disk is full after so many more writes.
   static void fillAfter(int writes);
-  // A rollback journal may grow to this many bytes; then the disk is full.
+  // The disk is full when a rollback journal has this many bytes.
   static void limitJournal(int bytes);
   // The n-th call that changes a file (write, sync, truncate, delete) kills the process: a write
-  // when half of it is done, the others before they begin.
+  // after half of its bytes, the others before they begin.
   static void killAt(int nth);
-  // Back to working order; tells whether the fault came.
+  // Ends the fault; tells whether it happened.
   static bool mend();
 };

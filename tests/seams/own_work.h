@@ -1,4 +1,4 @@
-// Marks what a seam does by itself: the library must not be blamed, nor made to fail, for it.
+// Marks the work of a seam itself, which other seams neither count nor make fail.
 
 #pragma once
 

@@ -29,14 +29,15 @@ struct State {
   int openCode = SQLITE_OK, closeCode = SQLITE_OK;
   bool failFormatting = false;
   int lookError = 0;
-  int randomError = 0;
+  int randomError = 0, randomCalls = 0;
+  unsigned char lastByte = 0;
   bool trickle = false, interrupt = false, randomDevice = true;
   std::vector<std::string> calls;
 };
 State state;
 
-// In memory where the machine offers that: no test needs a file to outlive the machine, and the
-// processes that queue for a busy disk would wait longer than a store does.
+// In memory if possible: on a busy disk, processes that wait for each other would wait longer than
+// a store does.
 std::filesystem::path temporaryFiles() {
   constexpr char kMemory[] = "/dev/shm";
   if (std::getenv("TMPDIR") == nullptr && access(kMemory, W_OK) == 0) return kMemory;
@@ -100,7 +101,10 @@ void RedirectedFiles::failNextLook(int error) { state.lookError = error; }
 void RedirectedFiles::openWithoutHandle(int code) { state.openCode = code; }
 void RedirectedFiles::waitForLocks() { state.waitForLocks = true; }
 void RedirectedFiles::failClose(int code) { state.closeCode = code; }
-void RedirectedFiles::failRandomCall(int error) { state.randomError = error; }
+void RedirectedFiles::failRandomCall(int error, int calls) {
+  state.randomError = error;
+  state.randomCalls = calls;
+}
 void RedirectedFiles::trickleRandomBytes() { state.trickle = true; }
 void RedirectedFiles::removeRandomDevice() { state.randomDevice = false; }
 void RedirectedFiles::failFormatting() { state.failFormatting = true; }
@@ -118,7 +122,7 @@ extern "C" int sqlite3_open(const char* path, sqlite3** db) {
   return sqlite3_open_v2(redirected(path).c_str(), db, flags, nullptr);
 }
 
-// Recorded, and set only on demand: what is locked in a test of one process stays locked.
+// Recorded, and set only on demand: nobody releases a lock in a test of one process.
 extern "C" int sqlite3_busy_timeout(sqlite3* db, int milliseconds) {
   const OwnWork seam;
   state.calls.push_back("busy_timeout " + std::to_string(milliseconds));
@@ -145,12 +149,14 @@ extern "C" char* sqlite3_mprintf(const char* format, ...) {
 extern "C" ssize_t getrandom(void* buffer, size_t size, unsigned flags) {
   const OwnWork seam;
   if (state.trickle) state.interrupt = !state.interrupt;
-  if (state.randomError != 0 || state.interrupt) {
+  if (state.interrupt || (state.randomError != 0 && state.randomCalls-- <= 0)) {
     errno = state.interrupt ? EINTR : state.randomError;
     return -1;
   }
-  return next("getrandom", getrandom)(buffer, state.trickle ? std::min<size_t>(size, 5) : size,
-                                      flags);
+  if (!state.trickle) return next("getrandom", getrandom)(buffer, size, flags);
+  const size_t count = std::min<size_t>(size, 5);
+  for (size_t i = 0; i < count; ++i) static_cast<unsigned char*>(buffer)[i] = ++state.lastByte;
+  return static_cast<ssize_t>(count);
 }
 
 extern "C" int open64(const char* path, int flags, ...) {

@@ -25,19 +25,19 @@ class RedirectedFiles {
 
   // Makes opening the database fail as in a missing directory.
   void removeDirectory();
-  // Opens the database for reading only, and does not make it.
+  // Opens the database for reading only, and does not create it.
   void openReadOnly();
   // The next lstat() fails with this errno.
   void failNextLook(int error);
-  // sqlite3_open() answers this code and hands out no handle, as it does without memory.
+  // sqlite3_open() returns this code and no handle, as it does without memory.
   void openWithoutHandle(int code);
-  // Locks of other processes are waited for, as long as the library asks.
+  // Waits for locks of other processes as long as the library asks for.
   void waitForLocks();
-  // sqlite3_close() closes, and answers this code.
+  // sqlite3_close() closes, but returns this code.
   void failClose(int code);
-  // getrandom() fails with this errno: ENOSYS is a kernel without the call.
-  void failRandomCall(int error);
-  // getrandom() is interrupted every other time, and delivers 5 bytes at most.
+  // getrandom() fails with this errno after so many calls: ENOSYS is a kernel without the call.
+  void failRandomCall(int error, int calls = 0);
+  // getrandom() is interrupted every other time, and delivers 5 bytes at most: 1, 2, 3 and so on.
   void trickleRandomBytes();
   // The device of random bytes cannot be opened.
   void removeRandomDevice();

@@ -9,7 +9,7 @@
 
 #include "own_work.h"
 
-// What is behind malloc() in the C library.
+// The malloc() of the C library.
 // NOLINTNEXTLINE(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): its name is given
 extern "C" void* __libc_malloc(std::size_t size);
 
@@ -63,7 +63,7 @@ bool ScarceMemory::refill() {
 }
 int ScarceMemory::requestsAsRoot() const { return asRoot; }
 
-// The address sanitizer brings its own malloc(): there only operator new is refused, and here both.
+// The address sanitizer has its own malloc(). With it only operator new is refused, else both.
 #ifdef __SANITIZE_ADDRESS__
 namespace {
 void* request(std::size_t size) { return refusesCpp() ? nullptr : std::malloc(size); }

@@ -14,7 +14,7 @@ class ScarceMemory {
   // The n-th request from now on is refused, 1 being the next; those after it succeed.
   void refuseSqlite(int nth);
   void refuseCpp(int nth);
-  // Plenty again; tells whether the refusal came.
+  // Ends the refusal; tells whether it happened.
   bool refill();
 
   // How often operator new has been called while the effective user was root.
