@@ -1,16 +1,30 @@
 #!/usr/bin/env bash
 # What a machine can say about the code: formatting, shell scripts, clang-tidy, tests in any order
 # and for an ordinary user, branch coverage of src/.
+#
+#   scripts/check.sh             all of it
+#   scripts/check.sh --changed   formatting, shell scripts and clang-tidy for the files that differ
+#                                from the branch main, or from its last commit when on main; a
+#                                header counts for the source of the same name
+#
 # Installs what is missing (scripts/packages.sh, groups build, test, check and authserver).
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
 required_branches=95 # percent
 
+case $#:${1-} in
+  0: | 1:--changed) mode=${1-} ;;
+  *)
+    echo "usage: scripts/check.sh [--changed]" >&2
+    exit 2
+    ;;
+esac
+
 # Root's files, without root's rights: a user who need not be let into the folder they lie in.
 user=()
 [ "$(id -u)" -ne 0 ] || user=(unshare --user --map-user=65534 --map-group=65534)
-if ! "${user[@]}" true; then
+if [ -z "$mode" ] && ! "${user[@]}" true; then
   echo "check: this machine does not let root make a namespace, for the tests of an ordinary user" >&2
   exit 1
 fi
@@ -18,30 +32,54 @@ fi
 trap '[ $? -eq 0 ] || echo "check: failed" >&2' EXIT
 scripts/packages.sh build test check authserver
 
-mapfile -t sources < <(find include src platform examples tools tests -name '*.cpp' -o -name '*.h' | sort)
-clang-format --dry-run -Werror "${sources[@]}" bench/*.{c,cpp,h}
-echo "check: sources are formatted"
+# The files to look at, NUL between them: those that match a pattern of find -regex.
+if [ -n "$mode" ]; then
+  base=HEAD
+  [ "$(git branch --show-current)" = main ] || base=$(git merge-base main HEAD)
+  mapfile -t files < <({
+    git diff --name-only --diff-filter=d "$base"
+    git ls-files --others --exclude-standard
+  } | sort -u)
+else
+  mapfile -t files < <(find .ci bench include platform examples scripts src tests tools -type f |
+    sort)
+fi
+of_kind() { # PATTERN
+  [ "${#files[@]}" -eq 0 ] || printf '%s\n' "${files[@]}" | grep -E "$1" || true
+}
 
-shellcheck .ci/run scripts/*.sh tests/*.sh tools/oauthctl/oauthctl.bash
-echo "check: shell scripts are sound"
+mapfile -t sources < <(of_kind '\.(c|cpp|h)$')
+[ "${#sources[@]}" -eq 0 ] || clang-format --dry-run -Werror "${sources[@]}"
+echo "check: ${#sources[@]} sources are formatted"
 
-folder=$(scripts/build.sh dev dev -DZEVOOAUTH_BUILD_AUTHSERVER=ON | tail -n 1)
-# The fuzz targets are another compiler's build: there are no commands for them in this one.
-printf '%s\n' "${sources[@]}" | grep '\.cpp$' | grep -v '^tests/fuzz/' |
-  xargs --max-procs="$(nproc)" --max-args=1 clang-tidy --quiet -p "$folder" --warnings-as-errors='*' \
-    2> >(grep -v ' generated\.$' >&2)
-echo "check: clang-tidy has nothing to say"
+mapfile -t scripts < <(of_kind '\.(sh|bash)$|^\.ci/run$')
+[ "${#scripts[@]}" -eq 0 ] || shellcheck "${scripts[@]}"
+echo "check: ${#scripts[@]} shell scripts are sound"
 
-for program in "$folder"/tests/*_test; do
-  "${user[@]}" "$program" --gtest_shuffle --gtest_brief=1 | grep -v '^Running main'
-done
-echo "check: tests pass in any order, in one process, for an ordinary user"
+# Only configured: clang-tidy needs the compiler's commands, and no compiled files. The fuzz targets
+# and the benchmark are builds of their own, without commands in this one.
+folder=$(scripts/lib/build-folder.sh tidy)
+cmake --preset dev -B "$folder" -DZEVOOAUTH_BUILD_AUTHSERVER=ON >/dev/null
+mapfile -t units < <(for source in "${sources[@]}"; do
+  [ ! -e "${source%.*}.cpp" ] || echo "${source%.*}.cpp"
+done | sort -u | grep -vE '^(tests/fuzz|bench)/')
+# The largest first, so that no core waits for the last one.
+[ "${#units[@]}" -eq 0 ] || stat --printf '%s %n\n' "${units[@]}" | sort --numeric-sort --reverse |
+  cut -d ' ' -f 2 | xargs --max-procs="$(nproc)" --max-args=1 \
+  clang-tidy --quiet -p "$folder" --warnings-as-errors='*' 2> >(grep -v ' generated\.$' >&2)
+echo "check: clang-tidy has nothing to say about ${#units[@]} sources"
+if [ -n "$mode" ]; then
+  echo "check: passed for what has changed"
+  exit
+fi
 
-folder=$(scripts/build.sh coverage coverage | tail -n 1)
+# The tests of the plain build, with the library that counts its branches in place of the plain one.
+programs=$(scripts/build.sh dev dev | tail -n 1)/tests
+folder=$(scripts/build.sh coverage coverage -- zevooauth | tail -n 1)
 find "$folder" -name '*.gcda' -delete
-# Without the look at the library's imports: counting branches brings in some of its own.
-ctest --test-dir "$folder" --parallel "$(nproc)" --output-on-failure --exclude-regex SharedLibrary \
-  >"$folder/ctest.log" || { cat "$folder/ctest.log" && exit 1; }
+printf '%s\n' "$programs"/*_test | LD_LIBRARY_PATH=$folder xargs --max-procs="$(nproc)" --replace \
+  "${user[@]}" {} --gtest_shuffle --gtest_brief=1 | grep -v '^Running main'
+echo "check: tests pass in any order, in one process, for an ordinary user"
 # What a throw could do after every call is not a branch that anybody wrote.
 gcovr --root . --filter src/ --exclude-throw-branches --exclude-unreachable-branches \
   --print-summary --fail-under-branch "$required_branches" "$folder/CMakeFiles/zevooauth.dir"
