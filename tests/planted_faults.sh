@@ -1,11 +1,11 @@
 #!/usr/bin/env bash
-# Tells how much the tests notice: plants the faults of planted_faults.txt one at a time, and says
-# for each which test catches it.
+# Plants the faults of planted_faults.txt one at a time, and says for each which test catches it.
 #
 #   tests/planted_faults.sh [ID...]
 #
 # Without an ID all faults are planted. Builds in a copy that it removes; the checkout stays as it
-# is. Takes about a quarter of an hour. Exit code 1 if a fault is missed, 2 if one cannot be planted.
+# is. Takes about a quarter of an hour. The exit code is 1 if a fault is missed, and 2 if one cannot
+# be planted.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -42,8 +42,8 @@ if [ $# -gt 0 ]; then
   ids=("$@")
 fi
 
-# The text of the file with the fault in it. What is put there may be a part of a line, so the text
-# to find and the text to put have no line end at their ends; a deleted line leaves an empty one.
+# Prints the file with the fault in it. The text to find may be a part of a line, so it has no line
+# end after it, and a deleted line leaves an empty one.
 planted() { # ID
   local text wanted=${find[$1]%$'\n'} before after
   text=$(<"${file[$1]}")
@@ -53,18 +53,22 @@ planted() { # ID
   [[ $after != *"$wanted"* ]] || fail "$1: ${file[$1]} has the text to find more than once"
   printf '%s\n' "$before${put[$1]%$'\n'}$after"
 }
-for id in "${ids[@]}"; do planted "$id" >/dev/null; done
+unplantable=0
+for id in "${ids[@]}"; do (planted "$id") >/dev/null || unplantable=$((unplantable + 1)); done
+[ "$unplantable" -eq 0 ] || fail "adapt $unplantable faults in planted_faults.txt to src"
 
 # --- Copy and build ---
 
 work=$(mktemp -d)
-# Databases are files: in memory where the machine offers that.
+# The tests' databases are files. Keep them in memory if possible.
 TMPDIR=$(mktemp -d -p /dev/shm 2>/dev/null || mktemp -d)
 chmod 711 "$TMPDIR" # tests of other users' rights enter it
 export TMPDIR
 declare -A running=() # process id -> program
 stop_programs() {
-  [ "${#running[@]}" -eq 0 ] || { kill "${!running[@]}"; wait "${!running[@]}"; } 2>/dev/null || true
+  if [ "${#running[@]}" -gt 0 ]; then
+    { kill "${!running[@]}" && wait "${!running[@]}"; } 2>/dev/null || true
+  fi
   running=()
 }
 trap 'stop_programs; rm -rf "$work" "$TMPDIR"' EXIT
@@ -78,18 +82,18 @@ export CCACHE_BASEDIR=$work CCACHE_NOHASHDIR=1 # each copy has another name
 build() {
   cmake --build "$work/build" -- --quiet >"$work/build.log" 2>&1
 }
-# The programs need no new link when only the library has changed.
+# Programs are not linked again when only the library has changed.
 cmake --preset dev -B "$work/build" -DZEVOOAUTH_BUILD_TOOLS=OFF -DCMAKE_LINK_DEPENDS_NO_SHARED=ON \
   >/dev/null
 build || { cat "$work/build.log" >&2; fail "the tests cannot be built"; }
 
 # --- Run the tests ---
 
-# What a program's log names as the first failure; a program that died was running the last test.
+# The first failure in a program's log. If the program crashed, it is the test that ran last.
 first_failure() { # PROGRAM
   local log=$work/$1.log
   sed -nE 's/^\[  FAILED  \] ([A-Za-z0-9_\/]+\.[A-Za-z0-9_\/]+).*/\1/p' "$log" | head -n 1 |
-    grep . || sed -nE 's/^\[ RUN      \] (.*)/\1 (did not end well)/p' "$log" | tail -n 1 |
+    grep . || sed -nE 's/^\[ RUN      \] (.*)/\1 (crashed)/p' "$log" | tail -n 1 |
     grep . || echo "$1"
 }
 
@@ -116,7 +120,7 @@ caught_by_program() { # PROGRAM...
   done
 }
 
-# The same for the scripts and programs that compare whole outputs.
+# The same for tests that are not in a test program, such as scripts.
 caught_by_script() {
   ! ctest --test-dir "$work/build" --stop-on-failure --parallel "$(nproc)" \
     --tests-regex '^(DatabaseExchange|ReadmeExample|ReferencePages|PublicHeader|SharedLibrary)\.' \
@@ -125,7 +129,7 @@ caught_by_script() {
     head -n 1)
 }
 
-# Without a fault every program passes, and tells how long it takes: the quick ones go first.
+# Run every program without a fault: it must pass. Later, run the quick programs first.
 mapfile -t programs < <(cd "$work/build/tests" && printf '%s\n' *_test)
 for program in "${programs[@]}"; do
   started=$(date +%s%N)
