@@ -141,6 +141,18 @@ void checkCipherColumn(SqliteConnection& database, const std::string& table,
                         "bring back this machine's encryption key, or delete the rows"});
 }
 
+void checkExpiryColumn(SqliteConnection& database, const std::string& table,
+                       const std::string& column, Findings& findings) {
+  const std::vector<SqliteConnection::Row> rows =
+      database.rows("SELECT id, " + column + " FROM " + table + " ORDER BY id");
+  std::vector<std::string> wrong;
+  for (const SqliteConnection::Row& row : rows)
+    if (!ZEVOOAUTHSERVER::decimalNumber(row[1])) wrong.push_back(row[0]);
+  if (!wrong.empty())
+    findings.push_back({column + " in " + table + " is no number: " + rowList(wrong),
+                        "the rows count as expired long ago; purge or revoke them"});
+}
+
 }  // namespace
 
 Findings checkStructure(SqliteConnection& database) {
@@ -170,17 +182,9 @@ Findings checkCiphers(SqliteConnection& database, CipherCount& count) {
 
 Findings checkExpiries(SqliteConnection& database) {
   Findings findings;
-  const std::string expiry = column::kExpiredTime;
-  for (const std::string name : {table::kGrantCode, table::kToken}) {
-    if (!hasColumn(database, name, expiry)) continue;
-    std::vector<std::string> wrong;
-    for (const SqliteConnection::Row& row :
-         database.rows("SELECT id, " + expiry + " FROM " + name + " ORDER BY id"))
-      if (!ZEVOOAUTHSERVER::decimalNumber(row[1])) wrong.push_back(row[0]);
-    if (!wrong.empty())
-      findings.push_back({expiry + " in " + name + " is no number: " + rowList(wrong),
-                          "the rows count as expired long ago; purge or revoke them"});
-  }
+  for (const char* const name : {table::kGrantCode, table::kToken})
+    if (hasColumn(database, name, column::kExpiredTime))
+      checkExpiryColumn(database, name, column::kExpiredTime, findings);
   return findings;
 }
 
