@@ -283,9 +283,6 @@ Lines linesAfterOpeningTheLog(const Row& client) {
       FakeHost::sealed(client.at("client_id")) + "', '" +
       FakeHost::sealed(client.at("client_secret")) +
       "', 'Mail', '1', NULL, 'example.com/cb', 'read');";
-  const std::string insertMessage =
-      "INSERT INTO oauth_log (id, msg, timestamp) "
-      "VALUES(NULL, 'Application registed[Mail]', strftime('%s','now'));";
   const std::string trim =
       "DELETE FROM oauth_log WHERE timestamp IN (SELECT timestamp FROM oauth_log "
       "ORDER BY timestamp DESC LIMIT -1 OFFSET 1000)";
@@ -312,7 +309,8 @@ Lines linesAfterOpeningTheLog(const Row& client) {
       "3 oauth_db_basic.cpp ==> DBAdd",
       "3 oauth_db_basic.cpp ==> GetInsertParam",
       "3 oauth_db_basic.cpp ==> DBCmd",
-      "3 oauth_db_basic.cpp ==> DBCmdRun[" + insertMessage + "]",
+      std::string("3 oauth_db_basic.cpp ==> DBCmdRun[INSERT INTO oauth_log (id, msg, timestamp) ") +
+          "VALUES(NULL, 'Application registed[Mail]', strftime('%s','now'));]",
       "3 oauth_db_basic.cpp [oauth_log] Add success, changed[1]",
       "3 oauth_db_basic.cpp ==> DBCmd",
       "3 oauth_db_basic.cpp ==> DBCmdRun[" + trim + "]",

@@ -7,7 +7,6 @@
 #include "oauth_token.h"
 #include "store_test.h"
 
-using testing::_;
 using testing::ElementsAre;
 using testing::IsEmpty;
 using ZEVOOAUTHSERVER::kErrBadParameters;
@@ -407,7 +406,7 @@ TEST_F(DeleteTest, RemovesNothingForAConditionOfAnotherKind) {
     log_.clear();
     EXPECT_FALSE(del(R"({"condition": )" + condition + "}"));
     EXPECT_EQ(1, store_->GetErrCode());
-    EXPECT_THAT(log_.lines(), ElementsAre(_, "3 oauth_db_basic.cpp Delete failed[t]"));
+    EXPECT_THAT(log_.lines(), ElementsAre(testing::_, "3 oauth_db_basic.cpp Delete failed[t]"));
     EXPECT_THAT(names(), ElementsAre("a", "b", "b", "%"));
   }
 }
