@@ -131,13 +131,13 @@ INSTANTIATE_TEST_SUITE_P(
 
 TEST_F(UsageTest, KeepsTheCompletionCurrent) {
   EXPECT_EQ(oauthctl::bashCompletion(), bytesOf(OAUTHCTL_SOURCE "/oauthctl.bash"))
-      << "in tools/oauthctl, run: oauthctl_documents completion > oauthctl.bash";
+      << "in tools/oauthctl, run: " OAUTHCTL_DOCUMENTS " completion > oauthctl.bash";
 }
 
 TEST_F(UsageTest, KeepsTheManualCurrent) {
   const std::string page = oauthctl::manualPage(bytesOf(OAUTHCTL_SOURCE "/oauthctl.1.in"));
   EXPECT_EQ(page, bytesOf(OAUTHCTL_SOURCE "/oauthctl.1"))
-      << "in tools/oauthctl, run: oauthctl_documents manual < oauthctl.1.in > oauthctl.1";
+      << "in tools/oauthctl, run: " OAUTHCTL_DOCUMENTS " manual < oauthctl.1.in > oauthctl.1";
   EXPECT_THAT(page, Not(HasSubstr("@"))) << "unknown placeholder";
 }
 
