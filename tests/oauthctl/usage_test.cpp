@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include <set>
 #include <sstream>
 
 #include "command_line/command_table.h"
@@ -55,6 +56,16 @@ TEST_F(UsageTest, ListsTheCommandsOfAGroup) {
   EXPECT_EQ(0, outcome.code);
   EXPECT_THAT(outcome.out, StartsWith("Usage: oauthctl client COMMAND"));
   EXPECT_THAT(outcome.out, HasSubstr("\n  client delete   Delete a client\n"));
+}
+
+// A group without a row in commandGroups() has no summary, and bash does not complete its commands.
+TEST_F(UsageTest, DescribesEveryGroup) {
+  std::set<std::string> described;
+  for (const oauthctl::Group& group : oauthctl::commandGroups()) described.insert(group.word);
+  for (const oauthctl::Command& command : oauthctl::commandTable())
+    if (wordsOf(command.path).size() == 1) described.insert(command.path);
+  for (const oauthctl::Command& command : oauthctl::commandTable())
+    EXPECT_EQ(1U, described.count(wordsOf(command.path)[0])) << "add its group: " << command.path;
 }
 
 TEST_F(UsageTest, TellsItsVersion) {
