@@ -10,8 +10,10 @@
 #include <regex>
 #include <sstream>
 #include <string>
+#include <tuple>
 #include <vector>
 
+using testing::AnyOf;
 using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::Not;
@@ -84,7 +86,21 @@ TEST(SettingsTableTest, HasEveryNameOfTheVocabulary) {
     inVocabulary.push_back((*match)[1]);
   for (const Setting& setting : kSettings) inTable.push_back(setting.name);
   EXPECT_THAT(inVocabulary, Not(IsEmpty()));
-  EXPECT_THAT(inVocabulary, testing::UnorderedElementsAreArray(inTable));
+  EXPECT_THAT(inVocabulary, testing::UnorderedElementsAreArray(inTable))
+      << "kSettings in src/utils/oauth_settings.h needs a row for each name in src/oauth_names.h";
+}
+
+// getTableRowMax(), getExpiredPeriod() and getLogLevel() have one range each and do not look into
+// the table: with another range in its row, oauthctl would show values that the library does not
+// use.
+TEST(SettingsTableTest, HasOnlyTheRangesOfTheReadingFunctions) {
+  const auto values = [](const SettingRange& range) {
+    return std::make_tuple(range.fallback, range.smallest, range.largest);
+  };
+  for (const Setting& setting : kSettings)
+    EXPECT_THAT(values(setting.range),
+                AnyOf(values(kRowCeiling), values(kLifetime), values(kLevelMask)))
+        << setting.name;
 }
 
 TEST(SettingsTableTest, ReplacesValuesOutsideTheRange) {
