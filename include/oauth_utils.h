@@ -19,12 +19,12 @@ bool isDebugEnabled();
 /// 8 entry traces. Each thread reads it once. 0 if it is not set.
 int getLogLevel();
 
-/// Lifetime in seconds from the setting named by key ("grantcode_expired" or "token_expired");
-/// 600 unless the settings file holds an integer above 0. Every call reads the file again.
+/// Lifetime in seconds from the setting named by key, such as "token_expired"; 600 unless the
+/// settings file holds an integer above 0. Every call reads the file again.
 int getExpiredPeriod(const std::string& key);
 
-/// Row ceiling from the setting named by key ("client_info_max", "grantcode_max", "token_max" or
-/// "log_max"): 1000 unless set to 1 or more, 10000 at most. Every call reads the file again.
+/// Row ceiling from the setting named by key, such as "token_max": 1000 unless set to 1 or more,
+/// 10000 at most. Every call reads the file again.
 int getTableRowMax(const std::string& key);
 
 /// Whether the string is minLen to maxLen bytes long, both inclusive. With allowEmpty the empty

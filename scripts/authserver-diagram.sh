@@ -8,6 +8,14 @@
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
+case $#:${1-} in
+  0: | 1:--check) ;;
+  *)
+    echo "usage: scripts/authserver-diagram.sh [--check]" >&2
+    exit 2
+    ;;
+esac
+
 drawing=docs/authserver-login.svg
 scripts/packages.sh drawings
 # Calls of the library in blue, on white where the reader's page is dark.

@@ -8,7 +8,7 @@
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
-preset=$1
+preset=${1:?usage: scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]}
 folder=$(scripts/lib/build-folder.sh "$2")
 shift 2
 options=()

@@ -4,6 +4,7 @@
 # is none, and the database and the key of the encryption stand-in in it; rows it makes are removed.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
+[ $# -eq 0 ] || { echo "usage: scripts/demo.sh" >&2 && exit 2; }
 
 data=/var/packages/Keyloft/target/etc
 

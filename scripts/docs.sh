@@ -4,6 +4,7 @@
 # Installs what is missing (scripts/packages.sh, group docs). The last line tells where it is.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
+[ $# -eq 0 ] || { echo "usage: scripts/docs.sh" >&2 && exit 2; }
 
 scripts/packages.sh docs
 folder=$(scripts/lib/build-folder.sh reference)

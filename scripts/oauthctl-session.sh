@@ -14,6 +14,9 @@ check=
 if [ "${1-}" = --check ]; then
   check=yes
   shift
+elif [ $# -gt 0 ]; then
+  echo "usage: scripts/oauthctl-session.sh [--check [FOLDER [EMULATOR...]]]" >&2
+  exit 2
 fi
 if [ $# -eq 0 ]; then
   scripts/packages.sh build test

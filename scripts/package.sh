@@ -4,6 +4,7 @@
 # same packages, byte for byte.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
+[ $# -eq 0 ] || { echo "usage: scripts/package.sh" >&2 && exit 2; }
 
 scripts/packages.sh build package
 folder=$(scripts/lib/build-folder.sh packages)

@@ -5,6 +5,7 @@
 # from it, is removed in the end.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
+[ $# -eq 0 ] || { echo "usage: scripts/test-odd-place.sh" >&2 && exit 2; }
 
 home=$(mktemp --directory /var/tmp/zevooauth-home-XXXXXX) # of mode 0700
 trap '[ $? -eq 0 ] || echo "test-odd-place: failed" >&2; rm -rf "$home"' EXIT

@@ -5,6 +5,7 @@
 # those systems, whose downloads are kept for the next time.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
+[ $# -eq 0 ] || { echo "usage: scripts/test-package.sh" >&2 && exit 2; }
 
 if [ "$(id -u)" -ne 0 ]; then
   echo "test-package: as root, please: it makes systems of their own" >&2

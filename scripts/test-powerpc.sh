@@ -5,6 +5,7 @@
 # builds for the target (scripts/lib/powerpc-libraries.sh) for the next time.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
+[ $# -eq 0 ] || { echo "usage: scripts/test-powerpc.sh" >&2 && exit 2; }
 
 trap '[ $? -eq 0 ] || echo "test-powerpc: failed" >&2' EXIT
 scripts/packages.sh build test powerpc
