@@ -10,8 +10,8 @@ namespace ZEVOOAUTHSERVER {
 // Why the text is not an IP address of version 4 or 6; empty if it is one, or if it is empty.
 inline std::string addressError(const std::string& ip) {
   boost::system::error_code error;
-  if (!ip.empty()) boost::asio::ip::make_address(ip, error);
-  return error ? error.message() : std::string();
+  boost::asio::ip::make_address(ip, error);
+  return ip.empty() || !error ? std::string() : error.message();
 }
 
 }  // namespace ZEVOOAUTHSERVER

@@ -76,6 +76,17 @@ test('bodies over the limit are refused with 413', async () => {
     }
 });
 
+test('a large announced length is refused with 413, whatever follows its digits', () => {
+  for (const length of ['70000', '70000x', '+70000', ' 70000', '99999999999999999999x']) {
+    const answer = server.runProgram('revoke', {
+      REQUEST_METHOD: 'POST',
+      CONTENT_TYPE: form,
+      CONTENT_LENGTH: length,
+    });
+    assert.match(answer, /^Status: 413\b/m, length);
+  }
+});
+
 test('a value over the limit is refused', async () => {
   for (const path of clientPaths) {
     assertRefused(

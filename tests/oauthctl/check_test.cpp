@@ -114,6 +114,11 @@ TEST_F(CheckTest, FindsEachDifferentDefinition) {
   }
 }
 
+TEST_F(CheckTest, DecryptsNoColumnThatSomebodyAdded) {
+  execute("ALTER TABLE oauth_token ADD COLUMN client_secret TEXT DEFAULT 'plain'");
+  EXPECT_THAT(findings(), ElementsAre(StartsWith("table oauth_token is defined differently")));
+}
+
 TEST_F(CheckTest, FindsUnknownObjects) {
   execute("CREATE TRIGGER spy AFTER INSERT ON oauth_token BEGIN SELECT 1; END");
   execute("CREATE TABLE extra(a)");

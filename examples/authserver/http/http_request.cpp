@@ -9,7 +9,6 @@
 #include <set>
 
 #include "control_characters.h"
-#include "decimal_text.h"
 #include "joined.h"
 #include "refusal.h"
 
@@ -18,7 +17,7 @@ namespace {
 
 constexpr std::size_t kLongestName = 64, kLongestValue = 4096;  // bytes
 constexpr std::size_t kMostParameters = 100;
-constexpr std::int64_t kLargestBody = 65536;  // bytes
+constexpr std::size_t kLargestBody = 65536;  // bytes
 constexpr char kForm[] = "application/x-www-form-urlencoded";
 
 std::string variable(const char* name) {
@@ -33,8 +32,8 @@ void checkBody() {
   std::transform(type.begin(), type.end(), type.begin(),
                  [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
   if (type != kForm) throw invalidRequest(std::string("The body must be of type ") + kForm + ".");
-  const std::int64_t length = fromDecimal(variable("CONTENT_LENGTH"));
-  if (length < 0 || length > kLargestBody)
+  // The leading digits count: whatever follows them, a large number is refused before it is read.
+  if (std::strtoul(variable("CONTENT_LENGTH").c_str(), nullptr, 10) > kLargestBody)
     throw Refusal(413, "invalid_request", "The body is too large.");
   // The parser would mix them with those of the form, and log files show queries.
   if (!variable("QUERY_STRING").empty())

@@ -3,6 +3,7 @@
 #include <json/value.h>
 
 #include <map>
+#include <utility>
 
 #include "decimal_text.h"
 #include "oauth_db_basic.h"
@@ -172,11 +173,15 @@ Findings checkJournalMode(SqliteConnection& database) {
 }
 
 Findings checkCiphers(SqliteConnection& database, CipherCount& count) {
+  const std::pair<const char*, const char*> encryptedColumns[] = {
+      {table::kClientInfo, column::kClientId},
+      {table::kClientInfo, column::kClientSecret},
+      {table::kGrantCode, column::kClientId},
+      {table::kToken, column::kClientId}};
   Findings findings;
-  for (const char* const name : {table::kClientInfo, table::kGrantCode, table::kToken})
-    for (const char* const encrypted : names::kEncryptedColumns)
-      if (hasColumn(database, name, encrypted))
-        checkCipherColumn(database, name, encrypted, count, findings);
+  for (const auto& [name, encrypted] : encryptedColumns)
+    if (hasColumn(database, name, encrypted))
+      checkCipherColumn(database, name, encrypted, count, findings);
   return findings;
 }
 
