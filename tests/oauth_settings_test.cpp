@@ -53,7 +53,7 @@ std::string contentOf(const std::string& file) {
 
 // The rows below the heading that both pages have.
 std::vector<Row> rowsOf(const std::string& page) {
-  const std::regex row("\\| `([a-z_]+)` \\| ([^|]*) \\| ([^|]*) \\| ([^|]*) \\|");
+  const std::regex row(R"(\| `([a-z_]+)` \| ([^|]*) \| ([^|]*) \| ([^|]*) \|)");
   std::istringstream lines(contentOf(page));
   std::vector<Row> rows;
   std::smatch cells;
@@ -84,7 +84,7 @@ TEST(SettingsTableTest, HasEveryNameOfTheVocabulary) {
   for (std::sregex_iterator match(block.begin(), block.end(), constant), none; match != none;
        ++match)
     inVocabulary.push_back((*match)[1]);
-  for (const Setting& setting : kSettings) inTable.push_back(setting.name);
+  for (const Setting& setting : kSettings) inTable.emplace_back(setting.name);
   EXPECT_THAT(inVocabulary, Not(IsEmpty()));
   EXPECT_THAT(inVocabulary, testing::UnorderedElementsAreArray(inTable))
       << "kSettings in src/utils/oauth_settings.h needs a row for each name in src/oauth_names.h";
