@@ -13,9 +13,11 @@
 
 #include "oauthctl_test.h"
 
+using testing::Each;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::Not;
+using testing::SizeIs;
 using testing::StartsWith;
 using namespace ZEVOOAUTHSERVER;
 
@@ -208,9 +210,12 @@ TEST_F(IssuingTest, RestoreLosesNothing) {
   Lines found;
   for (int n = 0; n < 10; ++n) EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
   stop();
+  // A killed issuer may leave a journal that a reader cannot roll back.
+  execute("BEGIN IMMEDIATE; ROLLBACK");
   for (const std::string& name : fileNames()) {
-    if (name.rfind("oauth.db", 0) != 0) continue;
+    if (name.rfind("oauth.db", 0) != 0 || name == "oauth.db-journal") continue;
     const Lines tokens = tokensIn(path(name));
+    EXPECT_THAT(tokens, Each(SizeIs(64))) << name;
     found.insert(found.end(), tokens.begin(), tokens.end());
   }
   expectAll(acknowledged(), found);
