@@ -11,8 +11,8 @@
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
-case ${1-} in
-  '' | --record) mode=${1-} ;;
+case $#:${1-} in
+  0: | 1:--record) mode=${1-} ;;
   *)
     echo "usage: scripts/abi.sh [--record]" >&2
     exit 2

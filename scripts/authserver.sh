@@ -12,7 +12,7 @@ port=8080
 if [ $# -eq 2 ] && [ "$1" = --port ] && [[ $2 =~ ^[0-9]+$ ]]; then
   port=$2
 elif [ $# -ne 0 ]; then
-  echo "authserver: usage: scripts/authserver.sh [--port N]" >&2
+  echo "usage: scripts/authserver.sh [--port N]" >&2
   exit 2
 fi
 

@@ -187,11 +187,11 @@ refresh() {
   cp "$work/note" "$note"
 }
 
-mode=${1:-all}
-case $mode in
-  all | --instructions | --record) ;;
+case $#:${1-} in
+  0:) mode=all ;;
+  1:--instructions | 1:--record) mode=$1 ;;
   *)
-    echo "bench: no such option: $mode" >&2
+    echo "usage: scripts/bench.sh [--instructions | --record]" >&2
     exit 2
     ;;
 esac

@@ -3,12 +3,16 @@
 #
 #   scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]
 #
-# FOLDER is a name below build/ (but see scripts/lib/build-folder.sh). The last line tells where it is.
-# A release that is not hardened is an error.
+# FOLDER is a name below build/, or another folder (scripts/lib/build-folder.sh). The last line
+# tells where it is. A release that is not hardened is an error.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
-preset=${1:?usage: scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]}
+if [ $# -lt 2 ] || [[ $1 == -* || $2 == -* ]]; then
+  echo "usage: scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]" >&2
+  exit 2
+fi
+preset=$1
 folder=$(scripts/lib/build-folder.sh "$2")
 shift 2
 options=()

@@ -32,7 +32,7 @@ fi
 trap '[ $? -eq 0 ] || echo "check: failed" >&2' EXIT
 scripts/packages.sh build test check authserver
 
-# The files to look at, NUL between them: those that match a pattern of find -regex.
+# The files to look at.
 if [ -n "$mode" ]; then
   base=HEAD
   [ "$(git branch --show-current)" = main ] || base=$(git merge-base main HEAD)
@@ -77,8 +77,10 @@ fi
 programs=$(scripts/build.sh dev dev | tail -n 1)/tests
 folder=$(scripts/build.sh coverage coverage -- zevooauth | tail -n 1)
 find "$folder" -name '*.gcda' -delete
-printf '%s\n' "$programs"/*_test | LD_LIBRARY_PATH=$folder xargs --max-procs=1 --replace \
-  "${user[@]}" {} --gtest_shuffle --gtest_brief=1 | grep -v '^Running main'
+for program in "$programs"/*_test; do
+  LD_LIBRARY_PATH=$folder "${user[@]}" "$program" --gtest_shuffle --gtest_brief=1 |
+    grep -v '^Running main'
+done
 echo "check: tests pass in any order, in one process, for an ordinary user"
 # What a throw could do after every call is not a branch that anybody wrote.
 gcovr --root . --filter src/ --exclude-throw-branches --exclude-unreachable-branches \

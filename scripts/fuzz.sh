@@ -8,7 +8,7 @@
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
-if ! [[ ${1:-} =~ ^[1-9][0-9]*$ ]]; then
+if [ $# -ne 1 ] || ! [[ $1 =~ ^[1-9][0-9]*$ ]]; then
   echo "usage: scripts/fuzz.sh SECONDS" >&2
   exit 2
 fi

@@ -162,8 +162,14 @@ expect 0 "id +1
 client_id +$secret
 client_secret +$secret" $oauthctl client add --name 'Photo album' \
   --redirect-uri https://album.example/callback --scope 'read write'
-expect 0 'ID .*Photo album.*album.example/callback.*read write' $oauthctl client list
-expect 0 'TABLE .*clients +1 .*codes +0 .*tokens +0 .*log +1 .*schema versions oauth_clientInfo 2, oauth_grantCode 2, oauth_token 2' $oauthctl status
+expect 0 'ID NAME        ENABLED REDIRECT URI           SCOPE
+ 1 Photo album yes     album.example/callback read write' $oauthctl client list
+expect 0 'TABLE   ROWS CEILING USED EXPIRED SOONEST EXPIRY LATEST EXPIRY
+clients    1    1000  0 %       - -              -
+codes      0    1000  0 %       0 -              -
+tokens     0    1000  0 %       0 -              -
+log        1    1000  0 %       - -              -
+.*schema versions oauth_clientInfo 2, oauth_grantCode 2, oauth_token 2' $oauthctl status
 expect 0 "sound: $data/oauth.db" $oauthctl check
 expect 1 'oauthctl: not valid: no such access token' $oauthctl token verify < <(printf '0%.0s' {1..64})
 expect 0 'wrote /backup.db: 1 client, 0 codes, 0 tokens, 1 log line' $oauthctl backup /backup.db

@@ -22,12 +22,22 @@ declare -A groups=(
   [drawings]="mscgen"
 )
 
-# Some packages bring what is another's by its name, such as newer ones of nodejs npm.
+if [ $# -eq 0 ]; then
+  echo "usage: scripts/packages.sh GROUP..." >&2
+  exit 2
+fi
+for group in "$@"; do
+  if [ -z "${groups[$group]-}" ]; then
+    echo "packages: there is no group $group" >&2
+    exit 2
+  fi
+done
+# A package may provide another one: a newer nodejs provides npm.
 there=$(dpkg-query --show --showformat='${db:Status-Status}, ${Package}, ${Provides}\n' |
   sed -n 's/^installed, //p' | tr ',' '\n' | sed 's/(.*//; s/ //g')
 missing=()
 for group in "$@"; do
-  for package in ${groups[$group]:?"packages: no group $group"}; do
+  for package in ${groups[$group]}; do
     grep -qxF "$package" <<<"$there" || missing+=("$package")
   done
 done
@@ -37,7 +47,7 @@ if [ ${#missing[@]} -eq 0 ]; then
   exit 0
 fi
 if [ "$(id -u)" -ne 0 ]; then
-  echo "packages: as root, please: apt-get install --no-install-recommends ${missing[*]}" >&2
+  echo "packages: run this as root: apt-get install --no-install-recommends ${missing[*]}" >&2
   exit 1
 fi
 echo "packages: installing ${missing[*]}"

@@ -14,12 +14,12 @@ cd "$(dirname "$(readlink -f "$0")")/.."
 
 preset=release folder=release
 screenshots=
-while [[ ${1-} == --* ]]; do
+while [[ ${1-} == -* ]]; do
   case $1 in
     --screenshots) screenshots=$PWD/docs ;;
     --sanitizers) preset=asan folder=authserver-asan ;;
     *)
-      echo "test-authserver: usage: scripts/test-authserver.sh [--screenshots] [--sanitizers] [NAME...]" >&2
+      echo "usage: scripts/test-authserver.sh [--screenshots] [--sanitizers] [NAME...]" >&2
       exit 2
       ;;
   esac

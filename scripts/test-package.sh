@@ -8,7 +8,7 @@ cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/test-package.sh" >&2 && exit 2; }
 
 if [ "$(id -u)" -ne 0 ]; then
-  echo "test-package: as root, please: it makes systems of their own" >&2
+  echo "test-package: run this as root: it makes bare systems" >&2
   exit 1
 fi
 if ! unshare --mount --pid --fork --mount-proc true; then

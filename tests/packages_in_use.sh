@@ -45,8 +45,8 @@ umask 077
 client=$(oauthctl client add --name 'Photo album' --redirect-uri https://album.example/callback \
   --scope 'read write')
 [[ $client =~ client_id\ +([0-9a-f]{64}) ]] || fail "no client: $client"
-listed=$(oauthctl client list)
-[[ $listed =~ Photo\ album.*album.example/callback.*read\ write ]] || fail "client list: $listed"
+expect 0 $'ID NAME        ENABLED REDIRECT URI           SCOPE\n'\
+' 1 Photo album yes     album.example/callback read write' oauthctl client list
 
 # A programmer compiles against the library, and the program issues a token.
 install "./libzevooauth-dev_${version}"_*.deb g++ cmake ninja-build

@@ -9,8 +9,8 @@
 namespace authserver {
 namespace {
 
-constexpr std::size_t kLongestList =
-    1024;  // bytes; must fit into the column "state" behind a digest
+// Bytes. A list must fit into the column "state" behind a digest.
+constexpr std::size_t kLongestList = 1024;
 
 bool isScopeCharacter(char c) { return c == '!' || (c >= '#' && c <= '~' && c != '\\'); }
 
