@@ -1,5 +1,6 @@
-# A built program finds its libraries in the build's folders. An installed one has no run path. CMake would end a run path that it changes on installing with an
-# empty entry, which the loader reads as the current folder, where anybody may have put a library.
+# A built program finds its libraries in the build's folders. An installed one has no run path. A run
+# path that CMake changes on installing would end with an empty entry. The loader reads that as the
+# current folder, where anybody may have put a library.
 
 function(set_run_path target)  # FOLDER...
   set(folders ${ARGN})

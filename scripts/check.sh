@@ -59,7 +59,8 @@ echo "check: ${#scripts[@]} shell scripts are sound"
 # Only configured: clang-tidy needs the compiler's commands, and no compiled files. The fuzz targets
 # and the benchmark are builds of their own, without commands in this one.
 folder=$(scripts/lib/build-folder.sh tidy)
-cmake --preset dev -B "$folder" -DZEVOOAUTH_BUILD_AUTHSERVER=ON >/dev/null
+cmake --preset dev -B "$folder" -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
+  -DCMAKE_DISABLE_PRECOMPILE_HEADERS=ON >/dev/null # each source must include what it needs
 mapfile -t units < <(for source in "${sources[@]}"; do
   [ ! -e "${source%.*}.cpp" ] || echo "${source%.*}.cpp"
 done | sort -u | grep -vE '^(tests/fuzz|bench)/')
@@ -74,14 +75,11 @@ if [ -n "$mode" ]; then
 fi
 
 # The tests of the plain build, with the library that counts its branches in place of the plain one.
-programs=$(scripts/build.sh dev dev | tail -n 1)/tests
+tests=$(scripts/build.sh dev dev | tail -n 1)
 folder=$(scripts/build.sh coverage coverage -- zevooauth | tail -n 1)
 find "$folder" -name '*.gcda' -delete
-for program in "$programs"/*_test; do
-  LD_LIBRARY_PATH=$folder "${user[@]}" "$program" --gtest_shuffle --gtest_brief=1 |
-    grep -v '^Running main'
-done
-echo "check: tests pass in any order, in one process, for an ordinary user"
+LD_LIBRARY_PATH=$folder scripts/lib/run-test-programs.sh "$tests" "${user[@]}"
+echo "check: tests pass in any order, in a few processes, for an ordinary user"
 # What a throw could do after every call is not a branch that anybody wrote.
 gcovr --root . --filter src/ --exclude-throw-branches --exclude-unreachable-branches \
   --print-summary --fail-under-branch "$required_branches" "$folder/CMakeFiles/zevooauth.dir"

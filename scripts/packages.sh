@@ -52,8 +52,9 @@ if [ "$(id -u)" -ne 0 ]; then
 fi
 echo "packages: installing ${missing[*]}"
 export DEBIAN_FRONTEND=noninteractive
-if ! apt-get update -qq ||
-  ! apt-get install -qq --yes --no-install-recommends "${missing[@]}" >/dev/null; then
+install() { apt-get install -qq --yes --no-install-recommends "${missing[@]}" >/dev/null; }
+# The lists of packages may be old, or missing.
+if ! install 2>/dev/null && ! { apt-get update -qq && install; }; then
   echo "packages: could not install ${missing[*]}" >&2
   exit 1
 fi

@@ -6,18 +6,18 @@
 #
 # --screenshots renews those in docs/, --sanitizers builds the server with the address and
 # undefined-behaviour sanitizers, NAME runs tests/authserver/NAME.test.mjs only. Installs what is
-# missing (scripts/packages.sh, groups build, authserver and e2e, and what package-lock.json names,
+# missing (scripts/packages.sh, groups build, test, authserver and e2e, and what package-lock.json names,
 # below the build folder). Everything runs in a private /var (scripts/lib/private-var.sh) and
 # among processes of its own, which end with it.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
-preset=release folder=release
+preset=release options=(-DZEVOOAUTH_BUILD_TESTS=OFF)
 screenshots=
 while [[ ${1-} == -* ]]; do
   case $1 in
     --screenshots) screenshots=$PWD/docs ;;
-    --sanitizers) preset=asan folder=authserver-asan ;;
+    --sanitizers) preset=asan options=() ;; # shares the build of scripts/test.sh
     *)
       echo "usage: scripts/test-authserver.sh [--screenshots] [--sanitizers] [NAME...]" >&2
       exit 2
@@ -28,7 +28,7 @@ done
 
 # Asked first, as the modules come first: building takes minutes.
 scripts/lib/private-var.sh unshare --pid --fork --mount-proc true
-scripts/packages.sh build authserver e2e
+scripts/packages.sh build test authserver e2e
 
 # Modules are looked for beside the tests: these run where they lie, not in the source tree.
 tests=$(scripts/lib/build-folder.sh "authserver-tests-$preset")
@@ -47,8 +47,8 @@ if ! cmp --silent tests/authserver/package-lock.json "$tests/installed.json"; th
   cp tests/authserver/package-lock.json "$tests/installed.json"
   echo "test-authserver: installed the modules of tests/authserver/package-lock.json"
 fi
-build=$(scripts/build.sh "$preset" "$folder" -DZEVOOAUTH_BUILD_AUTHSERVER=ON \
-  -DZEVOOAUTH_BUILD_TESTS=OFF -- authserver oauthctl | tail -n 1)
+build=$(scripts/build.sh "$preset" "$preset" "${options[@]}" \
+  -DZEVOOAUTH_BUILD_AUTHSERVER=ON -- authserver oauthctl | tail -n 1)
 rm -f "$tests"/*.mjs
 cp tests/authserver/*.mjs "$tests"
 
@@ -59,15 +59,28 @@ export PATH=$PATH:/usr/sbin
 export AUTHSERVER_BUILD=$build AUTHSERVER_SOURCE=$PWD/examples/authserver
 export AUTHSERVER_SCREENSHOTS=${screenshots:-$tests/screenshots}
 mkdir -p "$AUTHSERVER_SCREENSHOTS"
-# One file at a time: the path of the database is the same for all of them.
-# shellcheck disable=SC2016 # expanded inside
-scripts/lib/private-var.sh unshare --pid --fork --kill-child --mount-proc bash -c '
-  export HOME=/var/tmp TMPDIR=/var/tmp
-  cd "$1" && shift && exec node --test --test-concurrency=1 --test-reporter=tap \
-    --test-reporter-destination=stdout --test-reporter=tap --test-reporter-destination=tests.tap \
-    "$@"' test-authserver "$tests" "${files[@]}" &
+rm -f "$tests"/*.tap
+export tests
+# Each file in a /var and among processes of its own, since the path of the database is fixed. As
+# many at once as there are cores, the longest ones first.
+run_file() { # FILE
+  # shellcheck disable=SC2016 # expanded inside
+  if ! scripts/lib/private-var.sh unshare --pid --fork --kill-child --mount-proc bash -c '
+    export HOME=/var/tmp TMPDIR=/var/tmp
+    cd "$tests" && exec node --test --test-reporter=tap "$1"' test-authserver "$1" \
+    >"$tests/$1.tap" 2>&1; then
+    cat "$tests/$1.tap"
+    return 1
+  fi
+  echo "test-authserver: $1 passed"
+}
+export -f run_file
+mapfile -t files < <(printf '%s\n' "${files[@]}" | awk '{ print !/^(browser|busy_database)/, $0 }' |
+  sort | cut -d ' ' -f 2)
+printf '%s\n' "${files[@]}" |
+  setsid xargs --max-procs="$(nproc)" --replace bash -euo pipefail -c 'run_file {}' &
 runner=$!
-trap 'kill -KILL "$runner" 2>/dev/null || true' EXIT # and with it all processes in there
+trap 'kill -KILL -- "-$runner" 2>/dev/null || true' EXIT # and with it all processes in there
 if ! wait "$runner"; then
   echo "test-authserver: failed" >&2
   exit 1
@@ -76,7 +89,7 @@ fi
 if [ $# -eq 0 ]; then
   # shellcheck disable=SC2016 # backticks of Markdown
   grep -oP '^\| .*\| `\K[^`]+(?=` \|$)' docs/authserver.md | sort -u >"$tests/named.txt"
-  sed -nE 's/^ *ok [0-9]+ - //p' "$tests/tests.tap" | sort -u >"$tests/passed.txt"
+  sed -nE 's/^ *ok [0-9]+ - //p' "$tests"/*.tap | sort -u >"$tests/passed.txt"
   unheld=$(comm -23 "$tests/named.txt" "$tests/passed.txt")
   if [ -n "$unheld" ]; then
     echo "test-authserver: docs/authserver.md names tests that did not pass: $unheld" >&2

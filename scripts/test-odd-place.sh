@@ -1,8 +1,8 @@
 #!/usr/bin/env bash
-# The quick tests, and the demo in a private /var, in the hardest place: in a copy of the checkout
-# below /var, in a home that is closed to others, at a path with a blank, entered through a symbolic
-# link. The slow tests and the sanitizers do not depend on the place. The copy, and what is built
-# from it, is removed in the end.
+# scripts/test.sh --plain, and the demo in a private /var, in the hardest place: in a copy of the
+# checkout below /var, in a home that is closed to others, at a path with a blank, entered through a
+# symbolic link. The sanitizers see the same in every place. The copy, and what is built from it, is
+# removed in the end.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/test-odd-place.sh" >&2 && exit 2; }
@@ -16,6 +16,7 @@ export HOME=$home
 unset XDG_CACHE_HOME
 
 cd "$home/link"
-scripts/test.sh --quick
-scripts/lib/private-var.sh "$(scripts/lib/build-folder.sh dev)/examples/lifecycle" | tail -n 1
+scripts/test.sh --plain
+demo=$(scripts/build.sh release release -DZEVOOAUTH_BUILD_TESTS=OFF -- lifecycle | tail -n 1)
+scripts/lib/private-var.sh "$demo/examples/lifecycle" | tail -n 1
 echo "test-odd-place: passed in $home"

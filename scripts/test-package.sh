@@ -76,18 +76,15 @@ for package in libzevooauth1 libzevooauth-dev oauthctl zevooauth-standins; do
 done
 echo "test-package: two builds of one commit are the same, byte for byte"
 
-later=$(date --rfc-email --date "$(sed -n 's/^ -- .*>  //p' debian/changelog | head -n 1) + 1 minute")
-cat - debian/changelog >"$folder/build/first/debian/changelog" <<END
-zevooauth ($version+next) bookworm; urgency=medium
-
-  * To upgrade to.
-
- -- zevooauth maintainers <maintainers@zevooauth.invalid>  $later
-
-END
-mv "$folder/build/first/build/packages" "$folder/build/packages"
-quietly within build /first/scripts/package.sh
-mv "$folder"/build/first/build/packages/*.deb "$folder/build/packages"
+# The next version is the same files under another number.
+mkdir "$folder/build/packages"
+for package in "$folder"/build/first/build/packages/*.deb; do
+  cp "$package" "$folder/build/packages"
+  dpkg-deb --raw-extract "$package" "$folder/build/next"
+  sed -i -E "/^(Version|Depends):/s/$version/$version+next/g" "$folder/build/next/DEBIAN/control"
+  dpkg-deb --build "$folder/build/next" "$folder/build/packages" >/dev/null
+  rm -r "$folder/build/next"
+done
 
 fresh use
 mkdir -p "$folder/use/packages/new"

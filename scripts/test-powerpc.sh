@@ -14,22 +14,9 @@ scripts/lib/powerpc-libraries.sh "$libraries"
 native=$(scripts/build.sh dev dev | tail -n 1)
 folder=$(scripts/build.sh powerpc powerpc -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
 
-# The emulator takes long to start, so the quick tests of a program share a few processes.
-run_shard() { # SHARD SHARDS PROGRAM SLOW
-  local log=$3.$1.log
-  GTEST_SHARD_INDEX=$1 GTEST_TOTAL_SHARDS=$2 timeout 1200 qemu-ppc -L /usr/powerpc-linux-gnu "$3" \
-    --gtest_brief=1 --gtest_filter="-$4" >"$log" 2>&1 || { cat "$log" && return 1; }
-}
-export -f run_shard
-slow=$(ctest --test-dir "$folder" --show-only --label-regex slow | sed -nE 's/^ +Test +#[0-9]+: //p' |
-  sed 's/ .*/*/' | paste -sd:)
-shards=$(nproc)
-for program in "$folder"/tests/*_test; do
-  for ((shard = 0; shard < shards; ++shard)); do
-    printf '%s\0' "$shard" "$shards" "$program" "$slow"
-  done
-done | xargs --null --max-procs="$shards" --max-args=4 bash -euo pipefail -c 'run_shard "$@"' run_shard
-ctest --test-dir "$folder" --output-on-failure --parallel "$(nproc)" --label-exclude rule
+# The emulator takes long to start, so all tests of a program share a few processes.
+scripts/lib/run-test-programs.sh "$folder" qemu-ppc -L /usr/powerpc-linux-gnu
+ctest --test-dir "$folder" --output-on-failure --parallel "$(nproc)" --label-exclude 'rule|slow'
 
 here="$native/tests/database_exchange"
 there="qemu-ppc -L /usr/powerpc-linux-gnu $folder/tests/database_exchange"

@@ -6,7 +6,6 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
-#include <regex>
 
 #include "json_text.h"
 #include "oauth_clientInfo.h"
@@ -30,9 +29,18 @@ const std::string kClient = times(64, 'w'), kSecret = times(64, 's'), kCode = ti
 const std::string kPast = "1600000000", kFuture = "1800000000";
 constexpr unsigned kUser = 1000, kGroup = 100;
 
-std::string masked(const std::string& text) {
-  static const std::regex random("[0-9a-f]{64}");
-  return std::regex_replace(text, random, "<random>");
+// By hand, because std::regex took 40 % of the instructions of these tests.
+std::string masked(std::string text) {
+  constexpr const char* kDigits = "0123456789abcdef";
+  std::size_t start = 0;
+  while ((start = text.find_first_of(kDigits, start)) != std::string::npos) {
+    const std::size_t end = std::min(text.find_first_not_of(kDigits, start), text.size());
+    if (end - start == 64)
+      text.replace(start, 64, "<random>");
+    else
+      start = end;
+  }
+  return text;
 }
 
 template <class Store, class Body>
@@ -215,8 +223,8 @@ int EveryOperationTest::failEverywhere(const std::function<void(int nth)>& arm,
     EXPECT_EQ(kGroup, ids_.group());
     const Lines logged = log_.lines();
     expectReported(outcome, logged);
-    expectAllOrNothing(outcome, logged);
-    EXPECT_THAT(query("PRAGMA integrity_check"), ElementsAre("ok"));
+    const Lines now = rows();
+    if (!valueLost(logged)) expectAllOrNothing(outcome, logged, now);
     if (!came || HasFailure()) return nth - 1;
   }
 }
@@ -239,9 +247,7 @@ void EveryOperationTest::expectReported(const std::optional<Outcome>& outcome,
 }
 
 void EveryOperationTest::expectAllOrNothing(const std::optional<Outcome>& outcome,
-                                            const Lines& logged) const {
-  if (valueLost(logged)) return;
-  const Lines now = rows();
+                                            const Lines& logged, const Lines& now) const {
   if (GetParam().inSteps && (!outcome || !logged.empty())) {
     Lines either, both;
     std::set_union(before_.begin(), before_.end(), after_.begin(), after_.end(),
@@ -266,6 +272,8 @@ void EveryOperationTest::restore() {
 
 Lines EveryOperationTest::rows() const {
   { const OAUTHDBLog next("oauth_log"); }  // makes what a first construction left undone
+  if (!before_.empty() && databaseBytes() == prepared_) return before_;  // as after most faults
+  EXPECT_THAT(query("PRAGMA integrity_check"), ElementsAre("ok"));
   Lines rows = everyRow();
   for (std::string& row : rows) row = masked(row);
   std::sort(rows.begin(), rows.end());

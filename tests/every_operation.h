@@ -50,7 +50,8 @@ class EveryOperationTest : public StoreTest, public testing::WithParamInterface<
   void restore();
   Lines rows() const;
   void expectReported(const std::optional<Outcome>& outcome, const Lines& logged) const;
-  void expectAllOrNothing(const std::optional<Outcome>& outcome, const Lines& logged) const;
+  void expectAllOrNothing(const std::optional<Outcome>& outcome, const Lines& logged,
+                          const Lines& now) const;
 
   std::string prepared_;  // the database file; none for a first construction
   Outcome expected_;

@@ -91,25 +91,31 @@ build_util-linux() {
 mkdir -p "$prefix/include" "$prefix/lib" "$work"
 ln -sfn /usr/include/boost "$prefix/include/boost"
 ln -sfn /usr/include/CLI "$prefix/include/CLI"
+missing=()
 for package in sqlite3 libjsoncpp googletest nettle util-linux; do
   if [ ! -e "$prefix/$package.done" ]; then
-    echo "powerpc-libraries: building $package"
-    # Not in a condition: there the shell would go on after a step that failed.
-    set +e
-    (
-      set -e
-      fetch "$package"
-      build_$package
-    ) >"$work/$package.log" 2>&1
-    status=$?
-    set -e
-    if [ "$status" -ne 0 ]; then
-      tail -n 40 "$work/$package.log"
-      echo "powerpc-libraries: could not build $package" >&2
-      exit 1
-    fi
+    fetch "$package"
+    missing+=("$package")
+  fi
+done
+
+# All at once, because a configure script keeps one core busy only.
+builds=()
+for package in "${missing[@]}"; do
+  echo "powerpc-libraries: building $package"
+  (build_"$package") >"$work/$package.log" 2>&1 &
+  builds+=("$!")
+done
+for i in "${!builds[@]}"; do
+  package=${missing[i]}
+  if ! wait "${builds[i]}"; then
+    tail -n 40 "$work/$package.log"
+    echo "powerpc-libraries: could not build $package" >&2
+    failed=yes
+  else
     touch "$prefix/$package.done"
     rm -rf "${work:?}/$package"
   fi
 done
+[ -z "${failed-}" ] || exit 1
 echo "powerpc-libraries: $prefix is ready"

@@ -2,16 +2,11 @@
 
 #pragma once
 
-#include <boost/asio/ip/address.hpp>
 #include <string>
 
 namespace ZEVOOAUTHSERVER {
 
 // Why the text is not an IP address of version 4 or 6; empty if it is one, or if it is empty.
-inline std::string addressError(const std::string& ip) {
-  boost::system::error_code error;
-  boost::asio::ip::make_address(ip, error);
-  return ip.empty() || !error ? std::string() : error.message();
-}
+std::string addressError(const std::string& ip);
 
 }  // namespace ZEVOOAUTHSERVER

@@ -96,9 +96,9 @@ extern "C" void syslog(int priority, const char* format, ...) {
 }
 
 // With _FORTIFY_SOURCE the compiler calls this function instead.
-// NOLINTNEXTLINE(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): its name is given
-extern "C" [[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int, const char* format,
-                                                           ...) {
+extern "C" [[gnu::format(printf, 3, 4)]] void syslogChk(int priority, int, const char* format,
+                                                        ...) __asm__("__syslog_chk");
+extern "C" void syslogChk(int priority, int, const char* format, ...) {
   va_list arguments;
   va_start(arguments, format);
   record(priority, format, arguments);

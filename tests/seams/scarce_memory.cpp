@@ -10,8 +10,7 @@
 #include "own_work.h"
 
 // The malloc() of the C library.
-// NOLINTNEXTLINE(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): its name is given
-extern "C" void* __libc_malloc(std::size_t size);
+extern "C" void* libcMalloc(std::size_t size) __asm__("__libc_malloc");
 
 namespace {
 
@@ -70,7 +69,7 @@ void* request(std::size_t size) { return refusesCpp() ? nullptr : std::malloc(si
 }  // namespace
 #else
 extern "C" void* malloc(std::size_t size) noexcept {
-  return refusesCpp() ? nullptr : __libc_malloc(size);
+  return refusesCpp() ? nullptr : libcMalloc(size);
 }
 namespace {
 void* request(std::size_t size) { return std::malloc(size); }
