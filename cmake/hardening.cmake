@@ -1,5 +1,5 @@
-# What every release build is hardened with. Other builds are for finding mistakes: sanitizers look
-# at more, and do not see through what _FORTIFY_SOURCE puts in the place of the C library's calls.
+# Hardens every release build. Other builds are for finding mistakes. Sanitizers check more than
+# hardening does, and do not know the functions by which _FORTIFY_SOURCE replaces the C library's.
 
 include(CheckCXXCompilerFlag)
 
@@ -8,7 +8,7 @@ if(CMAKE_CXX_FLAGS MATCHES "-fsanitize=")
 endif()
 
 set(hardening -fstack-protector-strong -U_FORTIFY_SOURCE -D_FORTIFY_SOURCE=2)
-foreach(protection stack-clash cf)  # where the target has them: PowerPC has no -fcf-protection
+foreach(protection stack-clash cf)  # only if the target has it: PowerPC has no -fcf-protection
   string(MAKE_C_IDENTIFIER HAS_${protection}_protection has)
   set(flag -f${protection}-protection)
   check_cxx_compiler_flag(${flag} ${has})

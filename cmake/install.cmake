@@ -1,5 +1,5 @@
-# What cmake --install puts where. The stand-ins for the host's libraries are for development
-# machines only: cmake --install BUILD --component standins
+# Says where cmake --install puts each file. The stand-ins for the host's libraries are for
+# development machines only. This installs them: cmake --install BUILD --component standins
 
 include(CMakePackageConfigHelpers)
 include(GNUInstallDirs)
@@ -24,14 +24,15 @@ install(FILES
   ${PROJECT_BINARY_DIR}/ZevoOAuthConfig.cmake ${PROJECT_BINARY_DIR}/ZevoOAuthConfigVersion.cmake
   DESTINATION ${config_folder} COMPONENT development)
 
-# Relative to the file itself, so that the tree may be put anywhere, also by --prefix.
+# The prefix is relative to zevooauth.pc, so that the tree may lie anywhere, also with --prefix.
 file(RELATIVE_PATH prefix_from_pkgconfig /${pkgconfig_folder} /)
 string(REGEX REPLACE "/$" "" prefix_from_pkgconfig ${prefix_from_pkgconfig})
 configure_file(cmake/zevooauth.pc.in zevooauth.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/zevooauth.pc
   DESTINATION ${pkgconfig_folder} COMPONENT development)
 
-# Without what belongs to the checkout: the example server, how fast it is, its front pages.
+# Some files belong to the checkout and are not installed: the example server and its page, the page
+# about performance, and the front pages of the documents.
 install(DIRECTORY docs examples DESTINATION ${CMAKE_INSTALL_DOCDIR} COMPONENT documentation
   FILES_MATCHING PATTERN *.md PATTERN *.svg PATTERN lifecycle.cpp PATTERN authserver* EXCLUDE
   PATTERN performance.* EXCLUDE PATTERN overview.svg EXCLUDE PATTERN mainpage.md EXCLUDE)

@@ -1,4 +1,4 @@
-# Cross-compiles for 32-bit big-endian PowerPC Linux and runs what was built under emulation.
+# Cross-compiles for 32-bit big-endian PowerPC Linux and runs the built programs under emulation.
 # The target's libraries are those of scripts/lib/powerpc-libraries.sh.
 
 set(CMAKE_SYSTEM_NAME Linux)
@@ -10,7 +10,7 @@ set(POWERPC_LIBRARIES ${CMAKE_CURRENT_LIST_DIR}/../build/powerpc-libraries
   CACHE PATH "Where the target's libraries are")
 list(APPEND CMAKE_TRY_COMPILE_PLATFORM_VARIABLES POWERPC_LIBRARIES)
 
-# Nothing of this machine's own may be found.
+# CMake must not find libraries of this machine.
 get_filename_component(CMAKE_FIND_ROOT_PATH ${POWERPC_LIBRARIES} ABSOLUTE)
 set(CMAKE_FIND_ROOT_PATH_MODE_PROGRAM NEVER)
 set(CMAKE_FIND_ROOT_PATH_MODE_LIBRARY ONLY)

@@ -1,6 +1,6 @@
-# A built program finds its libraries in the build's folders. An installed one has no run path. A run
-# path that CMake changes on installing would end with an empty entry. The loader reads that as the
-# current folder, where anybody may have put a library.
+# A built program finds its libraries in the build's folders. An installed one has no run path. A
+# run path that CMake changes on installing would end with an empty entry. The loader reads that as
+# the current folder, where anybody may have put a library.
 
 function(set_run_path target)  # FOLDER...
   set(folders ${ARGN})
@@ -11,7 +11,7 @@ function(set_run_path target)  # FOLDER...
     BUILD_WITH_INSTALL_RPATH ON INSTALL_RPATH "${folders}")
 endfunction()
 
-# After install(TARGETS), for the same folder and component.
+# Call this after install(TARGETS), with the same folder and component.
 function(install_without_run_path target folder)  # COMPONENT...
   set(installed "\$ENV{DESTDIR}\${CMAKE_INSTALL_PREFIX}/${folder}/$<TARGET_FILE_NAME:${target}>")
   install(CODE "file(RPATH_REMOVE FILE \"${installed}\")" COMPONENT ${ARGN})

@@ -1,4 +1,5 @@
-# Times past January 2038 where the C library offers them: a 32-bit time_t is made one of 64 bits.
+# Makes a 32-bit time_t one of 64 bits if the C library offers that, so that times past January 2038
+# are possible.
 
 include(CheckCXXSourceCompiles)
 
@@ -16,5 +17,5 @@ if(TIME_BITS_GIVES_64_BITS)
   message(STATUS "time_t has 64 bits, by _TIME_BITS=64")
   target_compile_definitions(zevooauth_flags INTERFACE _TIME_BITS=64)
 else()
-  message(WARNING "time_t has 32 bits: no time past January 2038")
+  message(WARNING "time_t has 32 bits: times past January 2038 are not possible")
 endif()

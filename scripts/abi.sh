@@ -1,13 +1,13 @@
 #!/usr/bin/env bash
 # Compares the library's binary interface with the baselines in abi/, for this machine and for
-# PowerPC. A function that was added passes with a note. Anything else fails: programs compiled
-# earlier might not work any more.
+# PowerPC. An added function passes with a note. Any other difference fails, because programs
+# compiled earlier might no longer work.
 #
 #   scripts/abi.sh            compares
-#   scripts/abi.sh --record   makes the baselines from what is built now
+#   scripts/abi.sh --record   makes the baselines from the current sources
 #
-# Installs what is missing (scripts/packages.sh, groups build, powerpc and abi) and keeps what it
-# builds for the target (scripts/lib/powerpc-libraries.sh).
+# Installs what is missing (scripts/packages.sh, groups build, powerpc and abi), and keeps the
+# libraries that it builds for the target (scripts/lib/powerpc-libraries.sh).
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -25,9 +25,10 @@ scripts/lib/powerpc-libraries.sh "$libraries"
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 
-# FILE PRESET [OPTION...]: the interface of a release, as its debug information tells. Types that
-# include/ does not define are known by their names only, so that an update of theirs changes
-# nothing here; abidw would keep those of /usr/include, so the preset gives that another name.
+# FILE PRESET [OPTION...]: writes the interface of a release to FILE, from its debug information.
+# Types that include/ does not define appear by name only, so that an update of another library does
+# not change the description. abidw would keep the types of /usr/include, so the preset gives that
+# folder another name in the debug information.
 describe() {
   local folder
   folder=$(scripts/build.sh "$2" "$2" "${@:3}" -DZEVOOAUTH_BUILD_TESTS=OFF -- zevooauth |
@@ -40,29 +41,29 @@ describe() {
     exit 1
   fi
   if ! grep -q "<class-decl name='OAUTHDBBasic' size-in-bits='[1-9]" "$1"; then
-    echo "abi: the description knows nothing of the classes" >&2
+    echo "abi: the description does not contain the classes" >&2
     exit 1
   fi
 }
 
-# BASELINE FILE: fails, with a report, unless programs made for the one work with the other.
+# BASELINE FILE: fails with a report unless programs built for BASELINE work with FILE.
 compare() {
   local added=0
   if [ ! -e "$1" ]; then
     echo "abi: there is no $1, scripts/abi.sh --record makes it" >&2
     return 1
   fi
-  # First without what was added: any difference left is one too many.
+  # Ignore added functions first: any other difference is an error.
   if ! abidiff --no-added-syms "$1" "$2" >"$work/report"; then
     cat "$work/report"
     return 1
   fi
   abidiff "$1" "$2" >"$work/report" || added=$?
   case $added in
-    0) echo "abi: as in $1" ;;
+    0) echo "abi: the interface is the same as in $1" ;;
     4)
       cat "$work/report"
-      echo "abi: compatible with $1, but more; make it the baseline: scripts/abi.sh --record"
+      echo "abi: the interface has all of $1 and more; scripts/abi.sh --record makes it the baseline"
       ;;
     *)
       cat "$work/report"

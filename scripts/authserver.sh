@@ -1,10 +1,10 @@
 #!/usr/bin/env bash
 # Starts the example authorization server on this machine, with a user and a client to try it with.
 #
-#   scripts/authserver.sh [--port N]     8080 unless another port is given
+#   scripts/authserver.sh [--port N]     uses port 8080 if no other is given
 #
-# Installs what is missing (scripts/packages.sh, groups build and authserver). All it makes lies in
-# a private /var (scripts/lib/private-var.sh): Ctrl-C ends it and removes everything.
+# Installs what is missing (scripts/packages.sh, groups build and authserver). The server's files
+# lie in a private /var (scripts/lib/private-var.sh). Ctrl-C ends the server and removes them.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -20,7 +20,7 @@ answers() { (: <"/dev/tcp/127.0.0.1/$port") 2>/dev/null; }
 
 need_free_port() {
   if answers; then
-    echo "authserver: something else uses port $port" >&2
+    echo "authserver: another program uses port $port" >&2
     exit 1
   fi
 }
@@ -55,17 +55,17 @@ serve() {
 
   cat <<TEXT
 
-Open in a browser, and log in as alice with the password $password :
+Open this address in a browser, and log in as alice with the password $password :
 
   $AUTHSERVER_ISSUER/authorize?response_type=code&client_id=$id&redirect_uri=${callback//\//%2F}&state=anything&code_challenge=$challenge&code_challenge_method=S256
 
-Take the code out of the address that you end up at, and trade it for tokens:
+Take the code from the address that the browser shows then, and exchange it for tokens:
 
   curl -u $id:$secret -d grant_type=authorization_code \\
     -d redirect_uri=$callback -d code_verifier=$verifier \\
     -d code=CODE $AUTHSERVER_ISSUER/token
 
-Then look at what the access token opens, and get the next one:
+Then read the user's data with the access token, inspect the token, and get the next one:
 
   curl -H 'Authorization: Bearer ACCESS_TOKEN' $AUTHSERVER_ISSUER/userinfo
   curl -u $id:$secret -d token=ACCESS_TOKEN $AUTHSERVER_ISSUER/introspect
@@ -74,17 +74,18 @@ Then look at what the access token opens, and get the next one:
 
 authserver: running on $AUTHSERVER_ISSUER until Ctrl-C
 TEXT
-  while kill -0 "$server" 2>/dev/null; do wait "$server" || true; done # a signal ends the first wait
-  echo "authserver: ended, nothing is left of it"
+  while kill -0 "$server" 2>/dev/null; do wait "$server" || true; done # a signal ends a wait
+  echo "authserver: the server has ended, and its files are removed"
 }
 
-if [ "${AUTHSERVER_FOLDER-}" = /var/authserver ]; then # inside, see below
+# The last command of this script runs it again in the private /var, with this variable set.
+if [ "${AUTHSERVER_FOLDER-}" = /var/authserver ]; then
   port=$AUTHSERVER_PORT
   serve
   exit
 fi
 
-# Asked first: building takes a minute.
+# Check this first, because building takes a minute.
 if [ "$port" -gt 65535 ] || [ "$port" -lt "$([ "$(id -u)" -eq 0 ] && echo 1 || echo 1024)" ]; then
   echo "authserver: you cannot use port $port" >&2
   exit 1

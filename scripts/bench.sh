@@ -1,13 +1,14 @@
 #!/usr/bin/env bash
-# Measures every operation of the library beside the same work by hand (bench/).
+# Measures every operation of the library, and the same work written by hand, the floor (bench/).
 #
-#   scripts/bench.sh                  instructions, times and footprint into docs/performance.md
-#   scripts/bench.sh --instructions   instructions only: fails where an operation's ratio to its
-#                                     floor is more than 5 % above bench/recorded_ratios.txt
-#   scripts/bench.sh --record         instructions only: records their ratios in that file
+#   scripts/bench.sh                  writes instructions, times and footprint into
+#                                     docs/performance.md
+#   scripts/bench.sh --instructions   counts instructions only; fails if the ratio of an operation
+#                                     to its floor is more than 5 % above bench/recorded_ratios.txt
+#   scripts/bench.sh --record         counts instructions only; records the ratios in that file
 #
-# Installs what is missing (scripts/packages.sh, groups build and bench). Works on a database of its
-# own in /var/tmp.
+# Installs what is missing (scripts/packages.sh, groups build and bench). Works on its own database
+# in /var/tmp.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -15,18 +16,19 @@ recorded=bench/recorded_ratios.txt
 note=docs/performance.md
 plot=docs/performance.svg
 
-# Keeps string functions to what every x86-64 processor has, so that counts agree between machines.
+# String functions use only what every x86-64 processor has, so that all machines count the same.
 plain_processor=glibc.cpu.hwcaps=-AVX,-AVX2,-AVX_Fast_Unaligned_Load,-BMI2,-ERMS,-MOVBE
 plain_processor+=,-SSSE3,-SSE4_1,-SSE4_2
 
-# MODE FILE: the counts of "bench MODE" as lines of "<operation>|<library>|<floor>|<prepared>".
+# MODE FILE: writes the counts of "bench MODE" to FILE, as lines of
+# "<operation>|<library>|<floor>|<prepared>".
 count_instructions() {
   local dumps
   dumps=$(mktemp -d -p "$work")
   GLIBC_TUNABLES=$plain_processor valgrind -q --tool=callgrind --instr-atstart=no \
     --collect-atstart=no --combine-dumps=yes --callgrind-out-file="$dumps/%p" \
     "$folder/bench/bench" "$1" >"$work/order"
-  # Not "summary:", which is right only for a process's first dump.
+  # Read "totals:", because "summary:" is right only in the first dump of a process.
   cat "$dumps"/* | awk -v order="$work/order" '
     /^desc: Trigger: Client Request: / { sub(/^.*Request: /, ""); split($0, label, "/") }
     /^totals: / && label[1] != "" { count[label[1], label[2]] = $2 / label[3]; label[1] = "" }
@@ -37,7 +39,7 @@ count_instructions() {
     }' >"$2"
 }
 
-# The ratios as counted, beside what is to be reached.
+# Writes the counted ratios to the file, and keeps its comments and the ratios to reach.
 record() {
   awk -F' *[|] *' -v OFS='|' '
     FNR == NR && /^#/ { print; next }
@@ -64,13 +66,13 @@ compare() {
       for (name in recorded) { print "bench: " name ": recorded, but not measured"; failed = 1 }
       exit failed
     }' "$recorded" "$work/instructions" || {
-    echo "bench: FAILED: a ratio may grow by 5 % over $recorded (scripts/bench.sh --record)" >&2
+    echo "bench: FAILED: a ratio may be at most 5 % above $recorded (scripts/bench.sh --record)" >&2
     exit 1
   }
   echo "bench: no ratio has grown by more than 5 %"
 }
 
-# What every table is printed with: grouped() puts blanks between thousands.
+# Every table is printed with these functions. grouped() puts blanks between thousands.
 awk_functions='
   function grouped(number, text) {
     text = sprintf("%.0f", number)
@@ -125,7 +127,7 @@ held_table() {
     }' "$work/times" "$work/instructions"
 }
 
-# From the smallest size to the largest of each operation.
+# Prints how the instructions of each operation grow from its smallest size to its largest.
 slope_table() {
   echo '| instructions for one row more | library | floor |'
   echo '|---|--:|--:|'
@@ -173,7 +175,7 @@ draw() {
   gnuplot -e "data='$work/sizes.tsv'; out='$plot'" bench/plot.gp
 }
 
-# Replaces what stands between the marks.
+# Replaces the text between the two marks of the page.
 refresh() {
   {
     sed '/^<!-- measured -->$/q' "$note"

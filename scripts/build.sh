@@ -1,10 +1,11 @@
 #!/usr/bin/env bash
-# Configures and builds one preset, all of it or the targets named.
+# Configures a preset, and builds all of it or the named targets.
 #
 #   scripts/build.sh PRESET FOLDER [CMAKE OPTION...] [-- TARGET...]
 #
-# FOLDER is a name below build/, or another folder (scripts/lib/build-folder.sh). The last line
-# tells where it is. A release that is not hardened is an error.
+# FOLDER is the name of a folder below build/, or below another folder if build/ cannot be used
+# (scripts/lib/build-folder.sh). The last line of the output is its path. A release that is not
+# hardened is an error.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 

@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
-# Builds the library and tells the story of examples/lifecycle.cpp on the real database file.
-# Installs what is missing (scripts/packages.sh, group build). Makes the database's folder if there
-# is none, and the database and the key of the encryption stand-in in it; rows it makes are removed.
+# Builds the library and runs examples/lifecycle.cpp on the real database file.
+# Installs what is missing (scripts/packages.sh, group build). Makes the database's folder, the
+# database and the key of the encryption stand-in if they are missing. Removes the rows it adds.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/demo.sh" >&2 && exit 2; }
@@ -9,11 +9,11 @@ cd "$(dirname "$(readlink -f "$0")")/.."
 data=/var/packages/Keyloft/target/etc
 
 if ! mkdir -p "$data" 2>/dev/null || [ ! -w "$data" ]; then
-  echo "demo: cannot write to $data: run it as root, or as the owner of that folder" >&2
+  echo "demo: cannot write to $data: run this script as root, or as the owner of that folder" >&2
   exit 1
 fi
-if [ ! -O "$data" ]; then # what root makes there would be closed to the folder's owner
-  echo "demo: $data belongs to somebody else: run it as that user" >&2
+if [ ! -O "$data" ]; then # the folder's owner could not open the files that root makes
+  echo "demo: $data belongs to another user: run this script as that user" >&2
   exit 1
 fi
 scripts/packages.sh build

@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
 # Builds the API reference: the public headers, docs/reference and the operator's pages as HTML.
-# An undocumented member, a broken reference and a link that leads nowhere are errors.
-# Installs what is missing (scripts/packages.sh, group docs). The last line tells where it is.
+# An undocumented member, a broken reference and a link to a missing page are errors.
+# Installs what is missing (scripts/packages.sh, group docs). The last line of the output tells
+# where the first page is.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/docs.sh" >&2 && exit 2; }
@@ -9,7 +10,7 @@ cd "$(dirname "$(readlink -f "$0")")/.."
 scripts/packages.sh docs
 folder=$(scripts/lib/build-folder.sh reference)
 rm -rf "${folder:?}"/*
-# Elsewhere, since doxygen cannot follow a link in a path with a blank.
+# Work in another folder, because doxygen cannot follow a link in a path with a blank.
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 cp -r include docs "$work"
@@ -22,7 +23,7 @@ cd "$work"
 dead=$(cd "$folder" && grep -oE '<a [^>]*href="[^"#:]+["#]' ./*.html |
   sed -E 's/^([^:]*):.*href="(.*)["#]$/\1 \2/' | sort -u |
   while read -r page target; do
-    [ -e "$target" ] || echo "docs: $page links to $target, which is not there"
+    [ -e "$target" ] || echo "docs: $page links to $target, which does not exist"
   done)
 if [ -n "$dead" ]; then
   echo "$dead" >&2

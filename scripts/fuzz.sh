@@ -1,10 +1,10 @@
 #!/usr/bin/env bash
-# Feeds hostile input to the library: every target of tests/fuzz, each for so many seconds.
+# Feeds hostile input to the library: runs every target of tests/fuzz for SECONDS seconds.
 #
 #   scripts/fuzz.sh SECONDS
 #
-# Installs what is missing (scripts/packages.sh, groups build and fuzz). Starts from the inputs kept
-# in tests/fuzz/corpus and what earlier runs found worth keeping, which stays in the build folder.
+# Installs what is missing (scripts/packages.sh, groups build and fuzz). Starts from the inputs in
+# tests/fuzz/corpus, and from those that earlier runs kept in the build folder.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -18,12 +18,12 @@ scripts/packages.sh build fuzz
 folder=$(scripts/build.sh fuzz fuzz | tail -n 1)/tests/fuzz
 export folder
 
-# Settings and databases are files: in memory where the machine offers that.
+# Settings and databases are files. Keep them in memory if possible.
 TMPDIR=$(mktemp -d -p /dev/shm 2>/dev/null || mktemp -d)
 trap 'rm -rf "$TMPDIR"' EXIT
 export TMPDIR
-# Freed memory is kept from use as far as a processor's cache goes. The stacks of allocations would
-# fill the memory; to see them, reproduce a finding.
+# Hold back only as much freed memory as fits into a processor's cache. Keep one frame for each
+# allocation, because whole stacks would fill the memory. Reproduce a finding to see whole stacks.
 export ASAN_OPTIONS=quarantine_size_mb=16:malloc_context_size=1
 
 statistic() { # LOG NAME
@@ -32,7 +32,7 @@ statistic() { # LOG NAME
 
 run() { # TARGET
   local log=$folder/$1.log kept=tests/fuzz/corpus/$1 max
-  # Short inputs are quick; no kept one is cut off.
+  # Short inputs are faster, but the longest input of the corpus must fit.
   max=$( (echo 1024 && stat --format %s "$kept"/*) | sort -n | tail -n 1)
   mkdir -p "$folder/$1.corpus"
   if ! "$folder/$1" -max_total_time="$seconds" -max_len="$max" -timeout=25 -rss_limit_mb=2048 \

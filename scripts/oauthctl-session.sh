@@ -1,12 +1,13 @@
 #!/usr/bin/env bash
-# Runs the session that docs/oauthctl.md shows, and writes its true output into the page.
+# Runs the commands that docs/oauthctl.md shows, and writes their real output into the page.
 #
 #   scripts/oauthctl-session.sh                               renews the page
-#   scripts/oauthctl-session.sh --check [FOLDER [EMULATOR...]]  only tells whether it is current
+#   scripts/oauthctl-session.sh --check [FOLDER [EMULATOR...]]  only checks that it is current
 #
-# Lines with "$ " in the page's console blocks are run, what follows them is replaced; comments that
-# begin with "session:" are run unseen. FOLDER holds the test programs and is built if none is
-# given. The clock stands still, and random values are replaced by others that stay the same.
+# In the console blocks of the page, the script runs the lines that begin with "$ ", and replaces
+# the lines after them. It also runs comments that begin with "session:", and hides their output.
+# FOLDER has the test programs. If no FOLDER is given, the script builds them. The clock stands
+# still, and random values are replaced by others that stay the same.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 
@@ -33,14 +34,14 @@ export OAUTHCTL_FOLDER=$folder/etc TZ=UTC
 OAUTHCTL_NOW=$(date -u -d '2026-11-21 09:30' +%s)
 export OAUTHCTL_NOW
 
-# shellcheck disable=SC2317 # called by what the page says
+# shellcheck disable=SC2317 # the commands of the page call it
 oauthctl() { "${emulator[@]}" "$programs/oauthctl_in_folder" "$@"; }
 # shellcheck disable=SC2317
 issue() { "${emulator[@]}" "$programs/oauthctl_issue" "$@"; }
 
 declare -A stable=()
-# Paths as they are on a real machine; each random value as the digest of its place in line, also
-# where only the beginning of the secret is shown.
+# Prints the output with the paths of a real machine. Each random value becomes the digest of its
+# number in the page, also where only the beginning of a secret is shown.
 steady() {
   local text value
   text=$(sed "s|$folder/etc|/var/packages/Keyloft/target/etc|g" "$folder/output")
@@ -56,7 +57,7 @@ steady() {
 }
 
 status=0
-run() { # COMMAND: runs it where the operator is, its output to $folder/output
+run() { # COMMAND: runs it in the operator's home, and writes its output to $folder/output
   local before=$status
   set +e
   (
@@ -85,7 +86,7 @@ while IFS= read -r line; do
       steady
       continue
       ;;
-    console*) continue ;; # what the last run said
+    console*) continue ;; # the output of an earlier run
     '<!-- session: '*)
       command=${line#'<!-- session: '}
       run "${command%' -->'}"

@@ -1,10 +1,11 @@
 #!/usr/bin/env bash
-# Makes the archive for the appliance, zevooauth-<version>-powerpc.tar.gz in the build folder:
-# library, headers, oauthctl, documents, without the stand-ins for the host's libraries. Compares
-# what its programs need with platform/powerpc/NEEDS.txt, and uses it under emulation in a root
-# folder of its own, where there is nothing but those libraries.
-# Installs what is missing (scripts/packages.sh, groups build and powerpc) and keeps what it builds
-# for the target (scripts/lib/powerpc-libraries.sh). The same commit gives the same archive anywhere.
+# Makes the archive for the appliance, zevooauth-<version>-powerpc.tar.gz in the build folder. It
+# has the library, headers, oauthctl and documents, but no stand-ins for the host's libraries.
+# Compares what its programs need with platform/powerpc/NEEDS.txt. Then uses the archive under
+# emulation, in a root folder that has only the libraries that the archive needs.
+# Installs what is missing (scripts/packages.sh, groups build and powerpc), and keeps the libraries
+# that it builds for the target (scripts/lib/powerpc-libraries.sh). The same commit gives the same
+# archive on every machine.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/package-powerpc.sh" >&2 && exit 2; }
@@ -18,10 +19,11 @@ fail() {
   exit 1
 }
 
-# Asked first, since what comes before takes minutes: the archive is used in a root folder of its own.
+# Check this first, because building takes minutes. The archive is used in another root folder.
 user=()
 [ "$(id -u)" -eq 0 ] || user=(--user --map-root-user)
-unshare "${user[@]}" --mount true || fail 'this machine does not let you make a namespace: run it as root'
+unshare "${user[@]}" --mount true ||
+  fail 'this machine does not let you make a namespace: run this script as root'
 
 scripts/packages.sh build powerpc
 libraries=$(scripts/lib/build-folder.sh powerpc-libraries)
@@ -30,7 +32,7 @@ build=$(scripts/build.sh powerpc-release powerpc-release -DPOWERPC_LIBRARIES="$l
 
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
-chmod 755 "$work" # it is the root folder of a system
+chmod 755 "$work" # it holds the root folder of a system
 umask 022
 
 version=$(sed -n 's/^CMAKE_PROJECT_VERSION:STATIC=//p' "$build/CMakeCache.txt")
@@ -43,7 +45,7 @@ archive=$name.tar.gz
 cmake --install "$build" --strip --prefix "$work/$name" >/dev/null
 cp "$list" "$work/$name/NEEDS.txt"
 
-# The archive is what its list says, and does not tell where it was made.
+# The archive has the expected programs, is hardened, and does not tell where it was made.
 cd "$work/$name"
 mapfile -t objects < <(LC_ALL=C grep -rlaP '^\x7fELF' . | sort)
 [ "${objects[*]}" = "./bin/oauthctl ./lib/libzevooauth.so.$version" ] ||
@@ -54,12 +56,12 @@ if grep -rlaF "${places[@]}" .; then
   fail "these files name a folder of this machine"
 fi
 
-# FILE: the libraries that it asks for.
+# FILE: prints the libraries that it needs.
 asks_for() {
   readelf --dynamic --wide "$1" | sed -n 's/.*(NEEDED).*\[\(.*\)\]/\1/p'
 }
 
-# SONAME: where the library lies that stands for the appliance's own.
+# SONAME: prints the path of the library that is used in place of the appliance's.
 find_library() {
   local folder
   for folder in "$libraries/lib" "$sysroot"; do
@@ -68,12 +70,12 @@ find_library() {
   fail "there is no $1"
 }
 
-# NAME: the version that pkg-config knows among the target's libraries.
+# NAME: prints the version of this library of the target, as pkg-config knows it.
 built_against() {
   echo "built against $(PKG_CONFIG_LIBDIR=$libraries/lib/pkgconfig pkg-config --modversion "$1")"
 }
 
-# SONAME: where the appliance has it from, as far as there is something to say.
+# SONAME: prints a note on the origin or the version of the library, if the list has one.
 origin() {
   case $1 in
     libzevo*) echo 'brought by the appliance' ;;
@@ -85,7 +87,7 @@ origin() {
   esac
 }
 
-# The lines of the list, from the programs themselves.
+# Prints the lines that the list must have, from the programs themselves.
 needs() {
   local headers direct indirect library versions
   headers=$(readelf --file-header "${objects[@]}")
@@ -100,13 +102,13 @@ needs() {
     / Name: .* Version: / { match($0, / Name: [^ ]+/); print file, substr($0, RSTART + 7, RLENGTH - 7) }
   ' | sort --version-sort -u >"$work/versions"
   for library in $direct; do
-    # The last of each family, such as GLIBCXX: the newest.
+    # The last version of each family, for example of GLIBCXX, is the newest.
     versions=$(awk -v library="$library" '
       $1 == library { family = $2; sub(/_[0-9.]*$/, "", family); newest[family] = $2 }
       END { for (family in newest) print newest[family] }' "$work/versions" | sort | paste -sd ' ')
     echo "$library ${versions:--} $(origin "$library")"
   done
-  # Their own needs, except those of the host's libraries, which are the host's affair.
+  # Add what these libraries need themselves. The host brings what its own libraries need.
   indirect=$(for library in $direct; do
     [[ $library == libzevo* ]] || asks_for "$(find_library "$library")"
   done | sort -u | grep -vxF "$direct" || true)
@@ -118,14 +120,15 @@ needs() {
 needs | sed 's/ $//' >"$work/needs"
 if ! diff --unified=0 --label "$list" --label built \
   <(sed '1,/^$/d; s/  */ /g' "$work/$name/NEEDS.txt") "$work/needs" >&2; then
-  fail "what was built does not need what $list says"
+  fail "the built programs do not need what $list says"
 fi
 echo "package-powerpc: the programs need what $list says"
 
 tar --create --sort=name --mtime="@$SOURCE_DATE_EPOCH" --owner=0 --group=0 --numeric-owner \
   --mode=u=rwX,go=rX --format=gnu --directory "$work" "$name" | gzip -n9 >"$work/$archive"
 
-# An appliance: the archive, the libraries of the list, the host's own with what these need.
+# This root folder imitates the appliance. It has the archive, the libraries of the list, the
+# stand-ins for the host's libraries, and the library that the stand-ins need.
 root=$work/root
 data=/var/packages/Keyloft/target/etc
 mkdir -p "$root/usr" "$root/lib" "$root$data"
@@ -136,16 +139,17 @@ done < <(sed -n 's/^\([^ ]*\.so[^ ]*\) .*/\1/p' "$root/usr/NEEDS.txt")
 cmake --install "$build" --prefix "$root" --component standins >/dev/null
 cp "$(find_library libnettle.so.8)" "$root/lib/"
 
-# A program of somebody else's.
+# Compile a separate program that uses the library.
 export PKG_CONFIG_LIBDIR=$root/usr/lib/pkgconfig:$libraries/lib/pkgconfig
 mapfile -t options < <(pkg-config --cflags --libs zevooauth | xargs printf '%s\n')
 powerpc-linux-gnu-g++ -std=c++17 "$source/tests/install/consumer.cpp" "${options[@]}" \
   "-Wl,-rpath-link,$root/lib" -o "$root/consumer"
 
 cp "$(command -v qemu-ppc-static)" "$root/qemu"
-enter=(unshare "${user[@]}" --mount chroot "$root") # which has no device of random bytes
+enter=(unshare "${user[@]}" --mount chroot "$root") # this root folder has no /dev/urandom
 
-# STATUS TEXT PROGRAM ARGUMENT...: what the program says is TEXT, a regular expression, no more.
+# STATUS TEXT PROGRAM ARGUMENT...: fails unless the program ends with STATUS and the regular
+# expression TEXT matches its whole output.
 expect() {
   local status=0 said
   said=$(env --ignore-environment PATH="$PATH" TZ=UTC "${enter[@]}" /qemu "${@:3}" 2>&1) || status=$?
@@ -155,7 +159,7 @@ expect() {
 }
 
 secret='[0-9a-f]{64}'
-# The operator's first day. Beside the answers, what was written must be in the root's own folder.
+# Run the operator's first commands. The files that they write must be in this root folder.
 oauthctl=/usr/bin/oauthctl
 expect 0 "oauthctl $version" $oauthctl --version
 expect 0 "id +1

@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
-# Builds the Debian packages and lets lintian look at them.
-# Installs what is missing (scripts/packages.sh, groups build and package). The same commit gives the
-# same packages, byte for byte.
+# Builds the Debian packages and checks them with lintian.
+# Installs what is missing (scripts/packages.sh, groups build and package). The same commit gives
+# the same packages, byte for byte.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/package.sh" >&2 && exit 2; }
@@ -13,11 +13,11 @@ mkdir -p "$folder"
 
 version=$(sed -nE '1s/.*\((.*)\).*/\1/p' debian/changelog)
 if ! grep -qF "project(zevooauth VERSION ${version%%[+~]*} " CMakeLists.txt; then
-  echo "package: debian/changelog has version $version, CMakeLists.txt another" >&2
+  echo "package: debian/changelog has version $version, but CMakeLists.txt has another" >&2
   exit 1
 fi
 
-# Elsewhere, since the packages are put beside the tree, and the path may hold no blank.
+# Build in a copy, because the packages are written beside the tree, and the path may have a blank.
 work=$(mktemp --directory --tmpdir zevooauth-package-XXXXXX)
 trap 'rm -rf "$work"' EXIT
 mkdir "$work/zevooauth"
@@ -43,7 +43,7 @@ fi
 cp "$work"/zevooauth_* "$work"/*.deb "$folder"
 cd "$folder"
 if ! lintian --allow-root --fail-on error,warning --info ./*.changes; then
-  echo "package: lintian finds fault with the packages" >&2
+  echo "package: lintian finds an error or a warning in the packages" >&2
   exit 1
 fi
 ls -l --human-readable ./*.deb

@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# Installs what the named groups need from Debian's packages, as far as it is missing.
+# Installs the Debian packages of the named groups that are missing.
 #
 #   scripts/packages.sh GROUP...
 #
@@ -43,7 +43,7 @@ for group in "$@"; do
 done
 
 if [ ${#missing[@]} -eq 0 ]; then
-  echo "packages: everything for $* is there"
+  echo "packages: everything for $* is installed"
   exit 0
 fi
 if [ "$(id -u)" -ne 0 ]; then
@@ -53,7 +53,7 @@ fi
 echo "packages: installing ${missing[*]}"
 export DEBIAN_FRONTEND=noninteractive
 install() { apt-get install -qq --yes --no-install-recommends "${missing[@]}" >/dev/null; }
-# The lists of packages may be old, or missing.
+# The lists of packages may be old or missing. In this case update them and try again.
 if ! install 2>/dev/null && ! { apt-get update -qq && install; }; then
   echo "packages: could not install ${missing[*]}" >&2
   exit 1

@@ -1,13 +1,13 @@
 #!/usr/bin/env bash
-# scripts/test.sh --plain, and the demo in a private /var, in the hardest place: in a copy of the
-# checkout below /var, in a home that is closed to others, at a path with a blank, entered through a
-# symbolic link. The sanitizers see the same in every place. The copy, and what is built from it, is
-# removed in the end.
+# Runs scripts/test.sh --plain, and the demo in a private /var, in a difficult place: in a copy of
+# the checkout below /var, in a home that is closed to other users, at a path with a blank, entered
+# through a symbolic link. The sanitizers are left out, because they find the same in every place.
+# At the end the script removes the copy and everything built from it.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/test-odd-place.sh" >&2 && exit 2; }
 
-home=$(mktemp --directory /var/tmp/zevooauth-home-XXXXXX) # of mode 0700
+home=$(mktemp --directory /var/tmp/zevooauth-home-XXXXXX) # mktemp gives it mode 0700
 trap '[ $? -eq 0 ] || echo "test-odd-place: failed" >&2; rm -rf "$home"' EXIT
 mkdir "$home/a checkout"
 tar --create --exclude=./build --exclude=./.git . | tar --extract --directory "$home/a checkout"

@@ -1,14 +1,15 @@
 #!/usr/bin/env bash
-# In bare Debian 12 systems, made in the build folder: the packages are built twice and must be
-# the same byte for byte; they are installed, used, upgraded and removed.
-# Runs as root. Installs what is missing (scripts/packages.sh, group bare); everything else goes into
-# those systems, whose downloads are kept for the next time.
+# Tests the packages in bare Debian 12 systems, which it makes in the build folder. Builds the
+# packages twice, and both builds must be the same byte for byte. Installs, uses, upgrades and
+# removes them.
+# Must run as root. Installs what is missing (scripts/packages.sh, group bare). Everything else is
+# installed in those systems, and their downloads are kept for the next time.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/test-package.sh" >&2 && exit 2; }
 
 if [ "$(id -u)" -ne 0 ]; then
-  echo "test-package: run this as root: it makes bare systems" >&2
+  echo "test-package: run this script as root, because it makes bare systems" >&2
   exit 1
 fi
 if ! unshare --mount --pid --fork --mount-proc true; then
@@ -19,14 +20,14 @@ trap '[ $? -eq 0 ] || echo "test-package: failed" >&2' EXIT
 scripts/packages.sh bare
 folder=$(scripts/lib/build-folder.sh test-package)
 
-within() { # ROOT COMMAND...: nothing of this machine's environment or processes
+within() { # ROOT COMMAND...: runs it without this machine's environment and processes
   local root=$folder/$1
   shift
   unshare --mount --pid --fork --mount-proc --root="$root" env --ignore-environment \
     HOME=/root PATH=/usr/sbin:/usr/bin:/sbin:/bin LC_ALL=C.UTF-8 DEBIAN_FRONTEND=noninteractive "$@"
 }
 
-quietly() { # COMMAND...: says what it said only if it fails
+quietly() { # COMMAND...: prints its output only if it fails
   "$@" >"$folder/log" 2>&1 || {
     local code=$?
     cat "$folder/log"
@@ -34,7 +35,7 @@ quietly() { # COMMAND...: says what it said only if it fails
   }
 }
 
-fresh() { # ROOT: a bare system of this name
+fresh() { # ROOT: makes a bare system of this name
   rm -rf "${folder:?}/$1"
   cp -a "$folder/bare" "$folder/$1"
   cp /etc/resolv.conf "$folder/$1/etc/"
@@ -55,9 +56,9 @@ if [ ! -e "$folder/bare.done" ]; then
   within bare apt-get -qq update
   touch "$folder/bare.done"
 fi
-echo "test-package: a bare Debian 12 is there"
+echo "test-package: a bare Debian 12 is ready"
 
-# Twice the same commit, in other places, under other habits.
+# Build the same commit twice, in different places and with different settings of the user.
 fresh build
 mkdir "$folder/build/first"
 tar --create --exclude=./build --exclude=./.git . | tar --extract --directory "$folder/build/first"
@@ -70,13 +71,14 @@ keep_downloads build
   quietly within build env TZ=Asia/Tokyo LC_ALL=C HOME=/tmp "/srv/second one/scripts/package.sh"
 )
 version=$(sed -nE '1s/.*\((.*)\).*/\1/p' debian/changelog)
-second=$(echo "$folder"/build/tmp/.cache/zevooauth-*/packages) # a path with a blank is not built in
+# The second checkout has a blank in its path, so its packages are in the cache folder.
+second=$(echo "$folder"/build/tmp/.cache/zevooauth-*/packages)
 for package in libzevooauth1 libzevooauth-dev oauthctl zevooauth-standins; do
   cmp "$folder"/{build/first/build/packages,"${second#"$folder/"}"}/"${package}_${version}"_*.deb
 done
 echo "test-package: two builds of one commit are the same, byte for byte"
 
-# The next version is the same files under another number.
+# The next version has the same files and another number.
 mkdir "$folder/build/packages"
 for package in "$folder"/build/first/build/packages/*.deb; do
   cp "$package" "$folder/build/packages"

@@ -1,8 +1,8 @@
 #!/usr/bin/env bash
-# The tests on the machine that the library ships to: cross-compiled for 32-bit big-endian PowerPC
-# and run under emulation, then databases exchanged with this machine's own build.
-# Installs what is missing (scripts/packages.sh, groups build, test and powerpc) and keeps what it
-# builds for the target (scripts/lib/powerpc-libraries.sh) for the next time.
+# Runs the tests for the appliance: cross-compiles them for 32-bit big-endian PowerPC, runs them
+# under emulation, and exchanges databases with this machine's own build.
+# Installs what is missing (scripts/packages.sh, groups build, test and powerpc), and keeps the
+# libraries that it builds for the target (scripts/lib/powerpc-libraries.sh) for the next time.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/.."
 [ $# -eq 0 ] || { echo "usage: scripts/test-powerpc.sh" >&2 && exit 2; }

@@ -1,10 +1,10 @@
 #!/usr/bin/env bash
 # Builds and runs the tests.
 #
-#   scripts/test.sh           all tests, plainly and under the address and undefined-behaviour
+#   scripts/test.sh           runs all tests, plain and under the address and undefined-behaviour
 #                             sanitizers, and the tests of threads under the thread sanitizer
-#   scripts/test.sh --plain   all tests, without sanitizers
-#   scripts/test.sh --quick   between two edits: the plain build, without the slow tests
+#   scripts/test.sh --plain   runs all tests, without sanitizers
+#   scripts/test.sh --quick   runs the plain tests without the slow ones, between two edits
 #
 # Installs what is missing (scripts/packages.sh, groups build and test).
 set -euo pipefail
@@ -19,12 +19,12 @@ case $#:${1-} in
 esac
 trap '[ $? -eq 0 ] || echo "test: failed" >&2' EXIT
 if [ ! -e /dev/pts/ptmx ]; then
-  echo "test: /dev/pts is not mounted, which the tests of prompts need" >&2
+  echo "test: /dev/pts is not mounted, but the tests of prompts need it" >&2
   exit 1
 fi
 scripts/packages.sh build test
 
-# More tests at once than cores, because many wait: for a lock, for the disk, for another process.
+# Run more tests at once than there are cores, because many wait for a lock, the disk or a process.
 run_tests() { # FOLDER OPTION...
   ctest --test-dir "$1" --output-on-failure --parallel $((3 * $(nproc))) "${@:2}"
 }

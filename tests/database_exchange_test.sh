@@ -1,9 +1,9 @@
 #!/usr/bin/env bash
-# A database that one program writes is read, verified, edited and purged by another, and what is
-# left is read by the first. Each program is a command of one or more words.
+# One program writes a database. Another one reads, verifies, edits and purges it. Then the first
+# one reads what is left. Each program is a command of one or more words.
 #
 #   database_exchange_test.sh READER WRITER
-#   database_exchange_test.sh READER --golden FOLDER     a database written long ago
+#   database_exchange_test.sh READER --golden FOLDER     reads a database that was written earlier
 set -euo pipefail
 
 read -ra reader <<<"$1"

@@ -1,10 +1,11 @@
 #!/usr/bin/env bash
-# What is released is hardened, as its files tell: loadable anywhere, bound and write-protected
-# before it runs, no stack that can be executed, checked stacks and buffers.
+# Checks that the programs and libraries of a release are hardened: they can be loaded at any
+# address, are bound and write-protected before they run, cannot execute the stack, and check stacks
+# and buffers.
 #
-#   hardening_test.sh --built FOLDER...        with the compiler's options, which debug information
-#                                              tells; run paths lead to no place of others' choice
-#   hardening_test.sh --installed FOLDER...    without any run path
+#   hardening_test.sh --built FOLDER...        also checks the run paths, and the compiler's options
+#                                              in the debug information
+#   hardening_test.sh --installed FOLDER...    also checks that there is no run path
 set -euo pipefail
 
 mode=$1
@@ -20,8 +21,8 @@ expect() { # FILE TEXT PATTERN REASON
   grep -qE "$3" <<<"$2" || fail "$1" "$4"
 }
 
-linked() { # FILE WHAT READELF SAYS OF IT
-  expect "$1" "$2" '^ *Type: +DYN' 'cannot be loaded anywhere'
+linked() { # FILE OUTPUT_OF_READELF
+  expect "$1" "$2" '^ *Type: +DYN' 'cannot be loaded at any address'
   if grep -q '^ *INTERP' <<<"$2"; then
     expect "$1" "$2" '\(FLAGS_1\).* PIE' 'is no position-independent program'
   fi
@@ -33,12 +34,12 @@ linked() { # FILE WHAT READELF SAYS OF IT
   fi
 }
 
-# The C library's functions that _FORTIFY_SOURCE replaces wherever they are called.
+# Checks that the file calls no function of the C library that _FORTIFY_SOURCE always replaces.
 calls() { # FILE
   local asked
   asked=$(readelf --dyn-syms --wide "$1" | awk '$7 == "UND" { sub(/@.*/, "", $8); print $8 }')
   if grep -xE 'f?printf|sn?printf|v?syslog|vfprintf' <<<"$asked" >&2; then
-    fail "$1" 'calls this unchecked'
+    fail "$1" 'calls these functions unchecked'
   fi
   case ${1##*/} in
     oauthctl | libzevooauth.so.*)
@@ -48,7 +49,7 @@ calls() { # FILE
   esac
 }
 
-compiled() { # FILE WHAT READELF SAYS OF IT
+compiled() { # FILE OUTPUT_OF_READELF
   local units unit option options=(-fstack-protector-strong -fstack-clash-protection)
   ! grep -qE 'Machine: .*(X86-64|80386)' <<<"$2" || options+=(-fcf-protection)
   units=$(readelf --debug-dump=info --dwarf-depth=1 --wide "$1" 2>/dev/null |

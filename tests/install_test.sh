@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# Installs a build into a folder of its own, compiles a program against it twice, as CMake and as
-# pkg-config tell, and runs both.
+# Installs a build into a temporary folder, compiles a program against it with CMake and with
+# pkg-config, and runs both.
 #
 #   install_test.sh BUILD VERSION COMPILER [FLAG...]
 set -euo pipefail
@@ -57,7 +57,7 @@ for program in tree/bin/oauthctl tree/lib/libzevooauth.so host/lib/*.so.6; do
   fi
 done
 
-mv tree moved # nothing in it says where it was
+mv tree moved # no file in it may depend on its old place
 export LD_LIBRARY_PATH=$folder/moved/lib:$folder/host/lib
 expected="alice 64"
 
@@ -68,8 +68,9 @@ test "$(by-cmake/consumer)" = "$expected"
 
 export PKG_CONFIG_PATH=$folder/moved/lib/pkgconfig
 test "$(pkg-config --modversion zevooauth)" = "$version"
-mapfile -t options < <(pkg-config --cflags --libs zevooauth | xargs printf '%s\n') # as it escapes
-# shellcheck disable=SC2086 # each flag a word
+# xargs removes the escapes of pkg-config.
+mapfile -t options < <(pkg-config --cflags --libs zevooauth | xargs printf '%s\n')
+# shellcheck disable=SC2086 # each flag is one word
 "$compiler" -std=c++17 $flags "$source/consumer.cpp" "${options[@]}" -o by-pkg-config
 test "$(./by-pkg-config)" = "$expected"
 echo "install: a program compiles against the installed library by CMake and by pkg-config"

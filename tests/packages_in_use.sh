@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# Installs the packages beside this script in a bare system, uses, upgrades and removes them. For
-# systems made for it only: it takes over the machine's own database.
+# Installs the packages beside this script in a bare system, and uses, upgrades and removes them.
+# Run it only in a system that was made for it, because it uses the system's real database.
 #
 #   packages_in_use.sh VERSION
 set -euo pipefail
@@ -14,14 +14,14 @@ fail() {
   exit 1
 }
 
-install() { # PACKAGE...: as an administrator does
+install() { # PACKAGE...: installs them as an administrator does
   if ! apt-get install --yes --no-install-recommends "$@" >install.log 2>&1; then
     tail -n 20 install.log >&2
     return 1
   fi
 }
 
-expect() { # CODE OUTPUT COMMAND...: the exit code and the whole of standard output
+expect() { # CODE OUTPUT COMMAND...: compares the exit code and the whole standard output
   local code=0 output
   output=$("${@:3}" 2>said) || code=$?
   [ "$code" -eq "$1" ] || fail "${*:3} ended with $code, not $1: $(<said)"
@@ -30,9 +30,9 @@ expect() { # CODE OUTPUT COMMAND...: the exit code and the whole of standard out
 
 status_of() { dpkg-query --show --showformat='${db:Status-Status}' "$1" 2>/dev/null || true; }
 
-# The stand-ins come when they are asked for, and not by themselves.
+# The stand-ins are installed only if they are named.
 if install "./libzevooauth1_${version}"_*.deb "./oauthctl_${version}"_*.deb 2>refused; then
-  fail "it does without the host's libraries"
+  fail "the packages install without the host's libraries"
 fi
 grep -q 'libzevocore6' refused || fail "apt does not name the host's library: $(<refused)"
 install ./{libzevooauth1,oauthctl,zevooauth-standins}"_${version}"_*.deb
@@ -58,14 +58,15 @@ expect 0 'hello alice' ./example
 cmake -G Ninja -S install -B consumer >install.log
 cmake --build consumer >install.log
 expect 0 'alice 64' consumer/consumer
-echo "packages in use: the example compiles against them"
+echo "packages in use: the example compiles against the packages"
 
-# The operator sees the token, ends the login, and looks whether all is well.
+# The operator looks at the token, revokes it, disables the client, and checks and saves the data.
 token=$(oauthctl token show 1 --show-secrets | sed -n 's/^access_token *//p')
 [ "$(oauthctl token verify <<<"$token" | sed -n 's/^user *//p')" = alice ] || fail "no token of alice"
 expect 0 'deleted 1 token' oauthctl token revoke --user alice --yes
 expect 1 '' oauthctl token verify <<<"$token"
-grep -qx 'oauthctl: not valid: no such access token' said || fail "it said: $(<said)"
+grep -qx 'oauthctl: not valid: no such access token' said ||
+  fail "oauthctl token verify said: $(<said)"
 expect 0 'client 1 is disabled' oauthctl client disable 1
 oauthctl status >/dev/null
 oauthctl check
@@ -74,9 +75,9 @@ man_page=/usr/share/man/man1/oauthctl.1.gz
 if [ ! -s "$man_page" ] && ! grep -qs usr/share/man /etc/dpkg/dpkg.cfg.d/*; then
   fail "there is no manual page"
 fi
-echo "packages in use: oauthctl sees, ends, checks and backs up"
+echo "packages in use: oauthctl shows, revokes, checks and backs up"
 
-# What is there survives every step that follows.
+# The upgrade and the removal must not change the database.
 fingerprint() { find "$data" -type f -exec sha256sum {} + -exec stat --format '%n %a %u %s' {} + | sort; }
 before=$(fingerprint)
 listed=$(oauthctl client list)

@@ -97,7 +97,7 @@ first_failure() { # PROGRAM
     grep . || echo "$1"
 }
 
-# Runs the programs side by side until one fails. True if one does; $failure is then the test.
+# Runs the programs side by side until one fails. True if one fails; $failure then names the test.
 caught_by_program() { # PROGRAM...
   local program ended code most
   for program in "$@" ''; do
@@ -120,7 +120,7 @@ caught_by_program() { # PROGRAM...
   done
 }
 
-# The same for tests that are not in a test program, such as scripts.
+# Does the same for tests that are not in a test program, for example scripts.
 caught_by_script() {
   ! ctest --test-dir "$work/build" --stop-on-failure --parallel "$(nproc)" \
     --tests-regex '^(DatabaseExchange|ReadmeExample|ReferencePages|PublicHeader|SharedLibrary)\.' \

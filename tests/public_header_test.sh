@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# A public header compiles alone, without warnings, and keeps SQLite's header to itself.
+# Checks that a public header compiles alone without warnings, and does not include SQLite's header.
 #
 #   public_header_test.sh HEADER COMPILER [FLAG...]
 set -euo pipefail

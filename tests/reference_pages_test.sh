@@ -1,15 +1,16 @@
 #!/usr/bin/env bash
-# A page of docs/reference has all that the sources have of its kind, and nothing else.
+# Checks that a page of docs/reference has all messages or all tables of the sources, and no others.
 #
 #   reference_pages_test.sh messages|database-format
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
-# The sources as one line, without comments; literals that stand side by side are one.
+# Prints the sources as one line, without comments. Adjacent string literals become one.
 code() { sed 's|^ *//.*||' "$@" | tr '\n' ' ' | sed -E 's/" +"//g; s/\( +/(/g'; }
 
-# "<heading>: <text>" for each log line, error text and line of the audit log. A call whose text is
-# not a literal stays as it is, and no page has such a line. oauth_failure.h only passes texts on.
+# Prints "<heading>: <text>" for each log line, error text and line of the audit log. A call whose
+# text is not a literal is printed as it is. The test then fails, because no page has such a line.
+# oauth_failure.h is left out, because it only passes texts on.
 messages_in_sources() {
   mapfile -t files < <(find src -mindepth 2 -type f ! -name oauth_failure.h)
   { code "${files[@]}" && grep '^#define OAUTH_ENTER' src/oauth_syslog.h; } |
@@ -26,18 +27,19 @@ messages_in_sources() {
       s/^fail\(\*this, [A-Za-z]+, "(.*)"$/Error texts: \1/
       s/^(SetErrMsg\(|errMsg_ = |kErrMsg\] = )"(.*)"$/Error texts: \2/
       s/^auditLog\.Add\("(.*)"$/Audit log: \1/' |
-    # The definition, SQLite's own text, and the text of the store.
+    # Leave out the definition, SQLite's own text, and the text of the store.
     grep -vxF -e 'SetErrMsg(const std::string& msg) { errMsg_ = msg;' -e 'fail(*this, code, text);' \
       -e 'kErrMsg] = GetErrMsg();' | LC_ALL=C sort -u
 }
 
-# A heading holds until the next; a row's text is what it quotes first.
+# Prints the same lines for the page. A row belongs to the last heading before it, and its text is
+# the first one in backticks.
 messages_in_page() {
   awk -F '`' '/^#/ { sub(/^#+ /, ""); heading = $0 } /^\| `/ { print heading ": " $2 }' \
     docs/reference/messages.md | LC_ALL=C sort
 }
 
-# As SQLite keeps them.
+# Prints the statements as SQLite keeps them.
 database-format_in_sources() {
   code src/oauth_names.h | grep -oE 'CREATE TABLE IF NOT EXISTS [^;]*' | sed 's/IF NOT EXISTS //' |
     LC_ALL=C sort

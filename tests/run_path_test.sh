@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
-# No program or library in a folder looks for libraries in the current folder: each entry of its run
-# path is absolute or relative to the file itself. The loader reads an empty entry as the current
-# folder, where anybody may have put a library.
+# Checks that no program or library in a folder looks for libraries in the current folder: each
+# entry of its run path is absolute or relative to the file itself. The loader reads an empty entry
+# as the current folder, where anybody may have put a library.
 #
 #   run_path_test.sh FOLDER READELF
 set -euo pipefail
@@ -15,7 +15,7 @@ while IFS= read -r -d '' file; do
   [ -n "$path" ] || continue
   while IFS= read -r -d : entry; do
     if ! [[ $entry =~ ^(/|\$ORIGIN(/|$)) ]]; then
-      echo "FAILED: $file looks in '$entry', its run path is '$path'" >&2
+      echo "FAILED: $file looks in '$entry': its run path is '$path'" >&2
       failures=$((failures + 1))
     fi
   done <<<"$path:"

@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# What the shared library shows to the outside: its name, the libraries it needs, what it exports,
-# that it never looks at the environment, and that it stays in memory once loaded.
+# Checks what the shared library shows to the outside: its name, the libraries it needs, what it
+# exports, that it never reads the environment, and that it stays in memory once loaded.
 #
 #   shared_library_test.sh LIBRARY NM READELF
 set -euo pipefail
@@ -26,7 +26,8 @@ grep -q '(FLAGS_1).* NODELETE' <<<"$dynamic" || fail "dlclose() would take it fr
 exported=$("$nm" --dynamic --defined-only --demangle "$library" | cut -d ' ' -f 3- |
   sed 's/std::__cxx11::basic_string<char, std::char_traits<char>, std::allocator<char> >/std::string/g; s/\[abi:cxx11\]//' |
   LC_ALL=C sort -u)
-diff "$here/exported_symbols.txt" - <<<"$exported" || fail "it exports something else"
+diff "$here/exported_symbols.txt" - <<<"$exported" ||
+  fail "its exports are not those of exported_symbols.txt"
 
 environment=$("$nm" --dynamic --undefined-only "$library" | grep -E 'getenv' || true)
 [ -z "$environment" ] || fail "it reads the environment: $environment"

@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
-# Makes the folder of that name below build/ and prints its path. Where the checkout belongs to
-# somebody else, or its path has a blank, which some tools split at, it lies in the user's own cache
-# folder instead, or in /tmp if there is none.
+# Makes the folder NAME below build/ and prints its path. If the checkout belongs to another user,
+# or if its path has a blank, at which some tools split it, the folder is made in the user's cache
+# folder instead, or in /tmp if there is no cache folder.
 #
 #   scripts/lib/build-folder.sh NAME
 set -euo pipefail
@@ -16,7 +16,7 @@ checkout=$(cksum <<<"$PWD" | cut -d ' ' -f 1)
 cache=${XDG_CACHE_HOME:-${HOME:-/nonexistent}/.cache}/zevooauth-$checkout
 own=$(realpath --canonicalize-missing build)
 for root in "$own" "$(realpath --canonicalize-missing "$cache")" "/tmp/zevooauth-$(id -u)-$checkout"; do
-  # What others may have made is no place to run programs from.
+  # Nobody else may own a folder from which programs are run.
   if usable "$root" "$1" && { [ "$root" = "$own" ] || { [ -O "$root" ] && [ ! -L "$root" ]; }; }; then
     mkdir -p "$root/$1"
     echo "$root/$1"

@@ -1,11 +1,12 @@
 #!/usr/bin/env bash
-# Builds what the PowerPC target needs from Debian's source packages: SQLite, JsonCpp, GoogleTest,
-# nettle and util-linux's libsmartcols; Boost and CLI11 are headers only and taken from this machine.
+# Builds the libraries that the PowerPC target needs from Debian's source packages: SQLite, JsonCpp,
+# GoogleTest, nettle and util-linux's libsmartcols. Boost and CLI11 are headers only, so those of
+# this machine are used.
 #
 #   scripts/lib/powerpc-libraries.sh FOLDER
 #
-# What FOLDER holds already is not built again. The system's package configuration is left alone:
-# sources are fetched through one of their own, made from the places the system has.
+# A library that FOLDER has already is not built again. The system's package configuration is not
+# changed: sources are fetched with another one, which is made from the system's package sources.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/../.."
 
@@ -13,10 +14,10 @@ host=powerpc-linux-gnu
 mkdir -p "$1"
 prefix=$(cd "$1" && pwd)
 work=$prefix/work
-# Large files and 64-bit times, as in the library itself.
+# The library itself is built with large files and 64-bit times, too.
 flags=(-O2 -D_FILE_OFFSET_BITS=64 -D_TIME_BITS=64)
 
-fetch() { # PACKAGE: leaves its source tree in $work/PACKAGE
+fetch() { # PACKAGE: puts its source tree into $work/PACKAGE
   local apt=$work/apt
   if [ ! -e "$apt/updated" ]; then
     mkdir -p "$apt/lists/partial" "$apt/cache/archives/partial"
@@ -48,8 +49,8 @@ cross_cmake() { # PACKAGE OPTION...
   cmake --install "$work/$1/cross"
 }
 
-# The amalgamation is made natively: on the way helper programs are built and run. Without usleep()
-# a connection that waits for another sleeps whole seconds, and gives up after five of them.
+# sqlite3.c is made with the native compiler, because this builds and runs helper programs. Without
+# usleep(), a connection that waits for another one sleeps whole seconds, and gives up after five.
 build_sqlite3() {
   (cd "$work/sqlite3" && ./configure && make sqlite3.c sqlite3.h)
   $host-gcc "${flags[@]}" -fPIC -shared -Wl,-soname,libsqlite3.so.0 -DSQLITE_THREADSAFE=1 \
@@ -71,7 +72,7 @@ build_googletest() {
 
 build_nettle() {
   cd "$work/nettle"
-  touch aclocal.m4 configure stamp-h.in # newer than what they are made from: nothing to remake
+  touch aclocal.m4 configure stamp-h.in # newer than their sources, so that make keeps them
   CFLAGS="${flags[*]}" ./configure --host=$host --prefix="$prefix" --libdir="$prefix/lib" \
     --disable-public-key --disable-assembler --disable-static --disable-openssl \
     --disable-documentation
@@ -99,7 +100,7 @@ for package in sqlite3 libjsoncpp googletest nettle util-linux; do
   fi
 done
 
-# All at once, because a configure script keeps one core busy only.
+# Build all packages at once, because a configure script keeps only one core busy.
 builds=()
 for package in "${missing[@]}"; do
   echo "powerpc-libraries: building $package"

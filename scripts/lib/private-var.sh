@@ -1,18 +1,18 @@
 #!/usr/bin/env bash
-# Runs a command where the library's fixed database path is private and empty.
+# Runs a command in a private /var, so that the library's fixed database path is private and empty.
 #
 #   scripts/lib/private-var.sh COMMAND...
 #
-# Only the command and its children see the empty /var in memory, with the database's folder in it
-# and, if they lie there, this checkout and its build folder. It is gone when the last of them ends.
-# Needs root, or a kernel that lets users make namespaces.
+# The private /var is in memory, and only the command and its children see it. It has the database's
+# folder and /var/tmp, and this checkout and its build folder if they lie below /var. It disappears
+# when the last of these processes ends. Needs root, or a kernel that lets users make namespaces.
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/../.."
 
 user=()
 [ "$(id -u)" -eq 0 ] || user=(--user --map-root-user)
 if ! unshare "${user[@]}" --mount true; then
-  echo "private-var: this machine does not let you make a namespace: run it as root" >&2
+  echo "private-var: this machine does not let you make a namespace: run this script as root" >&2
   exit 1
 fi
 build=$(scripts/lib/build-folder.sh release)
@@ -21,8 +21,8 @@ for folder in "$PWD" "${build%/*}"; do
   [[ $folder/ != /var/* ]] || kept+=("$folder")
 done
 
-# The new /var is made elsewhere, as long as what it takes over from the old one can be seen.
-# shellcheck disable=SC2016 # expanded inside
+# The new /var is made in another place first, because it takes over folders of the old one.
+# shellcheck disable=SC2016 # the inner shell expands these
 exec unshare "${user[@]}" --mount bash -c '
   set -euo pipefail
   new=$(mktemp --directory /tmp/authserver-var-XXXXXX)
