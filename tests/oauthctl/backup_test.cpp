@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sqlite3.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -452,6 +453,20 @@ TEST_F(RestoreTest, ReplacesAFileThatIsNoDatabase) {
       run({"restore", copy_, "--yes"}).out);
   EXPECT_EQ(saved_, rowsIn(files_.database()));
   EXPECT_EQ(times(9000, 'x'), bytesOf(kept_));
+}
+
+// The limit takes the place of a full disk.
+TEST_F(RestoreTest, LeavesARuinedFileIfTheNewOneCannotBeWritten) {
+  std::ofstream(files_.database(), std::ios::binary) << times(9000, 'x');
+  beforeExec_ = [] {
+    const rlimit limit = {8192, 8192};
+    signal(SIGXFSZ, SIG_IGN);
+    setrlimit(RLIMIT_FSIZE, &limit);
+  };
+  EXPECT_EQ("1 cannot write " + files_.database() + ": File too large",
+            complaint(run({"restore", copy_, "--yes"})));
+  EXPECT_EQ(times(9000, 'x'), databaseBytes());
+  EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
 }
 
 TEST_F(RestoreTest, ReplacesADamagedDatabase) {

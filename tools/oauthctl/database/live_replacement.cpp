@@ -61,26 +61,53 @@ void copyBytes(const Descriptor& from, NewFile& to, const std::string& path) {
   }
 }
 
-// Renames the database, or its file with this suffix. Never replaces a file.
-bool moveTo(const std::string& kept, const std::string& suffix) {
-  const std::string from = liveName() + suffix, to = nameOf(kept) + suffix;
-  if (renameat2(folder(), from.c_str(), folder(), to.c_str(), RENAME_NOREPLACE) == 0) return true;
-  // An older kernel or file system does not know the flag: give a second name, then remove the
-  // first.
-  return (errno == EINVAL || errno == ENOSYS) &&
-         linkat(folder(), from.c_str(), folder(), to.c_str(), 0) == 0 &&
-         unlinkat(folder(), from.c_str(), 0) == 0;
+bool rename(const std::string& from, const std::string& to) {
+  return renameat2(folder(), from.c_str(), folder(), to.c_str(), RENAME_NOREPLACE) == 0 ||
+         // An older kernel or file system does not know the flag: give a second name, then remove
+         // the first.
+         ((errno == EINVAL || errno == ENOSYS) &&
+          linkat(folder(), from.c_str(), folder(), to.c_str(), 0) == 0 &&
+          unlinkat(folder(), from.c_str(), 0) == 0);
 }
 
-// Moves away a file that SQLite can no longer open, and its journal, which must not be applied to
-// the new file. Returns the new path.
-std::string moveAside() {
+// Names the file that SQLite can no longer open "kept". If the file system has second names, the
+// file keeps its first one too. Moves the journal, which must not be applied to another file.
+void keepAside(const std::string& kept) {
   const Descriptor damaged = openLive();
-  std::string kept = freePath();
   if (!damaged.isOpen()) throwCannotKeep(kept);
+  if (linkat(folder(), liveName().c_str(), folder(), nameOf(kept).c_str(), 0) != 0 &&
+      !rename(liveName(), nameOf(kept)))
+    throwCannotKeep(kept);
   fchmod(damaged.value(), S_IRUSR | S_IWUSR);
-  if (!moveTo(kept, "")) throwCannotKeep(kept);
-  moveTo(kept, "-journal");
+  rename(liveName() + "-journal", nameOf(kept) + "-journal");
+}
+
+// Undoes keepAside(), unless another file has the name by now. Returns whether it did.
+bool putBack(const std::string& kept) {
+  const auto live = DatabaseFolder::enter().lstatOf(liveName());
+  const auto old = DatabaseFolder::enter().lstatOf(nameOf(kept));
+  if (!old || (live && (live->st_dev != old->st_dev || live->st_ino != old->st_ino))) return false;
+  const bool done =
+      live ? unlinkat(folder(), nameOf(kept).c_str(), 0) == 0 : rename(nameOf(kept), liveName());
+  if (done) rename(nameOf(kept) + "-journal", liveName() + "-journal");
+  return done;
+}
+
+// Replaces a file that SQLite can no longer open. Returns the path of what was there. The new file
+// is on the disk, all but its name, before the old one is touched.
+std::string replaceFile(const DatabaseImage& image) {
+  NewFile file(folder(), fixed_paths::database(), NewFile::Existing::kReplace);
+  file.append(image.bytes());
+  file.bringToDisk();
+  std::string kept = freePath();
+  keepAside(kept);
+  try {
+    file.publish();
+  } catch (const Failure& failure) {
+    throw Failure(ExitCode::kAttention,
+                  failure.what() + (putBack(kept) ? std::string(", nothing changed")
+                                                  : ", what was there is kept in " + kept));
+  }
   return kept;
 }
 
@@ -134,9 +161,7 @@ std::string replaceLiveDatabase(DatabaseImage& image) {
                     std::string("cannot restore, nothing changed: ") + error.what());
   }
   // The file is too damaged to be written, so no program can use it either.
-  std::string kept = moveAside();
-  makeNew(image);
-  return kept;
+  return replaceFile(image);
 }
 
 }  // namespace oauthctl

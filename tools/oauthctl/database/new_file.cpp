@@ -56,15 +56,19 @@ bool isInterrupted() {
 }  // namespace
 
 NewFile::NewFile(const std::string& path)
-    : NewFile(path, Descriptor(open(folderOf(path).c_str(), kFolderFlags))) {}
+    : NewFile(path, Descriptor(open(folderOf(path).c_str(), kFolderFlags)), Existing::kRefuse) {}
 
-NewFile::NewFile(int folder, const std::string& path)
-    : NewFile(path, Descriptor(openat(folder, ".", kFolderFlags))) {}
+NewFile::NewFile(int folder, const std::string& path, Existing existing)
+    : NewFile(path, Descriptor(openat(folder, ".", kFolderFlags)), existing) {}
 
-NewFile::NewFile(const std::string& path, Descriptor folder)
-    : path_(path), name_(nameOf(path)), maker_(effectiveIds()), folder_(std::move(folder)) {
+NewFile::NewFile(const std::string& path, Descriptor folder, Existing existing)
+    : path_(path),
+      name_(nameOf(path)),
+      existing_(existing),
+      maker_(effectiveIds()),
+      folder_(std::move(folder)) {
   if (!folder_.isOpen()) throwCannot("make a file beside " + path_);
-  requireFreeName();
+  if (existing == Existing::kRefuse) requireFreeName();
   makeUnnamed();
 }
 
@@ -94,10 +98,14 @@ void NewFile::makeUnnamed() {
     throwCannot("make a file beside " + path_);
 }
 
-void NewFile::makeNamed() {
+void NewFile::takeTemporaryName() {
   const sigset_t ending = endingSignals();
   sigprocmask(SIG_BLOCK, &ending, &signalsBefore_);
   temporary_ = temporaryName(name_);
+}
+
+void NewFile::makeNamed() {
+  takeTemporaryName();
   const ActingAs maker(maker_);
   file_ = Descriptor(openat(folder_.value(), temporary_.c_str(),
                             O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kMode));
@@ -125,13 +133,20 @@ std::string NewFile::contents() const {
   return bytes;
 }
 
-void NewFile::publish() {
+void NewFile::bringToDisk() const {
   if (fsync(file_.value()) != 0) throwCannot("bring " + path_ + " to the disk");
+}
+
+void NewFile::publish() {
+  bringToDisk();
   if (!temporary_.empty() && isInterrupted())
     throw Failure(ExitCode::kAttention, "interrupted, " + path_ + " was not made");
   {
     const ActingAs maker(maker_);
-    if (!linkByDescriptor() && (errno == EEXIST || !renameTemporary())) {
+    const bool named = existing_ == Existing::kReplace
+                           ? replaceExisting()
+                           : linkByDescriptor(name_) || (errno != EEXIST && renameTemporary());
+    if (!named) {
       if (errno == EEXIST) requireFreeName();
       throwCannot("name the file " + path_);
     }
@@ -140,25 +155,41 @@ void NewFile::publish() {
 }
 
 // Uses the descriptor: the temporary name may belong to another file by now.
-bool NewFile::linkByDescriptor() const {
-  return linkat(AT_FDCWD, procPath(file_).c_str(), folder_.value(), name_.c_str(),
+bool NewFile::linkByDescriptor(const std::string& name) const {
+  return linkat(AT_FDCWD, procPath(file_).c_str(), folder_.value(), name.c_str(),
                 AT_SYMLINK_FOLLOW) == 0;
 }
 
-// For a file system without second names, or a system without /proc. Checks afterwards that the
-// name is that of our file.
-bool NewFile::renameTemporary() {
+// For a file system without second names, or a system without /proc.
+bool NewFile::renameTemporary() const {
   const int folder = folder_.value();
   const char *const from = temporary_.c_str(), *const to = name_.c_str();
   if (temporary_.empty() || (renameat2(folder, from, folder, to, RENAME_NOREPLACE) != 0 &&
                              linkat(folder, from, folder, to, 0) != 0))
     return false;
+  requireOwnName();
+  return true;
+}
+
+// A link cannot replace a file, so a file without a name gets a temporary one first.
+bool NewFile::replaceExisting() {
+  if (temporary_.empty()) {
+    takeTemporaryName();
+    if (!linkByDescriptor(temporary_)) return false;
+  }
+  const int folder = folder_.value();
+  if (renameat(folder, temporary_.c_str(), folder, name_.c_str()) != 0) return false;
+  requireOwnName();
+  return true;
+}
+
+// The temporary name may have belonged to another file.
+void NewFile::requireOwnName() const {
   struct stat named, made;
-  if (fstatat(folder_.value(), name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) == 0 &&
-      fstat(file_.value(), &made) == 0 && named.st_dev == made.st_dev &&
-      named.st_ino == made.st_ino)
-    return true;
-  throw Failure(ExitCode::kAttention, "somebody put another file in the place of " + path_);
+  if (fstatat(folder_.value(), name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) != 0 ||
+      fstat(file_.value(), &made) != 0 || named.st_dev != made.st_dev ||
+      named.st_ino != made.st_ino)
+    throw Failure(ExitCode::kAttention, "somebody put another file in the place of " + path_);
 }
 
 }  // namespace oauthctl

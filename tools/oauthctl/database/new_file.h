@@ -1,4 +1,4 @@
-// A new file that gets its name only when it is complete, and never replaces another file.
+// A new file that gets its name only when it is complete.
 //
 // It is written and read through one descriptor, and named relative to a folder that stays open. So
 // nobody who can write to that folder can put another file in its place.
@@ -15,12 +15,15 @@ namespace oauthctl {
 
 class NewFile {
  public:
+  // What becomes of a file that has the name.
+  enum class Existing { kRefuse, kReplace };
+
   // Makes a file of mode 0600. It is made and named with the current ids of the process. Throws if
   // the name is taken.
   explicit NewFile(const std::string& path);
   // The same in a folder that is open already. The last part of the path is the name; messages show
   // all of it.
-  NewFile(int folder, const std::string& path);
+  NewFile(int folder, const std::string& path, Existing existing = Existing::kRefuse);
   // Removes the file, unless it was published. A signal that ends the program leaves nothing
   // either.
   ~NewFile();
@@ -31,18 +34,25 @@ class NewFile {
   void append(const std::string& bytes) { append(bytes.data(), bytes.size()); }
   // Reads the file again.
   std::string contents() const;
-  // Writes the contents to the disk and gives the file its name. Throws if the name has been taken.
+  // Writes the contents to the disk. Afterwards only the name is missing.
+  void bringToDisk() const;
+  // Does that, and gives the file its name. Throws if the name has been taken and the file there is
+  // not to be replaced. A replaced file has the name until the new one has it.
   void publish();
 
  private:
-  NewFile(const std::string& path, ZEVOOAUTHSERVER::Descriptor folder);
+  NewFile(const std::string& path, ZEVOOAUTHSERVER::Descriptor folder, Existing existing);
   void requireFreeName() const;
   void makeUnnamed();
   void makeNamed();
-  bool linkByDescriptor() const;
-  bool renameTemporary();
+  void takeTemporaryName();
+  bool linkByDescriptor(const std::string& name) const;
+  bool renameTemporary() const;
+  bool replaceExisting();
+  void requireOwnName() const;
 
   const std::string path_, name_;
+  const Existing existing_;
   const Ids maker_;
   const ZEVOOAUTHSERVER::Descriptor folder_;
   ZEVOOAUTHSERVER::Descriptor file_;
