@@ -2,6 +2,7 @@
 
 using testing::ElementsAre;
 using testing::HasSubstr;
+using testing::MatchesRegex;
 using testing::Not;
 
 namespace {
@@ -100,6 +101,23 @@ TEST_F(ClientTest, RegistersAClient) {
   EXPECT_TRUE(stored["enabled"].asBool());
   EXPECT_THAT(query("SELECT msg FROM oauth_log"),
               ElementsAre("Application registed[Bob''s {} \"App\"]"));
+}
+
+// Nobody could learn the secret later.
+TEST_F(ClientTest, ShowsTheSecretEvenIfItCannotReadTheNumber) {
+  addClient('c');
+  execute(
+      "CREATE TRIGGER t AFTER INSERT ON oauth_clientInfo BEGIN DELETE FROM oauth_clientInfo; END");
+  const Words words = {"client",         "add",       "--name",  "n",
+                       "--redirect-uri", "a.example", "--scope", "r"};
+  const Outcome outcome = run(words);
+  EXPECT_EQ(1, outcome.code);
+  EXPECT_THAT(outcome.out, MatchesRegex("id            unknown\nclient_id     [0-9a-f]+\n"
+                                        "client_secret [0-9a-f]+\n"));
+  EXPECT_THAT(outcome.err,
+              MatchesRegex("oauthctl: the client is registered, but its number cannot be read: "
+                           "there is no client [0-9a-f]+\n"));
+  EXPECT_TRUE(json(words)["id"].isNull());
 }
 
 TEST_F(ClientTest, MakesADatabaseThatPassesTheCheck) {

@@ -67,6 +67,12 @@ TEST_F(HostileValuesTest, StayValidJson) {
   EXPECT_THAT(json({"log"})[0U]["msg"].asString(), HasSubstr("\x1b[31m"));
 }
 
+// JsonCpp's writer makes "\u0068" of the first two bytes.
+TEST_F(HostileValuesTest, BecomeNoOtherLetterInJson) {
+  plant("oauth_log", "msg", "\xC1\xA8 \xC3( \xFF");
+  EXPECT_THAT(run({"log", "--json"}).out, HasSubstr(R"("msg": "\ufffd\ufffd \ufffd( \ufffd")"));
+}
+
 TEST_F(HostileValuesTest, AreEscapedInComplaints) {
   EXPECT_EQ("1 there is no token with --user \\x1b[2J\\n\\u202e",
             complaint(run({"token", "list", "--user", "\x1b[2J\n" + kOverride})));

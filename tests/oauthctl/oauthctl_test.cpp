@@ -6,6 +6,7 @@
 #include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
+#include <termios.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -93,7 +94,8 @@ pid_t OauthctlTest::start(const Words& words, int in, int out, int err, bool asN
   setenv("OAUTHCTL_FOLDER", files_.directory().c_str(), 1);
   setenv("OAUTHCTL_NOW", std::to_string(clock_.now()).c_str(), 1);
   setenv("TZ", "UTC", 1);
-  unsetenv("NO_COLOR");
+  setenv("LC_ALL", "C.UTF-8", 1);
+  for (const char* const variable : {"NO_COLOR", "TERM"}) unsetenv(variable);
   skipLeakCheck(files_.directory());
   for (const std::string& variable : environment_)
     putenv(strdup(variable.c_str()));  // the new program inherits it
@@ -129,13 +131,18 @@ Outcome OauthctlTest::runOnTerminal(const Words& words, const std::string& typed
     throw std::runtime_error("no terminal");
   const pid_t child = start(words, slave, slave, slave, false);
   close(slave);
-  if (beforeTyping_) beforeTyping_();
   Outcome outcome;
   for (char c = 0; outcome.out.find(prompt) == std::string::npos && read(master, &c, 1) == 1;)
     outcome.out += c;
+  if (beforeTyping_) beforeTyping_();
   writeAll(master, typed);
-  outcome.out += readAll(master);
+  const int terminal = dup(master);
+  outcome.out += readAll(master);  // closes it
   outcome.code = exitOf(child);
+  termios settings = {};
+  EXPECT_EQ(0, tcgetattr(terminal, &settings));
+  close(terminal);
+  outcome.echo = (settings.c_lflag & static_cast<tcflag_t>(ECHO)) != 0;
   return outcome;
 }
 

@@ -21,6 +21,7 @@ constexpr std::int64_t kDay = 24 * 60 * 60;
 struct Outcome {
   int code = -1;  // the exit code, or 128 plus the signal
   std::string out, err;
+  bool echo = true;  // whether the terminal shows what is typed afterwards
 };
 
 // The arguments of one run.
@@ -66,7 +67,7 @@ class OauthctlTest : public StoreTest {
   void useRealCipher();
 
   std::vector<std::string> environment_;  // additional variables, as "NAME=value"
-  std::function<void()> beforeTyping_;    // called when the program has started
+  std::function<void()> beforeTyping_;    // called when the prompt has appeared
   std::function<void()> beforeExec_;      // called in the process of the program
 
  private:

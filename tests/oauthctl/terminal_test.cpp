@@ -36,6 +36,56 @@ TEST_F(TerminalTest, AsksBeforeItDeletes) {
   EXPECT_EQ(0, rowCount("oauth_token"));
 }
 
+TEST_F(TerminalTest, AsksWhoseTheRowIs) {
+  addClient('c');
+  addToken('a');
+  addCode('k', "bob");
+  EXPECT_THAT(runOnTerminal({"token", "revoke", "--id", "1"}, "n\n").out,
+              HasSubstr("Delete token 1 of alice for Photo album (1)? [y/N] "));
+  EXPECT_THAT(runOnTerminal({"code", "revoke", "--id", "1"}, "n\n").out,
+              HasSubstr("Delete code 1 of bob for Photo album (1)? [y/N] "));
+}
+
+// SQLite gives the number of a deleted row again.
+TEST_F(TerminalTest, DeletesNoRowThatCameInPlaceOfTheOneShown) {
+  addClient('c');
+  addToken('a');
+  addToken('b');
+  beforeTyping_ = [this] {
+    execute("DELETE FROM oauth_token WHERE id = 2");
+    addToken('d', "mallory");
+  };
+  const Outcome outcome = runOnTerminal({"token", "revoke", "--id", "2"}, "y\n", "[y/N] ");
+  EXPECT_EQ(1, outcome.code);
+  EXPECT_THAT(outcome.out,
+              HasSubstr("oauthctl: token 2 of alice for Photo album (1) was changed, replaced or "
+                        "deleted meanwhile, nothing changed\r\n"));
+  EXPECT_EQ((Lines{"1|alice", "2|mallory"}), query("SELECT id, username FROM oauth_token"));
+}
+
+TEST_F(TerminalTest, DeletesNoRowThatWasChangedMeanwhile) {
+  addCode('k');
+  beforeTyping_ = [this] { execute("UPDATE oauth_grantCode SET scope = 'write'"); };
+  EXPECT_EQ(1, runOnTerminal({"code", "revoke", "--id", "1"}, "y\n", "[y/N] ").code);
+  EXPECT_EQ(1, rowCount("oauth_grantCode"));
+}
+
+TEST_F(TerminalTest, DeletesNoClientThatCameInPlaceOfTheOneShown) {
+  addClient('c');
+  addToken('a');
+  beforeTyping_ = [this] {
+    execute("DELETE FROM oauth_clientInfo");
+    addClient('d', "Printer");
+  };
+  const Outcome outcome =
+      runOnTerminal({"client", "delete", "1", "--with-tokens"}, "y\n", "[y/N] ");
+  EXPECT_EQ(1, outcome.code);
+  EXPECT_THAT(outcome.out, HasSubstr("oauthctl: client 1, 'Photo album', was changed, replaced or "
+                                     "deleted meanwhile, nothing changed\r\n"));
+  EXPECT_EQ(1, rowCount("oauth_clientInfo"));
+  EXPECT_EQ(1, rowCount("oauth_token"));
+}
+
 TEST_F(TerminalTest, TakesAnEmptyAnswerForNo) {
   addToken('a');
   EXPECT_EQ(1, runOnTerminal({"token", "revoke", "--user", "alice"}, "\n").code);
@@ -71,6 +121,14 @@ TEST_F(TerminalTest, ReadsATokenWithoutEcho) {
   EXPECT_THAT(outcome.out, HasSubstr("access token: \r\nid "));
 }
 
+TEST_F(TerminalTest, ShowsWhatIsTypedAgainAfterASecret) {
+  addToken('a');
+  EXPECT_TRUE(runOnTerminal({"token", "verify"}, times(64, 'a') + "\n", "access token: ").echo);
+  const Outcome interrupted = runOnTerminal({"token", "verify"}, "aaa\x03", "access token: ");
+  EXPECT_EQ(128 + SIGINT, interrupted.code);
+  EXPECT_TRUE(interrupted.echo);
+}
+
 TEST_F(TerminalTest, ColoursTables) {
   addClient('c');
   EXPECT_THAT(runOnTerminal({"client", "list"}).out, HasSubstr(kEscape));
@@ -83,6 +141,24 @@ TEST_F(TerminalTest, ObeysNoColor) {
   EXPECT_THAT(runOnTerminal({"client", "list"}).out, Not(HasSubstr(kEscape)));
   environment_ = {"NO_COLOR="};
   EXPECT_THAT(runOnTerminal({"client", "list"}).out, HasSubstr(kEscape));
+}
+
+TEST_F(TerminalTest, SendsNoEscapeSequencesWhereTheyAreNotWanted) {
+  addExpiredTokens(700);
+  for (const char* const variable : {"NO_COLOR=1", "TERM=dumb"}) {
+    environment_ = {variable};
+    EXPECT_THAT(runOnTerminal({"token", "list"}).out, Not(HasSubstr("\x1b"))) << variable;
+  }
+  const Outcome outcome = runOnTerminal({"token", "purge", "--grace", "0", "--yes"});
+  EXPECT_EQ("deleted 700 tokens, 0 left\r\n", outcome.out);
+}
+
+TEST_F(TerminalTest, SendsOnlyAsciiWhereTheLocaleHasNothingElse) {
+  addClient('c', "Caf\xC3\xA9");
+  environment_ = {"LC_ALL=C"};
+  EXPECT_THAT(run({"client", "list"}).out, HasSubstr(" 1 Caf\\u00e9 yes "));
+  environment_ = {"LC_ALL=de_DE.UTF-8"};  // no locale of this name is installed
+  EXPECT_THAT(run({"client", "list"}).out, HasSubstr(" 1 Caf\xC3\xA9"));
 }
 
 TEST_F(TerminalTest, ShowsProgressOfLongWork) {

@@ -138,6 +138,13 @@ INSTANTIATE_TEST_SUITE_P(
                 "2 --redirect-uri must have 3 to 2048 bytes, not 2"},
         Mistake{{"client", "add", "--name", "a\nb", "--redirect-uri", "a.example", "--scope", "r"},
                 "2 --name holds a control character"},
+        Mistake{{"log", "--match", "x", "clear", "--yes"},
+                "2 'oauthctl log clear' does not take --match (see 'oauthctl log clear --help')"},
+        Mistake{{"log", "--json", "clear", "--yes"},
+                "2 'oauthctl log clear' does not take --json (see 'oauthctl log clear --help')"},
+        Mistake{{"log", "clear", "--match", "x", "--yes"},
+                "2 The following arguments were not expected: x --match (see 'oauthctl log clear "
+                "--help')"},
         Mistake{{"backup", ""}, "2 FILE is empty"}));
 
 TEST_F(UsageTest, KeepsTheCompletionCurrent) {

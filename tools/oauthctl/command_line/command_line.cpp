@@ -51,6 +51,15 @@ std::string fullName(const CLI::App& parser) {
   throw Failure(ExitCode::kUsage, problem + " (see '" + fullName(parser) + " --help')");
 }
 
+// The parser takes the options of "log" before the word "clear", too. There they would have no
+// effect.
+void requireOwnOptions(const CLI::App& parser) {
+  for (const CLI::App* above = parser.get_parent(); above != nullptr; above = above->get_parent())
+    for (const CLI::Option* const option : above->get_options())
+      if (option->count() > 0)
+        throwUsage(parser, "'" + fullName(parser) + "' does not take " + option->get_name());
+}
+
 void requireOneOf(const CLI::App& parser, const Command& command, const Invocation& invocation) {
   std::string names;
   int given = 0;
@@ -110,6 +119,7 @@ std::optional<Request> parseCommandLine(int argc, char** argv, std::string& outp
   CLI::App* const parser = chosenParser(program);
   const auto command = parsers.find(parser);
   if (command == parsers.end()) throwUsage(*parser, "a command is missing");
+  requireOwnOptions(*parser);
   Request request{command->second, valuesOf(*parser, *command->second)};
   requireOneOf(*parser, *command->second, request.invocation);
   return request;

@@ -102,6 +102,18 @@ void setEnabled(const Invocation& invocation, bool enabled) {
   say("client " + row[column::kId].asString() + (enabled ? " is enabled" : " is disabled"));
 }
 
+// Throws unless the client's row is still what was read before. Its number may be another client's.
+void requireUnchanged(Database& database, const Json::Value& row) {
+  Json::Value condition;
+  condition[column::kId] = row[column::kId];
+  const Json::Value now = database.rows(names::table::kClientInfo, condition);
+  if (now.size() != 1 || now[0U] != row)
+    throw Failure(ExitCode::kAttention,
+                  "client " + row[column::kId].asString() + ", '" +
+                      originalText(row[column::kDisplayName].asString()) +
+                      "', was changed, replaced or deleted meanwhile, nothing changed");
+}
+
 std::string grantsText(int codes, int tokens) {
   return countText(codes, kCodes) + " and " + countText(tokens, kTokens);
 }
@@ -166,19 +178,29 @@ void addClient(const Invocation& invocation) {
   requireDatabase(Access::kMake);
   const std::string secret = secretFromInput(invocation);
   const Credentials added = registerClient(invocation, secret);
-  Database database(Access::kRead);
-  const Json::Value id = findClient(database, added.identifier)[column::kId];
+  // Nobody else has the secret: print it, whatever happens now.
+  Json::Value id;
+  std::string problem;
+  try {
+    Database database(Access::kRead);
+    id = idValue(findClient(database, added.identifier));
+  } catch (const Failure& failure) {
+    problem = failure.what();
+  }
   if (invocation.has("--json")) {
     Json::Value document;
-    document["id"] =
-        static_cast<Json::Int64>(ZEVOOAUTHSERVER::decimalNumber(id.asString()).value_or(0));
+    document["id"] = id;
     document["client_id"] = added.identifier;
     document["client_secret"] = added.secret;
     printJson(document);
-    return;
+  } else {
+    printPairs({{"id", problem.empty() ? id.asString() : "unknown"},
+                {"client_id", added.identifier},
+                {"client_secret", added.secret}});
   }
-  printPairs(
-      {{"id", id.asString()}, {"client_id", added.identifier}, {"client_secret", added.secret}});
+  if (!problem.empty())
+    throw Failure(ExitCode::kAttention,
+                  "the client is registered, but its number cannot be read: " + problem);
 }
 
 // Changes only the columns given: another process may change the others meanwhile.
@@ -190,9 +212,11 @@ void editClient(const Invocation& invocation) {
   if (modified.isNull())
     throw Failure(ExitCode::kUsage, "nothing to change: give --name, --redirect-uri or --scope");
   Database database(Access::kWrite);
-  const Json::Value row = findClient(database, invocation.value("CLIENT"));
-  if (!database.edit(names::table::kClientInfo, idForChange(row), modified))
-    throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
+  Json::Value row;
+  database.inTransaction([&] {
+    row = findClient(database, invocation.value("CLIENT"));
+    database.edit(names::table::kClientInfo, idForChange(row), modified);
+  });
   say("client " + row[column::kId].asString() + " is changed");
 }
 
@@ -213,8 +237,8 @@ void deleteClient(const Invocation& invocation) {
                           "?");
   int codes = 0, tokens = 0;
   database.inTransaction([&] {
-    if (!database.remove(names::table::kClientInfo, id))
-      throw Failure(ExitCode::kAttention, "the client was deleted meanwhile");
+    requireUnchanged(database, row);
+    database.remove(names::table::kClientInfo, id);
     if (!withTokens) return;
     codes = removeOfClient(database, kCodes, identifier);
     tokens = removeOfClient(database, kTokens, identifier);

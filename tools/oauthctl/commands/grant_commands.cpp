@@ -62,19 +62,31 @@ std::string conditionText(const Invocation& invocation) {
                 std::string("there is no ") + kind.singular + " with" + conditionText(invocation));
 }
 
+struct Removal {
+  int removed = 0, left = 0;  // rows
+};
+
 // Deletes the rows that pass the test under the write lock. There may be more of them than were
 // counted before.
-int removeRows(Database& database, const GrantKind& kind, const RowTest& test) {
-  int removed = 0;
+Removal removeRows(Database& database, const GrantKind& kind, const RowTest& test) {
+  Removal removal;
   database.inTransaction([&] {
     const Json::Value rows = rowsThatPass(test, database.rows(kind.table));
     Progress progress(std::string("deleting ") + kind.plural, rows.size());
     for (const Json::Value& row : rows) {
-      removed += database.remove(kind.table, idForChange(row)) ? 1 : 0;
-      progress.update(static_cast<std::size_t>(removed));
+      removal.removed += database.remove(kind.table, idForChange(row)) ? 1 : 0;
+      progress.update(static_cast<std::size_t>(removal.removed));
     }
+    removal.left = database.rowCount(kind.table);
   });
-  return removed;
+  return removal;
+}
+
+// "token 2 of alice for Photo album (1)"
+std::string describe(const GrantKind& kind, const Json::Value& row, const Registry& registry) {
+  return std::string(kind.singular) + " " + row[column::kId].asString() + " of " +
+         originalText(row[column::kUserName].asString()) + " for " +
+         registry.describe(row[column::kClientId].asString());
 }
 
 void printGrants(const GrantKind& kind, const Json::Value& rows, const Registry& registry,
@@ -118,14 +130,30 @@ void listGrants(const GrantKind& kind, const Invocation& invocation) {
   if (!invocation.has("--json")) say(std::string("no ") + kind.plural);
 }
 
+// A number is given again once its row is deleted. So the row must still be the one that was shown.
+void revokeShown(Database& database, const GrantKind& kind, const Invocation& invocation,
+                 const Json::Value& shown) {
+  const std::string description = describe(kind, shown, Registry(database));
+  confirm(invocation, "Delete " + description + "?");
+  const auto isShown = [&](const Json::Value& row) { return row == shown; };
+  if (removeRows(database, kind, isShown).removed == 0)
+    throw Failure(ExitCode::kAttention,
+                  description + " was changed, replaced or deleted meanwhile, nothing changed");
+  say("deleted " + countText(1, kind));
+}
+
 void revokeGrants(const GrantKind& kind, const Invocation& invocation) {
   Database database(Access::kWrite);
   const RowTest test = conditionTest(database, invocation);
   const Json::Value rows = rowsThatPass(test, database.rows(kind.table));
   if (rows.empty()) throwNone(kind, invocation);
+  if (invocation.has("--id")) {
+    revokeShown(database, kind, invocation, rows[0U]);
+    return;
+  }
   confirm(invocation,
           "Delete " + countText(rows.size(), kind) + " with" + conditionText(invocation) + "?");
-  const int removed = removeRows(database, kind, test);
+  const int removed = removeRows(database, kind, test).removed;
   if (removed == 0) throwNone(kind, invocation);
   say("deleted " + countText(removed, kind));
 }
@@ -156,8 +184,8 @@ void purgeGrants(const GrantKind& kind, const Invocation& invocation) {
     return;
   }
   confirm(invocation, "Delete " + what + "?");
-  const int removed = removeRows(database, kind, test);
-  say("deleted " + countText(removed, kind) + ", " + std::to_string(database.rowCount(kind.table)) +
+  const Removal removal = removeRows(database, kind, test);
+  say("deleted " + countText(removal.removed, kind) + ", " + std::to_string(removal.left) +
       " left");
 }
 

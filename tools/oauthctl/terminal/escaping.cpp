@@ -91,12 +91,30 @@ std::string escaped(const std::string& text) {
   return result;
 }
 
+std::string validUtf8(const std::string& text) {
+  constexpr char kReplacement[] = "\xEF\xBF\xBD";
+  std::string result;
+  const char* const end = text.data() + text.size();
+  for (const char* at = text.data(); at != end;) {
+    const int length = firstCharacter(at, end).length;
+    if (length == 0)
+      result += kReplacement;
+    else
+      result.append(at, static_cast<std::size_t>(length));
+    at += length == 0 ? 1 : length;
+  }
+  return result;
+}
+
 std::string masked(const std::string& secret, bool show) {
   constexpr std::size_t kShown = 4, kLongEnough = 32;
   if (show) return secret;
   return (secret.size() < kLongEnough ? std::string() : secret.substr(0, kShown)) + "...";
 }
 
-void useTextEncoding() { std::setlocale(LC_CTYPE, "C.UTF-8"); }
+void useTextEncoding() {
+  // A small system has not installed every locale that a terminal asks for.
+  if (std::setlocale(LC_CTYPE, "") == nullptr) std::setlocale(LC_CTYPE, "C.UTF-8");
+}
 
 }  // namespace oauthctl

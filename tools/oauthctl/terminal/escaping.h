@@ -12,10 +12,14 @@ namespace oauthctl {
 // terminal's encoding is not UTF-8, every character beyond ASCII is escaped.
 std::string escaped(const std::string& text);
 
+// The text with U+FFFD, the replacement character, for each byte that is not valid UTF-8.
+std::string validUtf8(const std::string& text);
+
 // The secret, or unless it is to be shown only its beginning: enough to tell two of them apart.
 std::string masked(const std::string& secret, bool show);
 
-// Sets the character encoding that escaped() and the tables use. main() calls it once.
+// Sets the character encoding of escaped() and the tables: that of the operator's locale, or UTF-8
+// if the system does not have that locale. main() calls it once.
 void useTextEncoding();
 
 }  // namespace oauthctl

@@ -2,6 +2,7 @@
 
 #include <json/writer.h>
 #include <libsmartcols.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cstdio>
@@ -35,6 +36,19 @@ const char* colourOf(Tone tone) {
   }
 }
 
+// The writer would make another letter of some invalid bytes.
+Json::Value withValidTexts(const Json::Value& document) {
+  if (document.isString()) return validUtf8(document.asString());
+  Json::Value result = document;
+  if (document.isArray())
+    for (Json::Value& element : result) element = withValidTexts(element);
+  if (!document.isObject()) return result;
+  result = Json::Value(Json::objectValue);
+  for (const std::string& name : document.getMemberNames())
+    result[validUtf8(name)] = withValidTexts(document[name]);
+  return result;
+}
+
 std::string cellText(const std::string& text) { return text.empty() ? "-" : escaped(text); }
 
 }  // namespace
@@ -42,7 +56,8 @@ std::string cellText(const std::string& text) { return text.empty() ? "-" : esca
 void Table::print() const {
   if (rows_.empty()) return;
   const std::unique_ptr<libscols_table, FreeTable> table(orBadAlloc(scols_new_table()));
-  scols_table_enable_colors(table.get(), wantsColour() ? 1 : 0);
+  scols_table_enable_colors(table.get(),
+                            isatty(STDOUT_FILENO) != 0 && takesEscapeSequences() ? 1 : 0);
   // Cells are escaped already.
   scols_table_enable_noencoding(table.get(), 1);
   bool headings = false;
@@ -73,7 +88,7 @@ void printJson(const Json::Value& document) {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "  ";
   builder["enableYAMLCompatibility"] = true;  // "key": value
-  std::string text = Json::writeString(builder, document);
+  std::string text = Json::writeString(builder, withValidTexts(document));
   // The writer escapes every other control character.
   for (std::size_t at = 0; (at = text.find('\x7f', at)) != std::string::npos;)
     text.replace(at, 1, "\\u007f");

@@ -3,8 +3,11 @@
 #include <termios.h>
 #include <unistd.h>
 
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
+#include <iterator>
 #include <utility>
 
 #include "terminal/escaping.h"
@@ -28,30 +31,53 @@ bool readLine(std::string& line) {
   return true;
 }
 
+constexpr int kEndingSignals[] = {SIGINT, SIGQUIT, SIGTERM, SIGHUP};
+termios settingsBefore;
+
+// The signal has its usual effect when it comes again.
+void restoreAndEnd(int signal) {
+  tcsetattr(STDIN_FILENO, TCSAFLUSH, &settingsBefore);
+  raise(signal);
+}
+
+// The terminal does not show what is typed during the life of the object.
 class EchoOff {
  public:
   EchoOff() {
-    if (tcgetattr(STDIN_FILENO, &before_) != 0) return;
-    termios silent = before_;
+    if (tcgetattr(STDIN_FILENO, &settingsBefore) != 0) return;
+    changed_ = true;
+    struct sigaction action = {};
+    action.sa_handler = restoreAndEnd;
+    action.sa_flags = static_cast<int>(SA_RESETHAND);
+    for (std::size_t i = 0; i < std::size(kEndingSignals); ++i) {
+      sigaction(kEndingSignals[i], &action, &actionsBefore_[i]);
+      if (actionsBefore_[i].sa_handler == SIG_IGN)
+        sigaction(kEndingSignals[i], &actionsBefore_[i], nullptr);
+    }
+    termios silent = settingsBefore;
     silent.c_lflag &= ~static_cast<tcflag_t>(ECHO);
-    changed_ = tcsetattr(STDIN_FILENO, TCSAFLUSH, &silent) == 0;
+    tcsetattr(STDIN_FILENO, TCSAFLUSH, &silent);
   }
   ~EchoOff() {
-    if (changed_) tcsetattr(STDIN_FILENO, TCSAFLUSH, &before_);
+    if (!changed_) return;
+    tcsetattr(STDIN_FILENO, TCSAFLUSH, &settingsBefore);
+    for (std::size_t i = 0; i < std::size(kEndingSignals); ++i)
+      sigaction(kEndingSignals[i], &actionsBefore_[i], nullptr);
   }
   EchoOff(const EchoOff&) = delete;
   EchoOff& operator=(const EchoOff&) = delete;
 
  private:
-  termios before_ = {};
   bool changed_ = false;
+  struct sigaction actionsBefore_[std::size(kEndingSignals)] = {};
 };
 
 }  // namespace
 
-bool wantsColour() {
-  const char* const no = std::getenv("NO_COLOR");
-  return isatty(STDOUT_FILENO) != 0 && (no == nullptr || *no == '\0');
+bool takesEscapeSequences() {
+  const char *const noColor = std::getenv("NO_COLOR"), *const type = std::getenv("TERM");
+  return (noColor == nullptr || *noColor == '\0') &&
+         (type == nullptr || std::strcmp(type, "dumb") != 0);
 }
 
 void say(const std::string& line) { std::printf("%s\n", escaped(line).c_str()); }
@@ -89,7 +115,7 @@ constexpr std::size_t kLongWork = 500;  // steps; shorter work ends before anybo
 Progress::Progress(std::string label, std::size_t total)
     : label_(std::move(label)),
       total_(total),
-      visible_(total >= kLongWork && isatty(STDERR_FILENO) != 0),
+      visible_(total >= kLongWork && isatty(STDERR_FILENO) != 0 && takesEscapeSequences()),
       next_(std::chrono::steady_clock::now()) {}
 
 Progress::~Progress() {

@@ -10,8 +10,8 @@
 
 namespace oauthctl {
 
-// Whether standard output is a terminal, and NO_COLOR is unset or empty.
-bool wantsColour();
+// Whether a terminal may get escape sequences: not if TERM is "dumb" or NO_COLOR is set.
+bool takesEscapeSequences();
 
 // Writes one line to standard output, escaped.
 void say(const std::string& line);
@@ -20,12 +20,13 @@ void say(const std::string& line);
 // otherwise, and where there is nobody to ask.
 void confirm(const Invocation& invocation, const std::string& question);
 
-// Reads a secret from standard input, without its line end. A terminal does not show what is typed.
+// Reads a secret from standard input, without its line end. A terminal does not show what is typed,
+// and shows it again when the program ends, also by Ctrl-C.
 // Throws if there is no secret, or if it holds a NUL byte.
 std::string readSecret(const std::string& prompt);
 
-// Shows the progress of long work on standard error, if that is a terminal. The destructor erases
-// the line.
+// Shows the progress of long work on standard error, if that is a terminal that takes escape
+// sequences. The destructor erases the line.
 class Progress {
  public:
   Progress(std::string label, std::size_t total);
