@@ -79,8 +79,8 @@ fi
 tests=$(scripts/build.sh dev dev | tail -n 1)
 folder=$(scripts/build.sh coverage coverage -- zevooauth | tail -n 1)
 find "$folder" -name '*.gcda' -delete
-LD_LIBRARY_PATH=$folder scripts/lib/run-test-programs.sh "$tests" "${user[@]}"
-echo "check: tests pass in any order, in a few processes, for an ordinary user"
+LD_LIBRARY_PATH=$folder scripts/lib/run-test-programs.sh "$tests" 1 "${user[@]}"
+echo "check: tests pass in any order, in one process, for an ordinary user"
 # Do not count the branch that the compiler adds after each call for a possible exception.
 gcovr --root . --filter src/ --exclude-throw-branches --exclude-unreachable-branches \
   --print-summary --fail-under-branch "$required_branches" "$folder/CMakeFiles/zevooauth.dir"

@@ -15,7 +15,7 @@ native=$(scripts/build.sh dev dev | tail -n 1)
 folder=$(scripts/build.sh powerpc powerpc -DPOWERPC_LIBRARIES="$libraries" | tail -n 1)
 
 # The emulator takes long to start, so all tests of a program share a few processes.
-scripts/lib/run-test-programs.sh "$folder" qemu-ppc -L /usr/powerpc-linux-gnu
+scripts/lib/run-test-programs.sh "$folder" "$(nproc)" qemu-ppc -L /usr/powerpc-linux-gnu
 ctest --test-dir "$folder" --output-on-failure --parallel "$(nproc)" --label-exclude 'rule|slow'
 
 here="$native/tests/database_exchange"

@@ -10,6 +10,7 @@
 set -euo pipefail
 cd "$(dirname "$(readlink -f "$0")")/../.."
 
+trap '[ $? -eq 0 ] || echo "powerpc-libraries: failed" >&2' EXIT
 host=powerpc-linux-gnu
 mkdir -p "$1"
 prefix=$(cd "$1" && pwd)

@@ -1,20 +1,19 @@
 #!/usr/bin/env bash
-# Runs the test programs of a build, with the tests of each program in any order. Each program runs
-# in as many processes as there are cores, except one that starts many processes itself.
+# Runs the test programs of a build, with the tests of each program in any order.
 #
-#   scripts/lib/run-test-programs.sh FOLDER [COMMAND...]
+#   scripts/lib/run-test-programs.sh FOLDER PROCESSES [COMMAND...]
 #
-# FOLDER has the build. COMMAND, for example an emulator, starts each program.
+# FOLDER has the build. The tests of a program are divided among this number of processes. COMMAND,
+# for example an emulator, starts each of them.
 set -euo pipefail
 
-if [ $# -eq 0 ]; then
-  echo "usage: scripts/lib/run-test-programs.sh FOLDER [COMMAND...]" >&2
+if [ $# -lt 2 ]; then
+  echo "usage: scripts/lib/run-test-programs.sh FOLDER PROCESSES [COMMAND...]" >&2
   exit 2
 fi
 cd "$1"
-shift
-export shards
-shards=$(nproc)
+export shards=$2
+shift 2
 
 run_shard() { # [COMMAND...] PROGRAM SHARD: prints the program's output only if it fails
   local log=${*: -2:1}.${*: -1}.log
@@ -29,6 +28,6 @@ for program in tests/*_test; do
   for ((shard = 0; shard < shards; ++shard)); do
     printf '%s\0' "$program" "$shard"
   done
-done | xargs --null --max-procs=$((3 * shards)) --max-args=2 \
+done | xargs --null --max-procs=$((3 * $(nproc))) --max-args=2 \
   bash -euo pipefail -c 'run_shard "$@"' run-shard "$@"
 shards=1 run_shard "$@" "$alone" 0

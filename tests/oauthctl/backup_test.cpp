@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <sqlite3.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -251,6 +250,27 @@ TEST_P(InterruptedTest, SucceedsWithoutInterruption) {
               ElementsAre("copy.db", "oauth.db", "oauth.db.before-restore-20231114-221320"));
 }
 
+TEST_P(InterruptedTest, LeavesARuinedDatabaseInItsPlace) {
+  ASSERT_EQ(0, run({"backup", copy_}).code);
+  std::ofstream(files_.database(), std::ios::binary) << times(9000, 'x');
+  environment_.emplace_back("OAUTHCTL_INTERRUPT=1");
+  EXPECT_EQ(128 + SIGINT, run({"restore", copy_, "--yes"}).code);
+  EXPECT_EQ(times(9000, 'x'), databaseBytes());
+  EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));
+}
+
+// Shows that the command above fails only because of the interruption.
+TEST_P(InterruptedTest, ReplacesARuinedDatabaseWithoutInterruption) {
+  ASSERT_EQ(0, run({"backup", copy_}).code);
+  std::ofstream(files_.database(), std::ios::binary) << times(9000, 'x');
+  EXPECT_EQ(0, run({"restore", copy_, "--yes"}).code);
+  EXPECT_EQ(rowsIn(copy_), rowsIn(files_.database()));
+  EXPECT_EQ(0600U, modeOf(files_.database()));
+  EXPECT_EQ(times(9000, 'x'), bytesOf(path("oauth.db.before-restore-20231114-221320")));
+  EXPECT_THAT(fileNames(),
+              ElementsAre("copy.db", "oauth.db", "oauth.db.before-restore-20231114-221320"));
+}
+
 INSTANTIATE_TEST_SUITE_P(Machines, InterruptedTest,
                          testing::Values(Lines{}, Lines{"OAUTHCTL_NO_TMPFILE=1"},
                                          Lines{"OAUTHCTL_NO_TMPFILE=1", "OAUTHCTL_NO_PROC=1"}));
@@ -455,15 +475,10 @@ TEST_F(RestoreTest, ReplacesAFileThatIsNoDatabase) {
   EXPECT_EQ(times(9000, 'x'), bytesOf(kept_));
 }
 
-// The limit takes the place of a full disk.
-TEST_F(RestoreTest, LeavesARuinedFileIfTheNewOneCannotBeWritten) {
+TEST_F(RestoreTest, LeavesARuinedFileIfTheDiskIsFull) {
   std::ofstream(files_.database(), std::ios::binary) << times(9000, 'x');
-  beforeExec_ = [] {
-    const rlimit limit = {8192, 8192};
-    signal(SIGXFSZ, SIG_IGN);
-    setrlimit(RLIMIT_FSIZE, &limit);
-  };
-  EXPECT_EQ("1 cannot write " + files_.database() + ": File too large",
+  environment_ = {"OAUTHCTL_FULL_DISK=1"};
+  EXPECT_EQ("1 cannot write " + files_.database() + ": No space left on device",
             complaint(run({"restore", copy_, "--yes"})));
   EXPECT_EQ(times(9000, 'x'), databaseBytes());
   EXPECT_THAT(fileNames(), ElementsAre("copy.db", "oauth.db"));

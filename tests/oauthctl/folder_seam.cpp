@@ -7,6 +7,7 @@
 #include <grp.h>
 #include <sqlite3.h>
 #include <sys/prctl.h>
+#include <sys/stat.h>
 #include <sys/time.h>
 #include <unistd.h>
 
@@ -117,6 +118,17 @@ extern "C" int linkat(int from, const char* path, int to, const char* name, int 
     return -1;
   }
   return next("linkat", linkat)(from, path, to, name, flags);
+}
+
+// With OAUTHCTL_FULL_DISK, behaves as if the disk were full.
+extern "C" ssize_t write(int descriptor, const void* bytes, std::size_t count) {
+  struct stat status;
+  if (std::getenv("OAUTHCTL_FULL_DISK") != nullptr && fstat(descriptor, &status) == 0 &&
+      S_ISREG(status.st_mode)) {
+    errno = ENOSPC;
+    return -1;
+  }
+  return next("write", write)(descriptor, bytes, count);
 }
 
 // Runs after a file is written and before it is named: waits for the file OAUTHCTL_HOLD, if that is

@@ -67,7 +67,7 @@ class OauthctlTest : public StoreTest {
   void useRealCipher();
 
   std::vector<std::string> environment_;  // additional variables, as "NAME=value"
-  std::function<void()> beforeTyping_;    // called when the prompt has appeared
+  std::function<void()> beforeTyping_;    // called after the prompt, before the text is typed
   std::function<void()> beforeExec_;      // called in the process of the program
 
  private:

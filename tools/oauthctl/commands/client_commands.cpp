@@ -78,6 +78,21 @@ Credentials registerClient(const Invocation& invocation, const std::string& secr
   return {added[column::kClientId].asString(), added[column::kClientSecret].asString()};
 }
 
+// The number is null if it could not be read.
+void printAdded(const Json::Value& number, const Credentials& added, bool asJson) {
+  if (!asJson) {
+    printPairs({{"id", number.isNull() ? "unknown" : number.asString()},
+                {"client_id", added.identifier},
+                {"client_secret", added.secret}});
+    return;
+  }
+  Json::Value document;
+  document["id"] = number;
+  document["client_id"] = added.identifier;
+  document["client_secret"] = added.secret;
+  printJson(document);
+}
+
 // The secret from standard input, "" if the library is to make one.
 std::string secretFromInput(const Invocation& invocation) {
   if (!invocation.has("--secret-from-stdin")) return {};
@@ -102,16 +117,18 @@ void setEnabled(const Invocation& invocation, bool enabled) {
   say("client " + row[column::kId].asString() + (enabled ? " is enabled" : " is disabled"));
 }
 
+// "client 3, 'Photo album'"
+std::string describe(const Json::Value& row) {
+  return "client " + row[column::kId].asString() + ", '" +
+         originalText(row[column::kDisplayName].asString()) + "'";
+}
+
 // Throws unless the client's row is still what was read before. Its number may be another client's.
 void requireUnchanged(Database& database, const Json::Value& row) {
   Json::Value condition;
   condition[column::kId] = row[column::kId];
   const Json::Value now = database.rows(names::table::kClientInfo, condition);
-  if (now.size() != 1 || now[0U] != row)
-    throw Failure(ExitCode::kAttention,
-                  "client " + row[column::kId].asString() + ", '" +
-                      originalText(row[column::kDisplayName].asString()) +
-                      "', was changed, replaced or deleted meanwhile, nothing changed");
+  if (now.size() != 1 || now[0U] != row) throwChangedMeanwhile(describe(row) + ",");
 }
 
 std::string grantsText(int codes, int tokens) {
@@ -187,17 +204,7 @@ void addClient(const Invocation& invocation) {
   } catch (const Failure& failure) {
     problem = failure.what();
   }
-  if (invocation.has("--json")) {
-    Json::Value document;
-    document["id"] = id;
-    document["client_id"] = added.identifier;
-    document["client_secret"] = added.secret;
-    printJson(document);
-  } else {
-    printPairs({{"id", problem.empty() ? id.asString() : "unknown"},
-                {"client_id", added.identifier},
-                {"client_secret", added.secret}});
-  }
+  printAdded(id, added, invocation.has("--json"));
   if (!problem.empty())
     throw Failure(ExitCode::kAttention,
                   "the client is registered, but its number cannot be read: " + problem);
@@ -231,8 +238,7 @@ void deleteClient(const Invocation& invocation) {
   const bool withTokens = invocation.has("--with-tokens");
   const std::string held = grantsText(countOfClient(database, kCodes, identifier),
                                       countOfClient(database, kTokens, identifier));
-  confirm(invocation, "Delete client " + row[column::kId].asString() + ", '" +
-                          originalText(row[column::kDisplayName].asString()) + "'" +
+  confirm(invocation, "Delete " + describe(row) +
                           (withTokens ? ", with its " + held : "; its " + held + " stay valid") +
                           "?");
   int codes = 0, tokens = 0;

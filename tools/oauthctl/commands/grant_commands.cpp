@@ -136,9 +136,7 @@ void revokeShown(Database& database, const GrantKind& kind, const Invocation& in
   const std::string description = describe(kind, shown, Registry(database));
   confirm(invocation, "Delete " + description + "?");
   const auto isShown = [&](const Json::Value& row) { return row == shown; };
-  if (removeRows(database, kind, isShown).removed == 0)
-    throw Failure(ExitCode::kAttention,
-                  description + " was changed, replaced or deleted meanwhile, nothing changed");
+  if (removeRows(database, kind, isShown).removed == 0) throwChangedMeanwhile(description);
   say("deleted " + countText(1, kind));
 }
 

@@ -35,6 +35,11 @@ bool attempt(OAUTHDBBasic& store, const std::string& operation, const std::funct
   throwReason(store, operation);
 }
 
+void throwChangedMeanwhile(const std::string& text) {
+  throw Failure(ExitCode::kAttention,
+                text + " was changed, replaced or deleted meanwhile, nothing changed");
+}
+
 Database::Database(Access access) {
   requireDatabase(access);
   store_ = std::make_unique<OAUTHDBBasic>();

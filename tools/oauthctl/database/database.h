@@ -26,6 +26,9 @@ void requireReady(const ZEVOOAUTHSERVER::OAUTHDBBasic& store);
 bool attempt(ZEVOOAUTHSERVER::OAUTHDBBasic& store, const std::string& operation,
              const std::function<bool()>& body);
 
+// Throws the Failure for a row that is not the one that was read before. The text names that one.
+[[noreturn]] void throwChangedMeanwhile(const std::string& text);
+
 class Database {
  public:
   explicit Database(Access access);

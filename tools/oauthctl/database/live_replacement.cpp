@@ -61,7 +61,8 @@ void copyBytes(const Descriptor& from, NewFile& to, const std::string& path) {
   }
 }
 
-bool rename(const std::string& from, const std::string& to) {
+// Renames a file of the folder. Never replaces another one.
+bool renameToFree(const std::string& from, const std::string& to) {
   return renameat2(folder(), from.c_str(), folder(), to.c_str(), RENAME_NOREPLACE) == 0 ||
          // An older kernel or file system does not know the flag: give a second name, then remove
          // the first.
@@ -76,20 +77,20 @@ void keepAside(const std::string& kept) {
   const Descriptor damaged = openLive();
   if (!damaged.isOpen()) throwCannotKeep(kept);
   if (linkat(folder(), liveName().c_str(), folder(), nameOf(kept).c_str(), 0) != 0 &&
-      !rename(liveName(), nameOf(kept)))
+      !renameToFree(liveName(), nameOf(kept)))
     throwCannotKeep(kept);
   fchmod(damaged.value(), S_IRUSR | S_IWUSR);
-  rename(liveName() + "-journal", nameOf(kept) + "-journal");
+  renameToFree(liveName() + "-journal", nameOf(kept) + "-journal");
 }
 
-// Undoes keepAside(), unless another file has the name by now. Returns whether it did.
+// Undoes keepAside(), unless another file has the name by now. Returns whether it was undone.
 bool putBack(const std::string& kept) {
   const auto live = DatabaseFolder::enter().lstatOf(liveName());
   const auto old = DatabaseFolder::enter().lstatOf(nameOf(kept));
   if (!old || (live && (live->st_dev != old->st_dev || live->st_ino != old->st_ino))) return false;
-  const bool done =
-      live ? unlinkat(folder(), nameOf(kept).c_str(), 0) == 0 : rename(nameOf(kept), liveName());
-  if (done) rename(nameOf(kept) + "-journal", liveName() + "-journal");
+  const bool done = live ? unlinkat(folder(), nameOf(kept).c_str(), 0) == 0
+                         : renameToFree(nameOf(kept), liveName());
+  if (done) renameToFree(nameOf(kept) + "-journal", liveName() + "-journal");
   return done;
 }
 

@@ -34,10 +34,10 @@ class NewFile {
   void append(const std::string& bytes) { append(bytes.data(), bytes.size()); }
   // Reads the file again.
   std::string contents() const;
-  // Writes the contents to the disk. Afterwards only the name is missing.
+  // Writes the contents to the disk.
   void bringToDisk() const;
-  // Does that, and gives the file its name. Throws if the name has been taken and the file there is
-  // not to be replaced. A replaced file has the name until the new one has it.
+  // Writes the contents to the disk and gives the file its name. Throws if the name has been taken,
+  // unless that file is to be replaced: then the name is never without a file.
   void publish();
 
  private:
@@ -56,8 +56,8 @@ class NewFile {
   const Ids maker_;
   const ZEVOOAUTHSERVER::Descriptor folder_;
   ZEVOOAUTHSERVER::Descriptor file_;
-  // The temporary name, if the file system cannot make a file without a name. Signals that end the
-  // program are blocked until that name is gone.
+  // The temporary name, if the file system cannot make a file without a name, or if a file is
+  // replaced. Signals that end the program are blocked until that name is gone.
   std::string temporary_;
   sigset_t signalsBefore_ = {};
 };

@@ -32,7 +32,7 @@ bool readLine(std::string& line) {
 }
 
 constexpr int kEndingSignals[] = {SIGINT, SIGQUIT, SIGTERM, SIGHUP};
-termios settingsBefore;
+termios settingsBefore;  // of the terminal, for restoreAndEnd()
 
 // The signal has its usual effect when it comes again.
 void restoreAndEnd(int signal) {
@@ -45,13 +45,13 @@ class EchoOff {
  public:
   EchoOff() {
     if (tcgetattr(STDIN_FILENO, &settingsBefore) != 0) return;
-    changed_ = true;
+    isTerminal_ = true;
     struct sigaction action = {};
     action.sa_handler = restoreAndEnd;
     action.sa_flags = static_cast<int>(SA_RESETHAND);
     for (std::size_t i = 0; i < std::size(kEndingSignals); ++i) {
       sigaction(kEndingSignals[i], &action, &actionsBefore_[i]);
-      if (actionsBefore_[i].sa_handler == SIG_IGN)
+      if (actionsBefore_[i].sa_handler == SIG_IGN)  // an ignored signal stays ignored
         sigaction(kEndingSignals[i], &actionsBefore_[i], nullptr);
     }
     termios silent = settingsBefore;
@@ -59,7 +59,7 @@ class EchoOff {
     tcsetattr(STDIN_FILENO, TCSAFLUSH, &silent);
   }
   ~EchoOff() {
-    if (!changed_) return;
+    if (!isTerminal_) return;
     tcsetattr(STDIN_FILENO, TCSAFLUSH, &settingsBefore);
     for (std::size_t i = 0; i < std::size(kEndingSignals); ++i)
       sigaction(kEndingSignals[i], &actionsBefore_[i], nullptr);
@@ -68,7 +68,7 @@ class EchoOff {
   EchoOff& operator=(const EchoOff&) = delete;
 
  private:
-  bool changed_ = false;
+  bool isTerminal_ = false;
   struct sigaction actionsBefore_[std::size(kEndingSignals)] = {};
 };
 
